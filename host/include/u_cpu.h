@@ -1,0 +1,15 @@
+// The host's processor record.
+#pragma once
+
+#include <cstdint>
+
+struct U_CPU_Data {
+    int32_t processorCount;   // logical processors this process may use
+    int32_t reserved;
+    int32_t hasVectorUnits;   // non-zero when SSE4.1 is there: the renderer's vector paths
+};
+
+const U_CPU_Data* U_G_CPU_DataP();
+
+// Swaps the bytes of a 32-bit value (flattened data is big-endian).
+uint32_t U_LongSwap(uint32_t value);

@@ -1,0 +1,28 @@
+// The host utility library's error reporting. Everything goes to one reporter that the
+// host installs; the default writes to standard error.
+#pragma once
+
+#include <cstdint>
+
+// Returned for an exception that is not about memory.
+inline constexpr int32_t kU_ErrInternal = 0x13A80003;
+
+struct U_Report {
+    enum class Kind { kErrorString, kFailedVerification, kException, kMath };
+    Kind kind;
+    int32_t code;     // the error code reported with the text
+    int32_t severity; // the host's severity (4 warning, 8 error) or the source line
+    const char* text;
+};
+
+using U_Reporter = void (*)(const U_Report& report);
+
+// Installs the reporter and returns the previous one; null restores the default.
+U_Reporter U_SetReporter(U_Reporter reporter);
+
+void Up_ReportErrString(int32_t code, int32_t severity, const char* text);
+void U_ReportFailedVerification(int32_t code, int32_t line, int32_t reserved, const char* message);
+
+// Reports the exception in flight (call it from a catch block) and returns the error
+// code the caller should hand back: 4 for memory, kU_ErrInternal for anything else.
+int32_t U_TranslateAndReportException();

@@ -1,0 +1,34 @@
+// The Windows critical-section calls, with a POSIX stand-in elsewhere.
+#pragma once
+
+#ifdef _WIN32
+#include <windows.h>
+#else
+#include <pthread.h>
+
+#include <cstdint>
+
+struct CRITICAL_SECTION {
+    pthread_mutex_t mutex;
+    uint32_t spinCount;
+};
+
+// Returns non-zero on success. The spin count is how often a waiter tries before it sleeps.
+inline int InitializeCriticalSectionAndSpinCount(CRITICAL_SECTION* section, uint32_t spinCount) {
+    section->spinCount = spinCount;
+    return pthread_mutex_init(&section->mutex, nullptr) == 0;
+}
+
+inline void EnterCriticalSection(CRITICAL_SECTION* section) {
+    for (uint32_t i = 0; i < section->spinCount; ++i) {
+        if (pthread_mutex_trylock(&section->mutex) == 0) return;
+    }
+    pthread_mutex_lock(&section->mutex);
+}
+
+inline void LeaveCriticalSection(CRITICAL_SECTION* section) { pthread_mutex_unlock(&section->mutex); }
+
+inline void DeleteCriticalSection(CRITICAL_SECTION* section) {
+    pthread_mutex_destroy(&section->mutex);
+}
+#endif

@@ -1,0 +1,99 @@
+#include "u_memory.h"
+
+#include <atomic>
+#include <cstdlib>
+#include <cstring>
+#include <new>
+
+namespace {
+
+// Every block carries its size in front so that freeing can account it.
+struct alignas(16) BlockHeader {
+    size_t bytes;
+};
+
+std::atomic<int64_t> gAccountedBytes{0};
+std::atomic<int64_t> gFailCountdown{0};
+std::atomic<U_PurgeHandler> gPurgeHandler{nullptr};
+
+bool SimulatedFailure() {
+    int64_t left = gFailCountdown.load(std::memory_order_relaxed);
+    while (left > 0) {
+        if (gFailCountdown.compare_exchange_weak(left, left - 1)) return left == 1;
+    }
+    return false;
+}
+
+void* HeaderOf(void* block) { return static_cast<BlockHeader*>(block) - 1; }
+
+}  // namespace
+
+void* U_AllocatePtr(uint32_t, const char*, size_t bytes) {
+    if (SimulatedFailure() || bytes > SIZE_MAX - sizeof(BlockHeader)) return nullptr;
+    auto* header = static_cast<BlockHeader*>(std::malloc(sizeof(BlockHeader) + bytes));
+    if (!header) return nullptr;
+    header->bytes = bytes;
+    return header + 1;
+}
+
+int32_t U_ResizePtr(uint32_t tag, size_t bytes, const char* name, void** address) {
+    if (!address) return kU_ErrOutOfMemory;
+    void* resized = U_AllocatePtr(tag, name, bytes);
+    if (!resized) return kU_ErrOutOfMemory;
+    if (*address) {
+        size_t old = static_cast<BlockHeader*>(HeaderOf(*address))->bytes;
+        std::memcpy(resized, *address, old < bytes ? old : bytes);
+        U_FreePtr(*address);
+    }
+    *address = resized;
+    return 0;
+}
+
+void U_FreePtr(void* block) {
+    if (block) std::free(HeaderOf(block));
+}
+
+int32_t U_PurgeLoop(size_t bytes, U_ElementConstructor constructor, U_PurgeRecord* record,
+                    int32_t) {
+    record->error = 0;
+    record->array = U_AllocatePtr(0, "purge loop", bytes);
+    if (!record->array) {
+        U_PurgeHandler purge = gPurgeHandler.load();
+        if (purge) purge();
+        record->array = U_AllocatePtr(0, "purge loop", bytes);
+    }
+    if (!record->array) {
+        record->error = kU_ErrOutOfMemory;
+        return 0;
+    }
+    if (constructor && record->count > 0) {
+        size_t elementBytes = bytes / static_cast<size_t>(record->count);
+        auto* element = static_cast<char*>(record->array);
+        for (int32_t i = 0; i < record->count; ++i, element += elementBytes) constructor(element);
+    }
+    return 0;
+}
+
+void U_AccountAllocationEx(size_t bytes, int32_t taking) {
+    auto delta = static_cast<int64_t>(bytes);
+    gAccountedBytes.fetch_add(taking ? delta : -delta, std::memory_order_relaxed);
+}
+
+int64_t U_AccountedBytes() { return gAccountedBytes.load(std::memory_order_relaxed); }
+
+void U_SetPurgeHandler(U_PurgeHandler handler) { gPurgeHandler.store(handler); }
+
+void U_FailAllocationAfter(int64_t n) { gFailCountdown.store(n < 0 ? 0 : n); }
+
+void* U_MemTrackedObject::operator new(size_t bytes) {
+    void* object = U_AllocatePtr(0, "tracked object", bytes);
+    if (!object) throw std::bad_alloc();
+    U_AccountAllocationEx(bytes, 1);
+    return object;
+}
+
+void U_MemTrackedObject::operator delete(void* object, size_t bytes) noexcept {
+    if (!object) return;
+    U_AccountAllocationEx(bytes, 0);
+    U_FreePtr(object);
+}

@@ -1,0 +1,1 @@
+#include "renderer/scene/scene_desc.h"

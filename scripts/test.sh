@@ -1,0 +1,23 @@
+#!/usr/bin/env bash
+# Sets up, builds and runs the whole test suite: the optimised build, then the same tests
+# under the address and undefined-behaviour sanitizers, then the threaded tests under the
+# thread sanitizer. OSTREL_QUICK=1 runs the optimised build only.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+bash scripts/setup.sh
+
+# Tests of threaded paths carry "Threads" in their suite names.
+run_preset() {
+    local preset=$1
+    shift
+    cmake --preset "$preset" >/dev/null
+    cmake --build --preset "$preset"
+    ctest --preset "$preset" "$@"
+}
+
+run_preset default
+if [[ ${OSTREL_QUICK:-0} != 1 ]]; then
+    run_preset asan
+    run_preset tsan -R Threads
+fi

@@ -1,0 +1,93 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+
+#include "u_memory.h"
+
+namespace {
+
+int gPurges = 0;
+bool CountPurge() {
+    ++gPurges;
+    return true;
+}
+
+TEST(Memory, AccountingReturnsToStart) {
+    int64_t start = U_AccountedBytes();
+    U_AccountAllocationEx(100, 1);
+    EXPECT_EQ(U_AccountedBytes(), start + 100);
+    U_AccountAllocationEx(100, 0);
+    EXPECT_EQ(U_AccountedBytes(), start);
+}
+
+TEST(Memory, ResizeKeepsContents) {
+    void* block = nullptr;
+    ASSERT_EQ(U_ResizePtr(0, 4, "test", &block), 0);
+    std::memcpy(block, "abc", 4);
+    ASSERT_EQ(U_ResizePtr(0, 1000, "test", &block), 0);
+    EXPECT_STREQ(static_cast<char*>(block), "abc");
+    U_FreePtr(block);
+}
+
+TEST(Memory, ResizeFailureLeavesBlock) {
+    void* block = U_AllocatePtr(0, "test", 8);
+    void* before = block;
+    U_FailAllocationAfter(1);
+    EXPECT_EQ(U_ResizePtr(0, 64, "test", &block), kU_ErrOutOfMemory);
+    EXPECT_EQ(block, before);
+    U_FreePtr(block);
+}
+
+TEST(Memory, PurgeLoopRetriesOnceAfterPurging) {
+    struct Case {
+        int64_t failAfter;
+        bool succeeds;
+        int purges;
+    };
+    for (const Case& c : {Case{0, true, 0}, Case{1, true, 1}}) {
+        gPurges = 0;
+        U_SetPurgeHandler(&CountPurge);
+        U_FailAllocationAfter(c.failAfter);
+        U_PurgeRecord record;
+        record.count = 4;
+        EXPECT_EQ(U_PurgeLoop(4 * sizeof(int), [](void* e) { *static_cast<int*>(e) = 7; }, &record, 0), 0);
+        EXPECT_EQ(record.array != nullptr, c.succeeds);
+        EXPECT_EQ(gPurges, c.purges);
+        ASSERT_NE(record.array, nullptr);
+        EXPECT_EQ(static_cast<int*>(record.array)[3], 7);
+        U_FreePtr(record.array);
+    }
+    U_SetPurgeHandler(nullptr);
+}
+
+TEST(Memory, PurgeLoopReportsExhaustionInTheRecord) {
+    U_FailAllocationAfter(1);
+    // The second allocation (the retry) fails too: make the countdown hit both.
+    U_PurgeRecord record;
+    record.count = 1;
+    U_SetPurgeHandler([] {
+        U_FailAllocationAfter(1);
+        return true;
+    });
+    EXPECT_EQ(U_PurgeLoop(16, nullptr, &record, 0), 0);
+    EXPECT_EQ(record.error, kU_ErrOutOfMemory);
+    EXPECT_EQ(record.array, nullptr);
+    U_SetPurgeHandler(nullptr);
+}
+
+struct Tracked : U_MemTrackedObject {
+    double payload[8];
+};
+
+TEST(Memory, TrackedObjectsAreAccounted) {
+    int64_t start = U_AccountedBytes();
+    auto* object = new Tracked;
+    EXPECT_EQ(U_AccountedBytes(), start + static_cast<int64_t>(sizeof(Tracked)));
+    delete object;
+    EXPECT_EQ(U_AccountedBytes(), start);
+    U_FailAllocationAfter(1);
+    EXPECT_THROW(new Tracked, std::bad_alloc);
+    EXPECT_EQ(U_AccountedBytes(), start);
+}
+
+}  // namespace
