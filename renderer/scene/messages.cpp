@@ -28,7 +28,9 @@ constexpr int32_t kMessageBufferSize = 1000;
 
 }  // namespace
 
-const U_LStrTable* SY_StringTable() { return &kTable; }
+const U_LStrTable* SY_StringTable() {
+    return &kTable;
+}
 
 int32_t SY_RegisterStrings() {
     if (gCache) return 0;

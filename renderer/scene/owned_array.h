@@ -50,7 +50,8 @@ public:
     void Reset() {
         if (!data_) return;
         if constexpr (!std::is_trivially_destructible_v<T>) {
-            for (int32_t i = 0; i < count_; ++i) data_[i].~T();
+            for (int32_t i = 0; i < count_; ++i)
+                data_[i].~T();
         }
         U_AccountAllocationEx(sizeof(T) * static_cast<size_t>(count_), 0);
         U_FreePtr(data_);

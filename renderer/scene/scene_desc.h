@@ -19,12 +19,12 @@ struct SY_CameraDOFDesc {
     int16_t downsampleX = 1;
     int16_t downsampleY = 1;
     double pixelAspect = 1;
-    double irisShape = 0;  // from 3 on the iris kernels shape the blur
-    double irisRotation = 0;  // degrees
+    double irisShape = 0;      // from 3 on the iris kernels shape the blur
+    double irisRotation = 0;   // degrees
     double irisRoundness = 0;  // fraction
     double irisAspect = 1;
     double diffractionFringe = 0;  // fraction
-    double highlightGain = 0;  // fraction; non-zero boosts highlights
+    double highlightGain = 0;      // fraction; non-zero boosts highlights
     double highlightThreshold = 0;
     double highlightSaturation = 0;  // fraction
 };
@@ -38,13 +38,13 @@ enum SY_LightType : int32_t {
 
 struct SY_LightDesc {
     int32_t type = kSY_LightParallel;
-    int32_t id = 0;  // the light layer's index in the composition
+    int32_t id = 0;                       // the light layer's index in the composition
     SY_OwnedArray<M_Matrix4> placements;  // per subsample; only the middle one is used
-    double color[4] = {1, 0, 0, 0};  // alpha, red, green, blue; colour times intensity
-    double coneHalfAngle = 0;  // radians; spot lights only
-    double coneFeather = 0;  // fraction
+    double color[4] = {1, 0, 0, 0};       // alpha, red, green, blue; colour times intensity
+    double coneHalfAngle = 0;             // radians; spot lights only
+    double coneFeather = 0;               // fraction
     bool castsShadows = false;
-    double shadowDarkness = 0;  // fraction
+    double shadowDarkness = 0;   // fraction
     double shadowDiffusion = 0;  // pixels
     int32_t falloffType = 0;
     double falloffRadius = 0;
@@ -73,7 +73,8 @@ struct SY_LayerDesc {
     uint8_t acceptsShadows = 0;  // 0 off, 1 on, 2 only
     bool acceptsLights = true;
     bool bestQuality = false;
-    uint8_t engineFlag = 0;  // sampling quality of a best-quality layer: 0 nearest, 1 bilinear, 2 bicubic
+    uint8_t engineFlag =
+        0;  // sampling quality of a best-quality layer: 0 nearest, 1 bilinear, 2 bicubic
     bool motionBlur = false;
     bool collapsed = false;
     bool unbounded = false;
@@ -83,7 +84,7 @@ struct SY_LayerDesc {
 };
 
 struct SY_SceneDesc {
-    SY_OwnedArray<M_Matrix4> cameraPlacements;  // eye to world, per subsample
+    SY_OwnedArray<M_Matrix4> cameraPlacements;   // eye to world, per subsample
     SY_OwnedArray<M_Matrix4> cameraProjections;  // eye to screen, per subsample
     M_Matrix4 framePlacement{};
     M_Matrix4 frameProjection{};

@@ -25,7 +25,8 @@ bool Invert(const double (&in)[N][N], double (&out)[N][N]) {
     double a[N][N];
     double inv[N][N] = {};
     std::memcpy(a, in, sizeof a);
-    for (int i = 0; i < N; ++i) inv[i][i] = 1.0;
+    for (int i = 0; i < N; ++i)
+        inv[i][i] = 1.0;
     for (int col = 0; col < N; ++col) {
         int pivot = col;
         for (int row = col + 1; row < N; ++row) {
@@ -61,7 +62,8 @@ bool Invert(const double (&in)[N][N], double (&out)[N][N]) {
 
 M_Matrix4 Identity4() {
     M_Matrix4 m{};
-    for (int i = 0; i < 4; ++i) m.mat[i][i] = 1.0;
+    for (int i = 0; i < 4; ++i)
+        m.mat[i][i] = 1.0;
     return m;
 }
 
@@ -95,7 +97,9 @@ bool M_Matrix3::IsZeroWithinEpsilon(double epsilon) const {
     return true;
 }
 
-void M_Matrix3::AssignFromByDroppingZ(const M_Matrix4& m) { AssignFromByDroppingIndices(m, 2, 2); }
+void M_Matrix3::AssignFromByDroppingZ(const M_Matrix4& m) {
+    AssignFromByDroppingIndices(m, 2, 2);
+}
 
 void M_Matrix3::AssignFromByDroppingIndices(const M_Matrix4& m, int32_t row, int32_t column) {
     for (int i = 0, r = 0; i < 4; ++i) {
@@ -116,7 +120,8 @@ int32_t M_IdentityMatrix4(M_Matrix4* m) {
 
 void M_SetIdentityMatrix(M_Matrix3* m) {
     *m = M_Matrix3{};
-    for (int i = 0; i < 3; ++i) m->mat[i][i] = 1.0;
+    for (int i = 0; i < 3; ++i)
+        m->mat[i][i] = 1.0;
 }
 
 int32_t M_ConcatMatrix4(const M_Matrix4* a, const M_Matrix4* b, M_Matrix4* out) {
@@ -130,8 +135,8 @@ int32_t M_ConcatMatrix(const M_Matrix3* a, const M_Matrix3* b, M_Matrix3* out) {
     M_Matrix3 r;
     for (int i = 0; i < 3; ++i) {
         for (int j = 0; j < 3; ++j) {
-            r.mat[i][j] =
-                a->mat[i][0] * b->mat[0][j] + a->mat[i][1] * b->mat[1][j] + a->mat[i][2] * b->mat[2][j];
+            r.mat[i][j] = a->mat[i][0] * b->mat[0][j] + a->mat[i][1] * b->mat[1][j] +
+                          a->mat[i][2] * b->mat[2][j];
         }
     }
     *out = r;
@@ -158,7 +163,8 @@ int32_t M_TransposeMatrix4(const M_Matrix4* m, M_Matrix4* out) {
     if (!m || !out) return kM_ErrBadArgument;
     M_Matrix4 t;
     for (int i = 0; i < 4; ++i) {
-        for (int j = 0; j < 4; ++j) t.mat[i][j] = m->mat[j][i];
+        for (int j = 0; j < 4; ++j)
+            t.mat[i][j] = m->mat[j][i];
     }
     *out = t;
     return 0;
@@ -217,7 +223,8 @@ void M_Matrix3ToMatrix4(const M_Matrix3* m, M_Matrix4* out) {
     *out = Identity4();
     const int index[3] = {0, 1, 3};
     for (int i = 0; i < 3; ++i) {
-        for (int j = 0; j < 3; ++j) out->mat[index[i]][index[j]] = m->mat[i][j];
+        for (int j = 0; j < 3; ++j)
+            out->mat[index[i]][index[j]] = m->mat[i][j];
     }
 }
 

@@ -26,7 +26,8 @@ int32_t Store(Wide value, Wide scale, T_Time* out) {
         value /= a;
         scale /= a;
     }
-    if (value < std::numeric_limits<int32_t>::min() || value > std::numeric_limits<int32_t>::max() ||
+    if (value < std::numeric_limits<int32_t>::min() ||
+        value > std::numeric_limits<int32_t>::max() ||
         scale > std::numeric_limits<uint32_t>::max()) {
         return kT_ErrOverflow;
     }
@@ -59,4 +60,6 @@ int32_t T_CompareTimes(const T_Time* a, const T_Time* b) {
     return left < right ? -1 : left > right ? 1 : 0;
 }
 
-double T_Seconds(const T_Time& t) { return static_cast<double>(t.value) / t.scale; }
+double T_Seconds(const T_Time& t) {
+    return static_cast<double>(t.value) / t.scale;
+}

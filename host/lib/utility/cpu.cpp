@@ -19,4 +19,6 @@ const U_CPU_Data* U_G_CPU_DataP() {
     return &data;
 }
 
-uint32_t U_LongSwap(uint32_t value) { return __builtin_bswap32(value); }
+uint32_t U_LongSwap(uint32_t value) {
+    return __builtin_bswap32(value);
+}

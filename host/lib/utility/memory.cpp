@@ -24,7 +24,9 @@ bool SimulatedFailure() {
     return false;
 }
 
-void* HeaderOf(void* block) { return static_cast<BlockHeader*>(block) - 1; }
+void* HeaderOf(void* block) {
+    return static_cast<BlockHeader*>(block) - 1;
+}
 
 }  // namespace
 
@@ -69,7 +71,8 @@ int32_t U_PurgeLoop(size_t bytes, U_ElementConstructor constructor, U_PurgeRecor
     if (constructor && record->count > 0) {
         size_t elementBytes = bytes / static_cast<size_t>(record->count);
         auto* element = static_cast<char*>(record->array);
-        for (int32_t i = 0; i < record->count; ++i, element += elementBytes) constructor(element);
+        for (int32_t i = 0; i < record->count; ++i, element += elementBytes)
+            constructor(element);
     }
     return 0;
 }
@@ -79,11 +82,17 @@ void U_AccountAllocationEx(size_t bytes, int32_t taking) {
     gAccountedBytes.fetch_add(taking ? delta : -delta, std::memory_order_relaxed);
 }
 
-int64_t U_AccountedBytes() { return gAccountedBytes.load(std::memory_order_relaxed); }
+int64_t U_AccountedBytes() {
+    return gAccountedBytes.load(std::memory_order_relaxed);
+}
 
-void U_SetPurgeHandler(U_PurgeHandler handler) { gPurgeHandler.store(handler); }
+void U_SetPurgeHandler(U_PurgeHandler handler) {
+    gPurgeHandler.store(handler);
+}
 
-void U_FailAllocationAfter(int64_t n) { gFailCountdown.store(n < 0 ? 0 : n); }
+void U_FailAllocationAfter(int64_t n) {
+    gFailCountdown.store(n < 0 ? 0 : n);
+}
 
 void* U_MemTrackedObject::operator new(size_t bytes) {
     void* object = U_AllocatePtr(0, "tracked object", bytes);

@@ -13,7 +13,8 @@ namespace {
 void WriteToStandardError(const U_Report& report) {
     switch (report.kind) {
         case U_Report::Kind::kFailedVerification:
-            std::fprintf(stderr, "verification failed (line %d): %s\n", report.severity, report.text);
+            std::fprintf(stderr, "verification failed (line %d): %s\n", report.severity,
+                         report.text);
             break;
         default:
             std::fprintf(stderr, "%s\n", report.text);

@@ -1,1 +1,0 @@
-#include "renderer/scene/scene_desc.h"

@@ -1,0 +1,85 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "u_cpu.h"
+#include "u_report.h"
+#include "u_strings.h"
+
+namespace {
+
+TEST(Strings, CacheLooksUpDefaultTextsByIndex) {
+    const char* entries[] = {"$$$/QN/Test/LStr/0000=Ostrel 3D", "$$$/QN/Test/LStr/0001=a=b",
+                             "no key"};
+    U_LStrTable table{entries, 3};
+    U_LStrCache cache = nullptr;
+    ASSERT_EQ(U_ZRegisterLStrCache(&table, &cache), 0);
+    EXPECT_STREQ(U_ZLookupLStrCache(cache, 0, 0, 0), "Ostrel 3D");
+    EXPECT_STREQ(U_ZLookupLStrCache(cache, 1, 0, 0), "a=b");
+    EXPECT_STREQ(U_ZLookupLStrCache(cache, 2, 0, 0), "no key");
+    EXPECT_STREQ(U_ZLookupLStrCache(cache, 3, 0, 0), "");
+    EXPECT_EQ(U_ZUnregisterLStrCache(cache), 0);
+    EXPECT_STREQ(U_ZLookupLStrCache(cache, 0, 0, 0), "");
+    EXPECT_EQ(U_ZUnregisterLStrCache(cache), kU_ErrUnknownCache);
+}
+
+TEST(Strings, SubStringFillsPlaceholdersWithinTheBuffer) {
+    struct Case {
+        size_t capacity;
+        const char* format;
+        const char* expected;
+    };
+    const Case cases[] = {
+        {1000, "^1: ^2", "Ostrel 3D: Could not acquire TOMA suite."},
+        {10, "^1: ^2", "Ostrel 3D"},
+        {1, "^1", ""},
+        {1000, "^^1 ^3", "^1 ^3"},
+    };
+    for (const Case& c : cases) {
+        std::vector<char> buffer(c.capacity + 8, 'X');
+        U_SubString(buffer.data(), c.capacity, c.format, "Ostrel 3D",
+                    "Could not acquire TOMA suite.");
+        EXPECT_STREQ(buffer.data(), c.expected);
+        EXPECT_EQ(buffer[c.capacity], 'X') << "wrote past the buffer";
+    }
+}
+
+std::vector<std::string> gTexts;
+std::vector<int32_t> gCodes;
+void Capture(const U_Report& report) {
+    gTexts.emplace_back(report.text);
+    gCodes.push_back(report.code);
+}
+
+TEST(Reporting, ExceptionsBecomeCodesAndReports) {
+    gTexts.clear();
+    gCodes.clear();
+    U_Reporter previous = U_SetReporter(&Capture);
+    int32_t memory = 0, other = 0;
+    try {
+        throw std::bad_alloc();
+    } catch (...) {
+        memory = U_TranslateAndReportException();
+    }
+    try {
+        throw std::runtime_error("bad thing");
+    } catch (...) {
+        other = U_TranslateAndReportException();
+    }
+    Up_ReportErrString(0x13A80002, 8, "Ostrel 3D: Could not acquire TOMA suite.");
+    U_SetReporter(previous);
+    EXPECT_EQ(memory, 4);
+    EXPECT_EQ(other, kU_ErrInternal);
+    ASSERT_EQ(gTexts.size(), 3u);
+    EXPECT_NE(gTexts[1].find("bad thing"), std::string::npos);
+    EXPECT_EQ(gCodes[2], 0x13A80002);
+}
+
+TEST(Processor, RecordAndByteSwap) {
+    EXPECT_GE(U_G_CPU_DataP()->processorCount, 1);
+    EXPECT_EQ(U_LongSwap(0x11223344u), 0x44332211u);
+}
+
+}  // namespace

@@ -1,0 +1,151 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+
+#include "frame_test_support.h"
+#include "pf_world.h"
+#include "renderer/scene/frame_driver.h"
+#include "renderer/scene/render_context.h"
+#include "u_memory.h"
+
+namespace {
+
+using ostrel_test::RecordingProgress;
+using ostrel_test::ReportCapture;
+using ostrel_test::SetDefaultCamera;
+
+struct CameraFault {
+    const char* name;
+    void (*apply)(SY_SceneDesc*);
+    const char* message;
+    int32_t reportCode;
+    int32_t thrown;
+};
+
+const CameraFault kCameraFaults[] = {
+    {"unequal matrix counts", [](SY_SceneDesc* s) { s->cameraProjections.Allocate(2); },
+     "Tessary 3D: Different number of world->eye and eye->screen matrices.", 0x4B0003, 0x4B01},
+    {"orthographic projection on a perspective camera",
+     [](SY_SceneDesc* s) { s->cameraProjections[0].mat[2][3] = 0; },
+     "Tessary 3D: Camera projection matrix does not match camera type.", 0x4B0003, 0x4B01},
+    {"perspective projection on an orthographic camera",
+     [](SY_SceneDesc* s) { s->perspective = false; },
+     "Tessary 3D: Camera projection matrix does not match camera type.", 0x4B0003, 0x4B01},
+    {"parent with a zero scale",
+     [](SY_SceneDesc* s) { M_ScaleMatrix4(0, 1, 1, &s->cameraPlacements[0]); },
+     "Tessary 3D: Cannot render because camera#{rsquo}s parent has a zero scale.", 0x4B0003,
+     0x4B02},
+    {"frame placement with a zero scale",
+     [](SY_SceneDesc* s) { M_ScaleMatrix4(1, 0, 1, &s->framePlacement); },
+     "Tessary 3D: Cannot render because camera#{rsquo}s parent has a zero scale.", 0x4B0003,
+     0x4B02},
+    {"camera axis too short to normalise",
+     [](SY_SceneDesc* s) { M_ScaleMatrix4(1, 1, 1e-30, &s->framePlacement); },
+     "Vector has zero length.", 0x110034, 0x110B},
+};
+
+TEST(FrameDriver, CameraFaultsAreReportedAndThrown) {
+    for (const CameraFault& fault : kCameraFaults) {
+        SCOPED_TRACE(fault.name);
+        int64_t start = U_AccountedBytes();
+        {
+            SY_SceneDesc scene;
+            SetDefaultCamera(&scene, 64, 48, 100);
+            fault.apply(&scene);
+            PF_WorldX<PF_Pixel8> destination(64, 48);
+            RecordingProgress progress;
+            ReportCapture capture;
+            int32_t thrown = 0;
+            try {
+                SY_RenderFrame(scene, nullptr, &progress, nullptr, false, &destination, nullptr);
+            } catch (int32_t code) {
+                thrown = code;
+            }
+            EXPECT_EQ(thrown, fault.thrown);
+            ASSERT_EQ(ReportCapture::reports().size(), 1u);
+            EXPECT_EQ(ReportCapture::reports()[0].text, fault.message);
+            EXPECT_EQ(ReportCapture::reports()[0].code, fault.reportCode);
+        }
+        EXPECT_EQ(U_AccountedBytes(), start);
+    }
+}
+
+TEST(FrameDriver, IdenticalCameraSubsamplesCollapseToOne) {
+    SY_SceneDesc scene;
+    SetDefaultCamera(&scene, 64, 48, 100, 5);
+    SY_RenderContext context;
+    SY_SetUpContext(&context, scene, nullptr, nullptr, nullptr, false, nullptr);
+    EXPECT_EQ(context.worldToScreen.Count(), 1);
+    EXPECT_EQ(context.projectionW.Count(), 1);
+    EXPECT_DOUBLE_EQ(context.projectionW[0], 0.01);
+
+    M_TranslateMatrix4(1, 0, 0, &scene.cameraPlacements[4]);
+    SY_RenderContext moving;
+    SY_SetUpContext(&moving, scene, nullptr, nullptr, nullptr, false, nullptr);
+    EXPECT_EQ(moving.worldToScreen.Count(), 5);
+}
+
+TEST(FrameDriver, WorldToScreenMapsTheZoomPlaneOneToOne) {
+    SY_SceneDesc scene;
+    SetDefaultCamera(&scene, 640, 480, 800);
+    SY_RenderContext context;
+    SY_SetUpContext(&context, scene, nullptr, nullptr, nullptr, false, nullptr);
+    double world[4] = {17, 23, 0, 1}, screen[4];
+    M_TransformVector4NoDivide(&context.frameWorldToScreen[0], world, screen);
+    EXPECT_NEAR(screen[0] / screen[3], 17, 1e-9);
+    EXPECT_NEAR(screen[1] / screen[3], 23, 1e-9);
+    EXPECT_DOUBLE_EQ(context.cameraPosition[2], -800);
+    EXPECT_DOUBLE_EQ(context.cameraAxis[2], 1);
+}
+
+TEST(FrameDriver, AFrameWithoutLayersLeavesTheDestinationUntouched) {
+    int64_t start = U_AccountedBytes();
+    {
+        SY_SceneDesc scene;
+        SetDefaultCamera(&scene, 16, 8, 100);
+        PF_WorldX<PF_Pixel16> destination(16, 8);
+        for (int32_t y = 0; y < 8; ++y) {
+            for (int32_t x = 0; x < 16; ++x)
+                destination.At(x, y) = {32768, uint16_t(x), uint16_t(y), 7};
+        }
+        RecordingProgress progress;
+        SY_RenderFrame(scene, nullptr, &progress, nullptr, false, &destination, nullptr);
+        for (int32_t y = 0; y < 8; ++y) {
+            for (int32_t x = 0; x < 16; ++x) {
+                const PF_Pixel16& p = destination.At(x, y);
+                EXPECT_TRUE(p.alpha == 32768 && p.red == x && p.green == y && p.blue == 7);
+            }
+        }
+    }
+    EXPECT_EQ(U_AccountedBytes(), start);
+}
+
+// Every allocation of a frame in turn fails: each failure is code 4 and leaves nothing behind.
+TEST(FrameDriver, AnInjectedAllocationFailureFreesEverything) {
+    int64_t start = U_AccountedBytes();
+    bool completed = false;
+    for (int64_t n = 1; !completed && n < 100; ++n) {
+        SY_SceneDesc scene;
+        SetDefaultCamera(&scene, 32, 32, 100, 3);
+        M_TranslateMatrix4(1, 0, 0, &scene.cameraPlacements[2]);
+        scene.lights.Allocate(2);
+        scene.lights[0].type = kSY_LightPoint;
+        scene.lights[0].placements.Allocate(1);
+        M_IdentityMatrix4(&scene.lights[0].placements[0]);
+        scene.lights[1].type = kSY_LightAmbient;
+        int64_t before = U_AccountedBytes();
+        U_FailAllocationAfter(n);
+        try {
+            SY_RenderFrame(scene, nullptr, nullptr, nullptr, false, nullptr, nullptr);
+            completed = true;
+        } catch (int32_t code) {
+            EXPECT_EQ(code, 4) << "allocation " << n;
+        }
+        U_FailAllocationAfter(0);
+        EXPECT_EQ(U_AccountedBytes(), before) << "allocation " << n;
+    }
+    EXPECT_TRUE(completed);
+    EXPECT_EQ(U_AccountedBytes(), start);
+}
+
+}  // namespace
