@@ -1,0 +1,24 @@
+// Writing rendered frames to image files through OpenImageIO.
+#pragma once
+
+#include <filesystem>
+#include <string>
+
+#include "pf_world.h"
+
+namespace ostrel {
+
+// Writes the world to path, the format chosen by the extension (.png, .tif/.tiff, .exr, .jpg,
+// and whatever else OpenImageIO writes). 8-bit worlds are written as 8 bits, 16-bit worlds as
+// 16 bits (0..32768 stretched to 0..65535), float worlds as float where the format holds it
+// and as 16 bits otherwise. Alpha is straight, except in OpenEXR, which holds premultiplied
+// colour. The file is written whole or not at all: a temporary file beside it is renamed into
+// place. Throws HostError naming the file and the problem.
+void WriteWorld(const PF_World& world, const std::filesystem::path& path);
+
+// The output name for a frame: every run of '#' becomes the frame number padded with zeros
+// to the run's length ("shot.####.png", 7 → "shot.0007.png"). A pattern without '#' is
+// returned as it is.
+std::string ExpandFramePattern(const std::string& pattern, int frame);
+
+}  // namespace ostrel

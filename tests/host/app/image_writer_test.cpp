@@ -1,0 +1,119 @@
+#include <gtest/gtest.h>
+
+#include <unistd.h>
+
+#include <OpenImageIO/imageio.h>
+
+#include <filesystem>
+#include <vector>
+
+#include "host_error.h"
+#include "output/image_writer.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+using ostrel::WriteWorld;
+
+class TempFolder {
+public:
+    TempFolder() : path_(fs::temp_directory_path() / ("ostrel-out-" + std::to_string(::getpid()))) {
+        fs::create_directories(path_);
+    }
+    ~TempFolder() { fs::remove_all(path_); }
+    fs::path operator/(const std::string& name) const { return path_ / name; }
+    size_t FileCount() const {
+        return static_cast<size_t>(
+            std::distance(fs::directory_iterator(path_), fs::directory_iterator()));
+    }
+
+private:
+    fs::path path_;
+};
+
+// Reads back RGBA as floats, as stored (no premultiplying on the way in).
+std::vector<float> ReadBack(const fs::path& path, OIIO::TypeDesc* stored) {
+    OIIO::ImageSpec config;
+    config.attribute("oiio:UnassociatedAlpha", 1);
+    auto in = OIIO::ImageInput::open(path.string(), &config);
+    EXPECT_TRUE(in) << OIIO::geterror();
+    if (!in) return {};
+    const OIIO::ImageSpec& spec = in->spec();
+    *stored = spec.format;
+    std::vector<float> pixels(static_cast<size_t>(spec.width * spec.height * spec.nchannels));
+    in->read_image(0, 0, 0, spec.nchannels, OIIO::TypeDesc::FLOAT, pixels.data());
+    return pixels;
+}
+
+TEST(ImageWriter, KeepsDepthAndValues) {
+    TempFolder folder;
+    PF_WorldX<PF_Pixel8> eight(2, 1);
+    eight.At(0, 0) = {255, 10, 20, 30};
+    eight.At(1, 0) = {128, 255, 0, 1};
+    PF_WorldX<PF_Pixel16> sixteen(1, 1);
+    sixteen.At(0, 0) = {32768, 16384, 0, 32768};
+    PF_WorldX<PF_PixelFloat> floating(1, 1);
+    floating.At(0, 0) = {0.5f, 0.25f, 2.0f, 0.0f};
+
+    OIIO::TypeDesc stored;
+    WriteWorld(eight, folder / "eight.png");
+    auto p8 = ReadBack(folder / "eight.png", &stored);
+    EXPECT_EQ(stored, OIIO::TypeDesc::UINT8);
+    EXPECT_FLOAT_EQ(p8[0] * 255, 10);
+    EXPECT_FLOAT_EQ(p8[7] * 255, 128);  // straight alpha: colour is not scaled by it
+    EXPECT_FLOAT_EQ(p8[4] * 255, 255);
+
+    WriteWorld(sixteen, folder / "sixteen.png");
+    auto p16 = ReadBack(folder / "sixteen.png", &stored);
+    EXPECT_EQ(stored, OIIO::TypeDesc::UINT16);
+    EXPECT_FLOAT_EQ(p16[0] * 65535, 32768);  // 16384 of 32768 is half: 32767.5 rounds up
+    EXPECT_FLOAT_EQ(p16[3], 1);
+
+    WriteWorld(floating, folder / "float.exr");
+    auto pf = ReadBack(folder / "float.exr", &stored);
+    EXPECT_FLOAT_EQ(pf[0], 0.125f);  // OpenEXR holds premultiplied colour
+    EXPECT_FLOAT_EQ(pf[1], 1.0f);
+    EXPECT_FLOAT_EQ(pf[3], 0.5f);
+    EXPECT_EQ(folder.FileCount(), 3u);
+}
+
+TEST(ImageWriter, AFailedWriteLeavesNoFile) {
+    TempFolder folder;
+    PF_WorldX<PF_Pixel8> world(4, 4);
+    struct Case {
+        fs::path path;
+        const char* problem;
+    };
+    const Case cases[] = {
+        {folder / "missing-folder" / "frame.png", "cannot write the image"},
+        {folder / "frame.unknownformat", "cannot write images of this kind"},
+    };
+    for (const Case& c : cases) {
+        try {
+            ostrel::WriteWorld(world, c.path);
+            ADD_FAILURE() << c.path << " was written";
+        } catch (const ostrel::HostError& e) {
+            std::string message = e.what();
+            EXPECT_EQ(message.rfind(c.path.string(), 0), 0u) << message;
+            EXPECT_NE(message.find(c.problem), std::string::npos) << message;
+        }
+    }
+    EXPECT_EQ(folder.FileCount(), 0u);
+}
+
+TEST(ImageWriter, FramePatterns) {
+    struct Case {
+        const char* pattern;
+        int frame;
+        const char* expected;
+    };
+    const Case cases[] = {
+        {"shot.####.png", 7, "shot.0007.png"}, {"shot.#.png", 123, "shot.123.png"},
+        {"a##b###.tif", 5, "a05b005.tif"},     {"still.png", 9, "still.png"},
+        {"neg.###.png", -4, "neg.-004.png"},
+    };
+    for (const Case& c : cases)
+        EXPECT_EQ(ostrel::ExpandFramePattern(c.pattern, c.frame), c.expected);
+}
+
+}  // namespace
