@@ -25,9 +25,10 @@ struct SY_SetUpOptions {
     bool fill = true;     // an unbounded layer covers the whole output rectangle
 };
 
-// Fills the renderable's subsamples, validity range, multiSample flag and bounds from the layer
-// and the camera. Returns true when some subsample faces the screen and projects to a
-// non-empty polygon. Throws 0x4B01 after message 1 when the layer and the camera both have
-// several subsamples, in different numbers; throws the host's memory code when memory runs out.
+// Fills the subsamples, validity range, multiSample flag and bounds of a renderable fresh from
+// its constructor, from the layer and the camera. Returns true when some subsample faces the screen
+// and projects to a non-empty polygon. Throws 0x4B01 after message 1 when the layer and the camera
+// both have several subsamples, in different numbers; throws the host's memory code when memory
+// runs out.
 bool SY_SetUpRenderable(const SY_LayerDesc& layer, const SY_CameraView& camera,
                         const SY_SetUpOptions& options, SY_TRLayer* renderable);

@@ -15,10 +15,8 @@ const SY_LightState* FindLight(int32_t id, const SY_LightState* lightStates, int
     return nullptr;
 }
 
-}  // namespace
-
-void SY_AssignLights(const SY_LayerDesc& layer, const SY_LightState* lightStates,
-                     int32_t lightCount, SY_TRLayer* renderable) {
+void AssignLights(const SY_LayerDesc& layer, const SY_LightState* lightStates, int32_t lightCount,
+                  SY_TRLayer* renderable) {
     int32_t matched = 0;
     for (int32_t id : layer.lightIds) {
         if (FindLight(id, lightStates, lightCount)) ++matched;
@@ -33,6 +31,8 @@ void SY_AssignLights(const SY_LayerDesc& layer, const SY_LightState* lightStates
     if (matched == 0) renderable->material.acceptsLights = false;
 }
 
+}  // namespace
+
 void SY_BuildRenderables(const SY_RenderableSources& sources, SY_Renderables* renderables) {
     renderables->clear();
     SY_SetUpOptions options;
@@ -46,7 +46,7 @@ void SY_BuildRenderables(const SY_RenderableSources& sources, SY_Renderables* re
         options.depthOffset = layer.depthIndex * kDepthStep;
         const SY_CameraView& camera = layer.motionBlur ? sources.motionCamera : sources.frameCamera;
         if (!SY_SetUpRenderable(layer, camera, options, &renderable)) continue;
-        SY_AssignLights(layer, sources.lightStates, sources.lightCount, &renderable);
+        AssignLights(layer, sources.lightStates, sources.lightCount, &renderable);
         renderables->push_back(std::move(renderable));
     }
 }

@@ -30,7 +30,3 @@ struct SY_RenderableSources {
 // light ids, the first light state with each id; ids without a light leave no entry. A
 // renderable left without lights does not accept lights. Throws as the set-up does.
 void SY_BuildRenderables(const SY_RenderableSources& sources, SY_Renderables* renderables);
-
-// The light list of one renderable, as SY_BuildRenderables makes it.
-void SY_AssignLights(const SY_LayerDesc& layer, const SY_LightState* lightStates,
-                     int32_t lightCount, SY_TRLayer* renderable);

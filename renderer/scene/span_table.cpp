@@ -13,6 +13,11 @@ int16_t ToSpanX(double x) {
     return static_cast<int16_t>(std::clamp(x, kLow, kHigh));
 }
 
+// Rows and columns beyond the span range carry nothing a span could hold.
+int32_t ToRow(double y) {
+    return static_cast<int32_t>(std::clamp(y, -32768.0, 32768.0));
+}
+
 }  // namespace
 
 void SY_CoveredPolygon(const SY_TRLayer& renderable, SY_AccountedVector<M_Point2>* polygon) {
@@ -42,8 +47,8 @@ void SY_BuildSpanTable(const M_Point2* polygon, int32_t count, SY_SpanTable* tab
         minY = std::min(minY, polygon[i].y);
         maxY = std::max(maxY, polygon[i].y);
     }
-    auto firstRow = static_cast<int32_t>(std::floor(minY));
-    auto endRow = static_cast<int32_t>(std::ceil(maxY));
+    int32_t firstRow = ToRow(std::floor(minY));
+    int32_t endRow = ToRow(std::ceil(maxY));
     if (endRow <= firstRow) return;
     // Smallest and largest boundary x per row band, gathered edge by edge.
     SY_AccountedVector<double> low(static_cast<size_t>(endRow - firstRow), DBL_MAX);
@@ -54,8 +59,8 @@ void SY_BuildSpanTable(const M_Point2* polygon, int32_t count, SY_SpanTable* tab
         if (a.y > b.y) std::swap(a, b);
         double slope = b.y > a.y ? (b.x - a.x) / (b.y - a.y) : 0.0;
         // Every band [r, r + 1] that the edge reaches, its ends included.
-        int32_t first = std::max(firstRow, static_cast<int32_t>(std::ceil(a.y)) - 1);
-        int32_t last = std::min(endRow - 1, static_cast<int32_t>(std::floor(b.y)));
+        int32_t first = std::max(firstRow, ToRow(std::ceil(a.y)) - 1);
+        int32_t last = std::min(endRow - 1, ToRow(std::floor(b.y)));
         for (int32_t r = first; r <= last; ++r) {
             double top = std::max(a.y, static_cast<double>(r));
             double bottom = std::min(b.y, static_cast<double>(r + 1));
