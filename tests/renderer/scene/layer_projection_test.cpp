@@ -141,6 +141,20 @@ TEST(LayerProjection, EdgeOnLayerHasNoValidSubsample) {
     }
 }
 
+TEST(LayerProjection, SingularPlacementIsSkippedQuietly) {
+    // A layer scaled to nothing in x: its layer-to-screen matrix has no inverse.
+    M_Matrix4 camera = DefaultCamera(kWidth, kHeight, kDistance, true);
+    SY_LayerDesc layer;
+    SetRect(&layer, 0, 0, 100, 100);
+    M_Matrix4 placement = Identity();
+    M_ScaleMatrix4(0, 1, 1, &placement);
+    SetPlacements(&layer, {placement});
+    SY_TRLayer renderable(layer);
+    EXPECT_FALSE(SY_SetUpRenderable(layer, {&camera, 1, true}, OutputOptions(), &renderable));
+    EXPECT_EQ(renderable.firstValid, -1);
+    EXPECT_TRUE(renderable.subsamples[0].vertices.empty());
+}
+
 TEST(LayerProjection, LayerBehindTheCameraProjectsToNothing) {
     // The camera stands at z = −400; the layer 400 pixels behind it.
     for (bool perspective : {true, false}) {
