@@ -1,0 +1,81 @@
+// Cameras and layer placements built the way scene capture builds them, for geometry tests.
+#pragma once
+
+#include <cmath>
+#include <initializer_list>
+
+#include "m_matrix.h"
+#include "renderer/scene/renderable.h"
+#include "renderer/scene/scene_desc.h"
+#include "u_memory.h"
+
+namespace scene_test {
+
+inline M_Matrix4 Identity() {
+    M_Matrix4 m;
+    M_IdentityMatrix4(&m);
+    return m;
+}
+
+inline M_Matrix4 Translation(double x, double y, double z) {
+    M_Matrix4 m = Identity();
+    M_TranslateMatrix4(x, y, z, &m);
+    return m;
+}
+
+// The default camera of a width × height output at distance d from the plane z = 0, looking
+// along +z at the output's centre; under perspective the zoom is d, so z = 0 maps 1:1.
+inline M_Matrix4 DefaultCamera(double width, double height, double distance, bool perspective) {
+    M_Matrix4 placement = Translation(width / 2, height / 2, -distance);
+    M_Matrix4 projection = Identity();
+    if (perspective) projection.Project(distance);
+    M_TranslateMatrix4(width / 2, height / 2, 0, &projection);
+    M_Matrix4 eye;
+    M_InverseMatrix4(&placement, &eye);
+    M_Matrix4 worldToScreen;
+    M_ConcatMatrix4(&eye, &projection, &worldToScreen);
+    return worldToScreen;
+}
+
+// A placement that turns the layer about its point (cx, cy) by rx about x, then ry about y,
+// and puts that point at (x, y, z) in the world.
+inline M_Matrix4 Turned(double cx, double cy, double rx, double ry, double x, double y, double z) {
+    M_Matrix4 m = Translation(-cx, -cy, 0);
+    M_RotateMatrix4XYZ(rx, ry, 0, &m);
+    M_TranslateMatrix4(x, y, z, &m);
+    return m;
+}
+
+inline void SetPlacements(SY_LayerDesc* layer, std::initializer_list<M_Matrix4> placements) {
+    layer->placements.Allocate(static_cast<int32_t>(placements.size()));
+    int32_t i = 0;
+    for (const M_Matrix4& m : placements)
+        layer->placements[i++] = m;
+}
+
+inline void SetRect(SY_LayerDesc* layer, int32_t left, int32_t top, int32_t right, int32_t bottom) {
+    layer->left = left;
+    layer->top = top;
+    layer->right = right;
+    layer->bottom = bottom;
+}
+
+// Makes the nth allocation from now fail for good: the host's purge-and-retry fails as well.
+class FailingAllocation {
+public:
+    explicit FailingAllocation(int64_t n) {
+        U_SetPurgeHandler([] {
+            U_FailAllocationAfter(1);
+            return true;
+        });
+        U_FailAllocationAfter(n);
+    }
+    ~FailingAllocation() {
+        U_FailAllocationAfter(0);
+        U_SetPurgeHandler(nullptr);
+    }
+    FailingAllocation(const FailingAllocation&) = delete;
+    FailingAllocation& operator=(const FailingAllocation&) = delete;
+};
+
+}  // namespace scene_test
