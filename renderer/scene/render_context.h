@@ -10,11 +10,13 @@
 #include "renderer/scene/fetchers.h"
 #include "renderer/scene/light_state.h"
 #include "renderer/scene/owned_array.h"
+#include "renderer/scene/renderable_list.h"
 #include "renderer/scene/scene_desc.h"
 #include "renderer/scene/specular_table.h"
 
 struct SY_RenderContext {
     const SY_SceneDesc* scene = nullptr;
+    SY_Renderables renderables;                   // one per drawn layer, in render order
     SY_OwnedArray<SY_LightState> lightStates;     // same order as the scene's lights
     SY_OwnedArray<M_Matrix4> worldToScreen;       // per camera subsample
     SY_OwnedArray<M_Matrix4> frameWorldToScreen;  // one: at the frame's own time
