@@ -92,8 +92,8 @@ void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
     std::string format = out->format_name();
     Pixels pixels = Convert(world, format);
 
-    OIIO::ImageSpec spec(world.width, world.height, 4, pixels.type);
-    if (format != "openexr") spec.attribute("oiio:UnassociatedAlpha", 1);
+    OIIO::ImageSpec layout(world.width, world.height, 4, pixels.type);
+    if (format != "openexr") layout.attribute("oiio:UnassociatedAlpha", 1);
     // The temporary keeps the extension so that the same writer handles it.
     std::filesystem::path partial = path;
     std::string partialName = ".";
@@ -102,7 +102,7 @@ void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
     partialName += path.extension().string();
     partial.replace_filename(partialName);
     bool written =
-        out->open(partial.string(), spec) && out->write_image(pixels.type, pixels.bytes.data());
+        out->open(partial.string(), layout) && out->write_image(pixels.type, pixels.bytes.data());
     written = out->close() && written;
     std::error_code ignored;
     if (!written) {

@@ -38,10 +38,10 @@ std::vector<float> ReadBack(const fs::path& path, OIIO::TypeDesc* stored) {
     auto in = OIIO::ImageInput::open(path.string(), &config);
     EXPECT_TRUE(in) << OIIO::geterror();
     if (!in) return {};
-    const OIIO::ImageSpec& spec = in->spec();
-    *stored = spec.format;
-    std::vector<float> pixels(static_cast<size_t>(spec.width * spec.height * spec.nchannels));
-    in->read_image(0, 0, 0, spec.nchannels, OIIO::TypeDesc::FLOAT, pixels.data());
+    const OIIO::ImageSpec& layout = in->spec();
+    *stored = layout.format;
+    std::vector<float> pixels(static_cast<size_t>(layout.width * layout.height * layout.nchannels));
+    in->read_image(0, 0, 0, layout.nchannels, OIIO::TypeDesc::FLOAT, pixels.data());
     return pixels;
 }
 
