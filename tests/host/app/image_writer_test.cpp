@@ -2,7 +2,7 @@
 
 #include <unistd.h>
 
-#include <OpenImageIO/imageio.h>
+#include <OpenImageIO/imagebuf.h>
 
 #include <filesystem>
 #include <vector>
@@ -35,13 +35,11 @@ private:
 std::vector<float> ReadBack(const fs::path& path, OIIO::TypeDesc* stored) {
     OIIO::ImageSpec config;
     config.attribute("oiio:UnassociatedAlpha", 1);
-    auto in = OIIO::ImageInput::open(path.string(), &config);
-    EXPECT_TRUE(in) << OIIO::geterror();
-    if (!in) return {};
-    const OIIO::ImageSpec& layout = in->spec();
-    *stored = layout.format;
-    std::vector<float> pixels(static_cast<size_t>(layout.width * layout.height * layout.nchannels));
-    in->read_image(0, 0, 0, layout.nchannels, OIIO::TypeDesc::FLOAT, pixels.data());
+    OIIO::ImageBuf image(path.string(), 0, 0, nullptr, &config);
+    EXPECT_TRUE(image.read(0, 0, true, OIIO::TypeDesc::FLOAT)) << image.geterror();
+    *stored = image.nativespec().format;
+    std::vector<float> pixels(image.roi().npixels() * static_cast<size_t>(image.nchannels()));
+    image.get_pixels(image.roi(), OIIO::TypeDesc::FLOAT, pixels.data());
     return pixels;
 }
 
