@@ -8,26 +8,30 @@
 
 enum class ORM_Stream : int32_t {
     kScale = 2,  // x and y, percent
+    // Camera.
+    kZoom = 11,  // pixels
+    kDepthOfField = 12,
+    kFocusDistance = 13,
+    kAperture = 14,
+    kBlurLevel = 15,
+    // Light.
     kIntensity = 16,
-    kColor = 17,  // alpha, red, green, blue
-    kConeAngle = 18,
+    kColor = 17,      // alpha, red, green, blue
+    kConeAngle = 18,  // degrees
     kConeFeather = 19,
     kShadowDarkness = 20,
     kShadowDiffusion = 21,
+    // Material.
     kAcceptsShadows = 22,  // 0 off, 1 on, 2 only
     kAcceptsLights = 23,
     kAmbient = 24,
     kDiffuse = 25,
     kSpecular = 26,
     kShininess = 27,
-    kCastsShadows = 28,  // 0 off, 1 on, 2 only
+    kCastsShadows = 28,  // 0 off, 1 on, 2 only; also a light's switch
     kLightTransmission = 29,
     kMetal = 30,
-    kZoom = 11,
-    kDepthOfField = 12,
-    kFocusDistance = 13,
-    kAperture = 14,
-    kBlurLevel = 15,
+    // Camera iris and highlights.
     kIrisShape = 32,
     kIrisRotation = 33,
     kIrisRoundness = 34,
@@ -36,7 +40,8 @@ enum class ORM_Stream : int32_t {
     kHighlightGain = 37,
     kHighlightThreshold = 38,
     kHighlightSaturation = 39,
-    kFalloff = 40,
+    // Light falloff.
+    kFalloff = 40,  // the host's menu, from 1
     kFalloffRadius = 41,
     kFalloffDistance = 42,
 };
