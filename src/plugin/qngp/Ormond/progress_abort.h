@@ -4,9 +4,8 @@
 
 #include "render_context.h"
 #include "renderer/scene/fetchers.h"
-#include "u_memory.h"
 
-class ORM_TProgressAbort : public SY_ProgressAbort, public U_MemTrackedObject {
+class ORM_TProgressAbort : public SY_ProgressAbort {
 public:
     explicit ORM_TProgressAbort(ORM_RenderContext* context) : context_(context) {}
 

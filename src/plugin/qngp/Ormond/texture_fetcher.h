@@ -3,9 +3,8 @@
 
 #include "render_context.h"
 #include "renderer/scene/fetchers.h"
-#include "u_memory.h"
 
-class ORM_TTextureFetcher : public SY_TTextureFetcher, public U_MemTrackedObject {
+class ORM_TTextureFetcher : public SY_TTextureFetcher {
 public:
     explicit ORM_TTextureFetcher(ORM_RenderContext* context) : context_(context) {}
 

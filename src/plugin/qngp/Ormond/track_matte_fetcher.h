@@ -29,9 +29,6 @@ public:
         return type_ == ORM_MatteType::kAlpha || type_ == ORM_MatteType::kLuma;
     }
 
-    QNGP_LayerH Layer() const { return layer_; }
-    ORM_MatteType Type() const { return type_; }
-
 private:
     ORM_RenderContext* context_;
     QNGP_LayerH layer_;

@@ -1,7 +1,7 @@
 #include "resources/property_list.h"
 
-#include <string_view>
 #include <algorithm>
+#include <string_view>
 #include <utility>
 
 namespace {

@@ -5,9 +5,6 @@
 #include <cstdint>
 #include <vector>
 
-// The file name beside the library: the library's name with this extension in place of ".so".
-inline constexpr char kORM_PropertyListExtension[] = ".prpl";
-
 // The resource's bytes: a 16-bit word 1, a 32-bit version 0, a 32-bit property count, then per
 // property a vendor code, a key, a 32-bit id 0, a 32-bit length and the value padded to four
 // bytes. Integers are little-endian; four-character codes are stored with their bytes reversed.

@@ -46,11 +46,41 @@ TEST(LibraryExports, OnlyTheEntryIsDefined) {
     EXPECT_EQ(DefinedDynamicSymbols(ORMOND_LIBRARY), std::vector<std::string>{"GPMain_Ormond"});
 }
 
-TEST(LibraryExports, HostFindsTheEntryByName) {
+// The host's side of registration, as far as loading needs it.
+std::string gMatchName;
+QNGP_DeathHook gDeathHook = nullptr;
+constexpr QNGP_RegisterSuite6 kRegisterSuite{
+    [](QNGP_Version16, QNGP_Version16, int32_t, int64_t, const char* matchName, const char*,
+       const QNGP_ArtisanEntryPoints*) {
+        gMatchName = matchName;
+        return int32_t{0};
+    },
+    [](int32_t, QNGP_DeathHook hook, int64_t) {
+        gDeathHook = hook;
+        return int32_t{0};
+    },
+};
+constexpr QNGP_BasicSuite kBasic{
+    [](const char* name, int32_t version, const void** suite) {
+        bool served = std::string(name) == kQNGP_RegisterSuite && version == 6;
+        *suite = served ? &kRegisterSuite : nullptr;
+        return served ? int32_t{0} : kQNGP_ErrMissingSuite;
+    },
+    [](const char*, int32_t) { return int32_t{0}; },
+};
+
+TEST(LibraryExports, HostLoadsTheLibraryAndCallsTheEntryByName) {
     void* library = dlopen(ORMOND_LIBRARY, RTLD_NOW | RTLD_LOCAL);
     ASSERT_NE(library, nullptr) << dlerror();
-    EXPECT_NE(reinterpret_cast<QNGP_PluginMain>(dlsym(library, "GPMain_Ormond")), nullptr);
     EXPECT_EQ(dlsym(library, "_Z8ORM_MainPK15QNGP_BasicSuiteiiiPl"), nullptr);
+    auto entry = reinterpret_cast<QNGP_PluginMain>(dlsym(library, "GPMain_Ormond"));
+    ASSERT_NE(entry, nullptr);
+    int64_t global = 0;
+    EXPECT_EQ(entry(&kBasic, 1, 0, 12, &global), 0);
+    EXPECT_EQ(global, 12);
+    EXPECT_EQ(gMatchName, "VLMR Ormond");
+    ASSERT_NE(gDeathHook, nullptr);
+    EXPECT_EQ(gDeathHook(12, 0), 0);
     dlclose(library);
 }
 
