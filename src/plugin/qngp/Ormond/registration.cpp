@@ -9,17 +9,17 @@
 #include "suite_table.h"
 
 const QNGP_ArtisanEntryPoints ORM_ArtisanEntryPoints = {
-    nullptr,
-    nullptr,
-    &ORM_AboutBox,
-    &ORM_InstanceSetUp,
-    &ORM_InstanceSetDown,
-    &ORM_FlattenInstance,
-    nullptr,
-    nullptr,
-    &ORM_Render,
-    nullptr,
-    nullptr,
+    .slot0 = nullptr,
+    .slot1 = nullptr,
+    .about = &ORM_AboutBox,
+    .instanceSetUp = &ORM_InstanceSetUp,
+    .instanceSetDown = &ORM_InstanceSetDown,
+    .flattenInstance = &ORM_FlattenInstance,
+    .instanceDialog = nullptr,
+    .slot7 = nullptr,
+    .render = &ORM_Render,
+    .slot9 = nullptr,
+    .slot10 = nullptr,
 };
 
 int32_t ORM_Main(const QNGP_BasicSuite* basic, int32_t, int32_t, int32_t pluginId,

@@ -1,5 +1,7 @@
 #include "suite_table.h"
 
+#include <iterator>
+
 #include "resources/ormond_strings.h"
 #include "u_report.h"
 #include "u_strings.h"
