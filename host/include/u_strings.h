@@ -31,5 +31,9 @@ void U_SubString(char* buffer, size_t capacity, const char* format, const char* 
 
 std::u16string U_MBToUTF16String(const char* text);
 
+// The localised text of a "key=default text" string: the part after the first '=' (the whole
+// string when there is none).
+std::string U_ZStringToMBString(const char* zstring);
+
 // Error codes of the string cache.
 inline constexpr int32_t kU_ErrUnknownCache = 0x13A80010;

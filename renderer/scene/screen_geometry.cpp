@@ -72,7 +72,12 @@ Footprint MeasureFootprint(const SY_TRLayer& renderable, const M_Matrix4* camera
 }  // namespace
 
 SY_ScreenGeometry::~SY_ScreenGeometry() {
-    if (texture) textureFetcher->ReleaseTexture(renderIndex);
+    if (!texture) return;
+    // A host that fails to take a texture back cannot undo the frame; the texture stays its own.
+    try {
+        textureFetcher->ReleaseTexture(renderIndex);
+    } catch (...) {
+    }
 }
 
 void SY_ScreenGeometry::Build(const SY_RenderContext& context, const SY_TRLayer& renderable,

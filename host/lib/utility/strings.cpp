@@ -82,6 +82,10 @@ void U_SubString(char* buffer, size_t capacity, const char* format, const char* 
     buffer[used] = '\0';
 }
 
+std::string U_ZStringToMBString(const char* zstring) {
+    return DefaultText(zstring ? zstring : "");
+}
+
 std::u16string U_MBToUTF16String(const char* text) {
     // Multibyte strings are UTF-8 here.
     std::u16string out;

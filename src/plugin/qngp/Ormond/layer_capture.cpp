@@ -1,0 +1,148 @@
+#include "layer_capture.h"
+
+#include <memory>
+
+#include "layer_streams.h"
+#include "track_matte_fetcher.h"
+
+namespace {
+
+constexpr int16_t kQualityWireframe = 0;
+constexpr int16_t kQualityBest = 2;
+constexpr int32_t kAcceptsShadowsOnly = 2;
+
+}  // namespace
+
+uint8_t ORM_StoredTransferMode(const QNGP_LayerTransferMode& mode, const QNGP_EngineLayer& engine) {
+    auto stored =
+        static_cast<uint8_t>(mode.mode == 3 || mode.mode == 17 || mode.mode == 18 ? 2 : mode.mode);
+    bool ignoresKeepAlpha = engine.isAVLayer && engine.ignoresPreserveAlpha;
+    if ((mode.flags & kQNGP_TransferPreserveAlpha) && !ignoresKeepAlpha)
+        stored |= kORM_KeepAlphaBit;
+    return stored;
+}
+
+void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_LayerDesc* layer) {
+    layer->bestQuality = quality == kQualityBest;
+    if (quality == kQualityWireframe) {
+        layer->renders = false;
+        layer->wireframe = true;
+        layer->castsShadows = false;
+        layer->acceptsShadows = 0;
+        layer->acceptsLights = false;
+        return;
+    }
+    layer->wireframe = false;
+    layer->renders = true;
+    layer->castsShadows = streams.castsShadows != 0;
+    if (streams.castsShadows > 1.0) layer->renders = false;
+    layer->acceptsShadows = static_cast<uint8_t>(static_cast<int32_t>(streams.acceptsShadows));
+    if (layer->acceptsShadows == kAcceptsShadowsOnly) {
+        layer->acceptsLights = false;
+        layer->mode = kORM_ShadowsOnlyMode;
+    } else {
+        layer->acceptsLights = streams.acceptsLights != 0;
+    }
+}
+
+namespace {
+
+void CapturePlacements(ORM_RenderContext& context, const ORM_CaptureFrame& frame,
+                       QNGP_LayerContextH layerContext, bool motionBlur, SY_LayerDesc* record) {
+    auto count = motionBlur ? static_cast<int32_t>(frame.samples.size()) : 1;
+    record->placements.Allocate(count);
+    for (int32_t i = 0; i < count; ++i) {
+        const T_Time& time = motionBlur ? frame.samples[static_cast<size_t>(i)] : frame.renderTime;
+        ORM_Check(context.Canvas().GetRenderLayerToWorldXform(context.Render(), layerContext, &time,
+                                                              &record->placements[i]));
+        ORM_Check(M_ScaleMatrix4(frame.pixelAspect, 1, 1, &record->placements[i]));
+    }
+}
+
+void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int32_t index,
+                  SY_LayerDesc* record) {
+    ORM_SuiteTable& suites = context.Suites();
+    const QNGP_CanvasSuite10& canvas = context.Canvas();
+    const auto& layers = suites.Get<QNGP_LayerSuite10>();
+    QNGP_RenderContextH render = context.Render();
+    const T_Time& now = frame.renderTime;
+
+    QNGP_LayerContextH layerContext = nullptr;
+    ORM_Check(canvas.GetNthLayerContext(render, index, &layerContext));
+    QNGP_LayerH layer = nullptr;
+    ORM_Check(canvas.GetLayerFromLayerContext(render, layerContext, &layer));
+    int32_t flags = 0;
+    ORM_Check(layers.GetLayerFlags(layer, &flags));
+    CapturePlacements(context, frame, layerContext, flags & kQNGP_LayerFlagMotionBlur, record);
+
+    QNGP_ShortRect bounds{};
+    ORM_Check(canvas.GetRenderLayerBounds(render, layerContext, &now, &bounds));
+    record->left = bounds.left;
+    record->top = bounds.top;
+    record->right = bounds.right;
+    record->bottom = bounds.bottom;
+    QNGP_StreamValue scale = ORM_StreamValue(suites, layer, ORM_Stream::kScale, now);
+    record->scaleX = scale.v[0] / 100;
+    record->scaleY = scale.v[1] / 100;
+
+    QNGP_LayerTransferMode transfer{};
+    ORM_Check(layers.GetLayerTransferMode(layer, &transfer));
+    QNGP_EngineLayer engine{};
+    ORM_Check(layers.GetEngineLayer(layer, &engine));
+    record->mode = ORM_StoredTransferMode(transfer, engine);
+    record->engineFlag = engine.isAVLayer ? engine.samplingQuality : 0;
+    ORM_Check(canvas.GetRenderOpacity(render, layerContext, &now, &record->opacity));
+
+    int16_t quality = 0;
+    ORM_Check(layers.GetLayerQuality(layer, &quality));
+    ORM_ShadowStreams streams{};
+    if (quality != kQualityWireframe) {
+        streams.castsShadows = ORM_StreamNumber(suites, layer, ORM_Stream::kCastsShadows, now);
+        streams.acceptsShadows = ORM_StreamNumber(suites, layer, ORM_Stream::kAcceptsShadows, now);
+        if (static_cast<int32_t>(streams.acceptsShadows) != kAcceptsShadowsOnly) {
+            streams.acceptsLights =
+                ORM_StreamNumber(suites, layer, ORM_Stream::kAcceptsLights, now);
+        }
+    }
+    ORM_ApplyQuality(quality, streams, record);
+
+    record->ambient = ORM_StreamFraction(suites, layer, ORM_Stream::kAmbient, now);
+    record->diffuse = ORM_StreamFraction(suites, layer, ORM_Stream::kDiffuse, now);
+    record->specular = ORM_StreamFraction(suites, layer, ORM_Stream::kSpecular, now);
+    record->shininess = ORM_StreamNumber(suites, layer, ORM_Stream::kShininess, now);
+    record->metal = ORM_StreamFraction(suites, layer, ORM_Stream::kMetal, now);
+    record->lightTransmission =
+        ORM_StreamFraction(suites, layer, ORM_Stream::kLightTransmission, now);
+
+    ORM_Check(canvas.IsLayerUnbounded(render, layerContext, &record->unbounded));
+    record->motionBlur = flags & kQNGP_LayerFlagMotionBlur;
+    record->collapsed = flags & kQNGP_LayerFlagCollapse;
+    record->renderIndex = index;
+    record->depthIndex = index;
+
+    bool hasMatte = false;
+    ORM_Check(layers.LayerHasTrackMatte(layer, &hasMatte));
+    if (hasMatte) {
+        QNGP_LayerContextH matteContext = nullptr;
+        ORM_Check(canvas.GetTrackMatteContext(render, layerContext, &matteContext));
+        if (matteContext) {
+            record->trackMatte = std::make_unique<ORM_TTrackMatteFetcher>(
+                &context, layer, layerContext, static_cast<ORM_MatteType>(transfer.trackMatte));
+        }
+    }
+
+    QNGP_LayerH topLevel = nullptr;
+    ORM_Check(canvas.GetTopLevelLayer(render, layerContext, &topLevel));
+    ORM_Check(layers.GetLayerIndex(topLevel, &record->compIndex));
+}
+
+}  // namespace
+
+void ORM_CaptureLayers(ORM_RenderContext& context, const ORM_CaptureFrame& frame,
+                       SY_SceneDesc* scene) {
+    int32_t count = 0;
+    ORM_Check(context.Canvas().GetNumLayersToRender(context.Render(), &count));
+    scene->layers.Allocate(count);
+    for (int32_t i = 0; i < count; ++i)
+        CaptureLayer(context, frame, i, &scene->layers[i]);
+}

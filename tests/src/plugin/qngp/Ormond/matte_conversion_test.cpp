@@ -1,0 +1,99 @@
+#include "matte_conversion.h"
+
+#include <gtest/gtest.h>
+
+#include "pf_world.h"
+#include "track_matte_fetcher.h"
+#include "u_memory.h"
+
+namespace {
+
+// One pixel converted in a 1×1 world of its depth; returns the new alpha.
+template <class P>
+auto ConvertOne(P pixel, ORM_MatteType type) {
+    PF_WorldX<P> world(1, 1);
+    world.At(0, 0) = pixel;
+    ORM_ConvertMatteWorld(world, type);
+    EXPECT_EQ(world.At(0, 0).red, pixel.red);  // colour is left as it was
+    return world.At(0, 0).alpha;
+}
+
+TEST(MatteConversion, WhiteOpaqueAtEachDepth) {
+    const ORM_MatteType kAlpha = ORM_MatteType::kAlpha, kInverted = ORM_MatteType::kInvertedAlpha,
+                        kLuma = ORM_MatteType::kLuma, kInvertedLuma = ORM_MatteType::kInvertedLuma;
+    const PF_Pixel8 white8{255, 255, 255, 255};
+    EXPECT_EQ(ConvertOne(white8, kAlpha), 255);
+    EXPECT_EQ(ConvertOne(white8, kInverted), 0);
+    EXPECT_EQ(ConvertOne(white8, kLuma), 255);
+    EXPECT_EQ(ConvertOne(white8, kInvertedLuma), 0);
+
+    const PF_Pixel16 white16{32768, 32768, 32768, 32768};
+    EXPECT_EQ(ConvertOne(white16, kAlpha), 32768);
+    EXPECT_EQ(ConvertOne(white16, kInverted), 0);
+    EXPECT_EQ(ConvertOne(white16, kLuma), 32768);
+    EXPECT_EQ(ConvertOne(white16, kInvertedLuma), 0);
+
+    const PF_PixelFloat whiteF{1, 1, 1, 1};
+    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kAlpha), 1);
+    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kInverted), 0);
+    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kLuma), 1);
+    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kInvertedLuma), 0);
+}
+
+TEST(MatteConversion, EightBitLumaRoundsAlphaTimesLumaOver255ToNearest) {
+    struct Case {
+        uint8_t alpha, grey, luma;
+    };
+    // Grey g has luma g; the matte is round(alpha × g / 255).
+    const Case kCases[] = {
+        {255, 1, 1},     // 255 / 255 = 1
+        {128, 128, 64},  // 16384 / 255 = 64.25
+        {1, 128, 1},     // 128 / 255 = 0.502
+        {1, 127, 0},     // 127 / 255 = 0.498
+        {200, 100, 78},  // 20000 / 255 = 78.43
+        {255, 0, 0},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(testing::Message() << int(c.alpha) << " × " << int(c.grey));
+        EXPECT_EQ(ConvertOne(PF_Pixel8{c.alpha, c.grey, c.grey, c.grey}, ORM_MatteType::kLuma),
+                  c.luma);
+        EXPECT_EQ(
+            ConvertOne(PF_Pixel8{c.alpha, c.grey, c.grey, c.grey}, ORM_MatteType::kInvertedLuma),
+            255 - c.luma);
+    }
+}
+
+TEST(MatteConversion, LumaWeighsTheChannels) {
+    // Pure red, green and blue at full alpha: luma is (weight × max + 16384) / 32768, truncated.
+    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 255, 0, 0}, ORM_MatteType::kLuma), 76);   // 76.2 + 0.5
+    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 0, 255, 0}, ORM_MatteType::kLuma), 150);  // 149.7 + 0.5
+    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 0, 0, 255}, ORM_MatteType::kLuma), 29);   // 29.1 + 0.5
+    EXPECT_EQ(ConvertOne(PF_Pixel16{32768, 32768, 0, 0}, ORM_MatteType::kLuma), 9798);
+    // Half alpha: (16384 × 19235 + 16383) / 32768 = 9617.99…, truncated.
+    EXPECT_EQ(ConvertOne(PF_Pixel16{16384, 0, 32768, 0}, ORM_MatteType::kLuma), 9617);
+    EXPECT_FLOAT_EQ(ConvertOne(PF_PixelFloat{0.5f, 0, 0, 1}, ORM_MatteType::kLuma), 0.057f);
+}
+
+TEST(MatteConversion, FloatLumaClampsToTheUnitRange) {
+    // A product below 1e-16 is exactly no matte; above 1 it is full.
+    EXPECT_EQ(ConvertOne(PF_PixelFloat{1e-9f, 1e-9f, 1e-9f, 1e-9f}, ORM_MatteType::kLuma), 0.0f);
+    EXPECT_EQ(ConvertOne(PF_PixelFloat{1e-9f, 1e-9f, 1e-9f, 1e-9f}, ORM_MatteType::kInvertedLuma),
+              1.0f);
+    EXPECT_EQ(ConvertOne(PF_PixelFloat{1, -1, -1, -1}, ORM_MatteType::kLuma), 0.0f);
+    EXPECT_EQ(ConvertOne(PF_PixelFloat{1, 2, 2, 2}, ORM_MatteType::kLuma), 1.0f);
+    EXPECT_EQ(ConvertOne(PF_PixelFloat{1, 2, 2, 2}, ORM_MatteType::kInvertedLuma), 0.0f);
+}
+
+TEST(MatteConversion, UnexpectedDepthIsReportedAndThrowsThree) {
+    uint8_t pixels[8] = {};
+    PF_World world(1, 1, 8, 64, pixels);
+    int32_t thrown = 0;
+    try {
+        ORM_ConvertMatteWorld(world, ORM_MatteType::kLuma);
+    } catch (int32_t code) {
+        thrown = code;
+    }
+    EXPECT_EQ(thrown, 3);
+}
+
+}  // namespace
