@@ -1,6 +1,9 @@
 #include "composition/composition_loader.h"
 
+#include <algorithm>
+#include <cctype>
 #include <cerrno>
+#include <cmath>
 #include <cstring>
 #include <fstream>
 #include <sstream>
@@ -101,11 +104,26 @@ Json Loader::Parse(std::string_view text) const {
     try {
         return Json::parse(text);
     } catch (const Json::parse_error& e) {
+        // The library counts columns after its look-ahead, which can put the place on the
+        // next line; the byte offset of the last character read is exact.
+        size_t end = std::min<size_t>(e.byte, text.size());
+        size_t lineStart = text.rfind('\n', end == 0 ? 0 : end - 1);
+        lineStart = lineStart == std::string_view::npos ? 0 : lineStart + 1;
+        size_t line =
+            1 + static_cast<size_t>(std::count(text.begin(), text.begin() + lineStart, '\n'));
         // The library's text reads "[json.exception.parse_error.101] parse error at line 3,
-        // column 7: ..."; keep the part from the line on.
+        // column 7: syntax error ..."; keep what follows the place.
         std::string what = e.what();
-        size_t at = what.find("line ");
-        c_.Fail("", "malformed JSON: " + (at == std::string::npos ? what : what.substr(at)));
+        size_t problem = what.find(": ", what.find("column"));
+        c_.Fail("", "malformed JSON: line " + std::to_string(line) + ", column " +
+                        std::to_string(end - lineStart) + ": " +
+                        (problem == std::string::npos ? what : what.substr(problem + 2)));
+    } catch (const Json::exception& e) {
+        // Numbers beyond the range of a double (1e999) end up here.
+        std::string what = e.what();
+        size_t problem = what.find("] ");
+        c_.Fail("", "malformed JSON: " +
+                        (problem == std::string::npos ? what : what.substr(problem + 2)));
     }
 }
 

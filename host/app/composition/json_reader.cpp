@@ -101,9 +101,9 @@ std::string PlaceOf(const std::string& place, size_t index) {
 
 double ReadNumber(const JsonContext& c, const Json& j, const std::string& place, Range range) {
     if (!j.is_number()) c.Fail(place, "expected a number, got " + Describe(j));
+    // Always finite: JSON has no NaN or infinity, and the parser refuses numbers that
+    // overflow a double.
     double v = j.get<double>();
-    // JSON has no NaN or infinity, but a literal like 1e999 overflows to infinity.
-    if (!std::isfinite(v)) c.Fail(place, "the number is not finite");
     bool below = range.minExclusive ? !(v > range.min) : v < range.min;
     if (below || v > range.max) c.Fail(place, "must be " + RangeText(range) + ", got " + Format(v));
     return v;
