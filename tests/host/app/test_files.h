@@ -37,7 +37,8 @@ public:
     }
 
     // Pixels interleaved, channels per pixel as given, in the type of T (uint8_t, uint16_t
-    // or float), written in that type.
+    // or float), written in that type. Colour is stored as given: straight in formats that
+    // keep it straight (PNG), premultiplied in those that keep it so (EXR).
     template <class T>
     std::filesystem::path WriteImage(const std::string& name, int width, int height, int channels,
                                      const std::vector<T>& pixels) const {
@@ -47,6 +48,8 @@ public:
                                                   : OIIO::TypeDesc::FLOAT;
         OIIO::ImageSpec spec(width, height, channels, type);
         if (channels == 4) spec.alpha_channel = 3;
+        // Without this the writer would take the pixels for premultiplied and divide them.
+        spec.attribute("oiio:UnassociatedAlpha", 1);
         auto out = OIIO::ImageOutput::create(file.string());
         if (!out || !out->open(file.string(), spec) || !out->write_image(type, pixels.data()) ||
             !out->close()) {
