@@ -55,7 +55,7 @@ struct PendingLayer {
 
 class Loader {
 public:
-    Loader(const std::filesystem::path& file) : file_(file) { c_.file = file.string(); }
+    explicit Loader(const std::filesystem::path& file) : file_(file) { c_.file = file.string(); }
 
     Composition Load(std::string_view text);
 

@@ -1,4 +1,5 @@
-// Reading JSON values for the composition loader, with messages that name the file, the place
+// Reading JSON values for the composition loader (internal to it; nlohmann-json is not part of
+// the library's interface), with messages that name the file, the place
 // (such as "layers[3].transform.position") and the problem.
 #pragma once
 
