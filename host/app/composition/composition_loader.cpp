@@ -15,7 +15,8 @@
 namespace hostapp {
 namespace {
 
-// Larger sides are typing mistakes rather than compositions.
+// Larger sides are typing mistakes rather than compositions; the limit also keeps every
+// rectangle within the 16-bit integers of the host's layer bounds.
 constexpr int32_t kMaxSide = 30000;
 // Positions and distances beyond a billion pixels are mistakes too.
 constexpr double kFar = 1e9;
@@ -106,9 +107,11 @@ Json Loader::Parse(std::string_view text) const {
     } catch (const Json::parse_error& e) {
         // The library counts columns after its look-ahead, which can put the place on the
         // next line; the byte offset of the last character read is exact.
-        size_t end = std::min<size_t>(e.byte, text.size());
-        size_t lineStart = text.rfind('\n', end == 0 ? 0 : end - 1);
-        lineStart = lineStart == std::string_view::npos ? 0 : lineStart + 1;
+        // A newline read last still belongs to the line it ends.
+        size_t last = std::min<size_t>(e.byte, text.size());
+        last = last == 0 ? 0 : last - 1;
+        size_t before = last == 0 ? std::string_view::npos : text.rfind('\n', last - 1);
+        size_t lineStart = before == std::string_view::npos ? 0 : before + 1;
         size_t line =
             1 + static_cast<size_t>(std::count(text.begin(), text.begin() + lineStart, '\n'));
         // The library's text reads "[json.exception.parse_error.101] parse error at line 3,
@@ -116,7 +119,7 @@ Json Loader::Parse(std::string_view text) const {
         std::string what = e.what();
         size_t problem = what.find(": ", what.find("column"));
         c_.Fail("", "malformed JSON: line " + std::to_string(line) + ", column " +
-                        std::to_string(end - lineStart) + ": " +
+                        std::to_string(last - lineStart + 1) + ": " +
                         (problem == std::string::npos ? what : what.substr(problem + 2)));
     } catch (const Json::exception& e) {
         // Numbers beyond the range of a double (1e999) end up here.

@@ -95,6 +95,20 @@ TEST(CompositionLoader, ReadsLayerSwitchesAndMattes) {
     EXPECT_EQ(comp.layers[2].matteLayer, 0);
 }
 
+TEST(CompositionLoader, ReadsKeyframes) {
+    Composition comp = ParseComposition(WithLayers(R"({"kind": "null", "transform": {
+        "rotationZ": {"keyframes": [{"time": 0, "value": 10, "interpolation": "hold"},
+                                    {"time": 0.5, "value": 20, "interpolation": "ease"},
+                                    {"time": 1, "value": 40}]},
+        "position": {"keyframes": [{"time": 0, "value": [0, 0]}, {"time": 1, "value": [10, 20, 30]}]}}})"),
+                                        "keys.json");
+    const Transform& t = comp.layers[0].transform;
+    EXPECT_DOUBLE_EQ(t.rotationZ.ValueAt(0.25), 10.0);
+    EXPECT_DOUBLE_EQ(t.rotationZ.ValueAt(0.75), 30.0);
+    // [x, y] keeps the default z of 0.
+    EXPECT_EQ(t.position.At(0.5), (Vec<3>{5, 10, 15}));
+}
+
 TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
     struct Case {
         std::string text;
@@ -105,6 +119,13 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
         {"{\n  \"width\": 10,\n  \"height\" 10\n}",
          "bad.json: malformed JSON: line 3, column 13: syntax error while parsing object "
          "separator"},
+        {"{\"width\": 10,\n\"height\": 10,\n}",
+         "bad.json: malformed JSON: line 3, column 1: syntax error while parsing object key"},
+        {"{\"width\": 10\n\"height\": 10}",
+         "bad.json: malformed JSON: line 2, column 8: syntax error while parsing object - unexpected string literal"},
+        {"",
+         "bad.json: malformed JSON: line 1, column 1: syntax error while parsing value - "
+         "unexpected end of input"},
         {R"({"width": NaN, "height": 10, "duration": 1})",
          "bad.json: malformed JSON: line 1, column 11: syntax error while parsing value - invalid "
          "literal"},
