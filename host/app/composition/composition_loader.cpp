@@ -133,10 +133,10 @@ Json Loader::Parse(std::string_view text) const {
 void Loader::ReadComp(ObjectReader& r) {
     comp_.width = ReadInteger(c_, r.Require("width"), "width", 1, kMaxSide);
     comp_.height = ReadInteger(c_, r.Require("height"), "height", 1, kMaxSide);
-    comp_.pixelAspect = r.Number("pixelAspect", 1.0, Range::Between(0.1, 10));
+    comp_.pixelAspect = r.Number("pixelAspect", comp_.pixelAspect, Range::Between(0.1, 10));
     comp_.frameRate = ReadFrameRate(r);
     comp_.duration = ReadNumber(c_, r.Require("duration"), "duration", Range::Positive(86400));
-    comp_.bitDepth = static_cast<int16_t>(r.Integer("bitDepth", 8, 8, 32));
+    comp_.bitDepth = static_cast<int16_t>(r.Integer("bitDepth", comp_.bitDepth, 8, 32));
     if (comp_.bitDepth != 8 && comp_.bitDepth != 16 && comp_.bitDepth != 32) {
         r.Fail("bitDepth", "must be 8, 16 or 32, got " + std::to_string(comp_.bitDepth));
     }
@@ -147,16 +147,19 @@ void Loader::ReadComp(ObjectReader& r) {
     }
 
     ObjectReader blur = r.Object("motionBlur");
-    comp_.motionBlur.enabled = blur.Bool("enabled", false);
-    comp_.motionBlur.samplesPerFrame = blur.Integer("samplesPerFrame", 16, 1, 64);
-    comp_.motionBlur.shutterAngle = blur.Integer("shutterAngle", 180, 0, 720);
-    comp_.motionBlur.shutterPhase = blur.Integer("shutterPhase", -90, -360, 360);
+    comp_.motionBlur.enabled = blur.Bool("enabled", comp_.motionBlur.enabled);
+    comp_.motionBlur.samplesPerFrame =
+        blur.Integer("samplesPerFrame", comp_.motionBlur.samplesPerFrame, 1, 64);
+    comp_.motionBlur.shutterAngle =
+        blur.Integer("shutterAngle", comp_.motionBlur.shutterAngle, 0, 720);
+    comp_.motionBlur.shutterPhase =
+        blur.Integer("shutterPhase", comp_.motionBlur.shutterPhase, -360, 360);
     blur.Finish();
 
-    comp_.lightsAndDepthOfField = r.Bool("lightsAndDepthOfField", true);
+    comp_.lightsAndDepthOfField = r.Bool("lightsAndDepthOfField", comp_.lightsAndDepthOfField);
     ObjectReader blending = r.Object("blending");
-    comp_.blending.linear = blending.Bool("linear", false);
-    comp_.blending.gamma = blending.Number("gamma", 2.2, Range::Between(0.1, 10));
+    comp_.blending.linear = blending.Bool("linear", comp_.blending.linear);
+    comp_.blending.gamma = blending.Number("gamma", comp_.blending.gamma, Range::Between(0.1, 10));
     blending.Finish();
     comp_.rendererOptions = ReadHexBytes(r, "rendererOptions");
 }
@@ -208,24 +211,24 @@ PendingLayer Loader::ReadLayer(const Json& node, size_t index) {
                                         {"null", LayerKind::kNull},
                                         {"camera", LayerKind::kCamera},
                                         {"light", LayerKind::kLight}});
-    layer.inPoint = r.Number("in", 0.0, Range::Between(-86400, 86400));
+    layer.inPoint = r.Number("in", layer.inPoint, Range::Between(-86400, 86400));
     layer.outPoint = r.Number("out", comp_.duration, Range::Between(-86400, 86400));
     if (layer.outPoint <= layer.inPoint) r.Fail("out", "must be after the in time");
-    layer.on = r.Bool("on", true);
-    layer.threeD = r.Bool("threeD", false);
+    layer.on = r.Bool("on", layer.on);
+    layer.threeD = r.Bool("threeD", layer.threeD);
     pending.parent = r.String("parent", "");
-    layer.motionBlur = r.Bool("motionBlur", false);
+    layer.motionBlur = r.Bool("motionBlur", layer.motionBlur);
 
     Vec<3> position = CompCentre();
     if (layer.HasPixels()) {
         ReadSource(r, layer);
-        layer.quality = r.Choice<Quality>("quality", Quality::kBest,
-                                          {{"wireframe", Quality::kWireframe},
-                                           {"draft", Quality::kDraft},
-                                           {"best", Quality::kBest}});
-        layer.sampling = r.Choice<Sampling>(
-            "sampling", Sampling::kBilinear,
-            {{"bilinear", Sampling::kBilinear}, {"bicubic", Sampling::kBicubic}});
+        layer.quality = r.Choice("quality", layer.quality,
+                                 {{"wireframe", Quality::kWireframe},
+                                  {"draft", Quality::kDraft},
+                                  {"best", Quality::kBest}});
+        layer.sampling =
+            r.Choice("sampling", layer.sampling,
+                     {{"bilinear", Sampling::kBilinear}, {"bicubic", Sampling::kBicubic}});
         // The pixel library's mode table judges the name; here it only has to look like one.
         layer.transferMode = r.String("transferMode", "normal");
         bool identifier =
@@ -240,9 +243,9 @@ PendingLayer Loader::ReadLayer(const Json& node, size_t index) {
                    "expected a mode name in lower case, such as \"multiply\", got \"" +
                        layer.transferMode + "\"");
         }
-        layer.preserveTransparency = r.Bool("preserveTransparency", false);
+        layer.preserveTransparency = r.Bool("preserveTransparency", layer.preserveTransparency);
         ReadTrackMatte(r, pending);
-        layer.collapse = r.Bool("collapse", false);
+        layer.collapse = r.Bool("collapse", layer.collapse);
         ReadMaterial(r.Object("material"), layer.material);
         layer.transform.anchorPoint =
             Vec<3>{layer.source.width * 0.5, layer.source.height * 0.5, 0.0};
@@ -293,15 +296,15 @@ void Loader::ReadSource(ObjectReader& r, Layer& layer) {
 void Loader::ReadTransform(ObjectReader r, Layer& layer, const Vec<3>& position) {
     Transform& t = layer.transform;
     if (layer.kind != LayerKind::kCamera && layer.kind != LayerKind::kLight) {
-        t.anchorPoint = r.Anim<3>("anchorPoint", t.anchorPoint.Keys().front().value, kCoordinate);
-        t.scale = r.Anim<3>("scale", {100, 100, 100}, Range::Between(-1e6, 1e6));
-        t.opacity = r.Anim<1>("opacity", {100}, kPercent);
+        t.anchorPoint = r.Anim("anchorPoint", t.anchorPoint, kCoordinate);
+        t.scale = r.Anim("scale", t.scale, Range::Between(-1e6, 1e6));
+        t.opacity = r.Anim("opacity", t.opacity, kPercent);
     }
-    t.position = r.Anim<3>("position", position, kCoordinate);
-    t.orientation = r.Anim<3>("orientation", {0, 0, 0}, Range::Between(-1e6, 1e6));
-    t.rotationX = r.Anim<1>("rotationX", {0}, Range::Between(-1e6, 1e6));
-    t.rotationY = r.Anim<1>("rotationY", {0}, Range::Between(-1e6, 1e6));
-    t.rotationZ = r.Anim<1>("rotationZ", {0}, Range::Between(-1e6, 1e6));
+    t.position = r.Anim("position", Vector3(position), kCoordinate);
+    t.orientation = r.Anim("orientation", t.orientation, Range::Between(-1e6, 1e6));
+    t.rotationX = r.Anim("rotationX", t.rotationX, Range::Between(-1e6, 1e6));
+    t.rotationY = r.Anim("rotationY", t.rotationY, Range::Between(-1e6, 1e6));
+    t.rotationZ = r.Anim("rotationZ", t.rotationZ, Range::Between(-1e6, 1e6));
     r.Finish(KindText(layer.kind), kPixelTransformKeys);
 }
 
@@ -326,87 +329,89 @@ void Loader::ReadTrackMatte(ObjectReader& r, PendingLayer& pending) {
 void Loader::ReadMaterial(ObjectReader r, Material& m) {
     Choices<ShadowMode> modes = {
         {"off", ShadowMode::kOff}, {"on", ShadowMode::kOn}, {"only", ShadowMode::kOnly}};
-    m.castsShadows = r.Choice("castsShadows", ShadowMode::kOff, modes);
-    m.acceptsShadows = r.Choice("acceptsShadows", ShadowMode::kOn, modes);
-    m.acceptsLights = r.Bool("acceptsLights", true);
-    m.ambient = r.Anim<1>("ambient", {100}, kPercent);
-    m.diffuse = r.Anim<1>("diffuse", {50}, kPercent);
-    m.specularIntensity = r.Anim<1>("specularIntensity", {50}, kPercent);
-    m.shininess = r.Anim<1>("shininess", {5}, kPercent);
-    m.metal = r.Anim<1>("metal", {100}, kPercent);
-    m.lightTransmission = r.Anim<1>("lightTransmission", {0}, kPercent);
+    m.castsShadows = r.Choice("castsShadows", m.castsShadows, modes);
+    m.acceptsShadows = r.Choice("acceptsShadows", m.acceptsShadows, modes);
+    m.acceptsLights = r.Bool("acceptsLights", m.acceptsLights);
+    m.ambient = r.Anim("ambient", m.ambient, kPercent);
+    m.diffuse = r.Anim("diffuse", m.diffuse, kPercent);
+    m.specularIntensity = r.Anim("specularIntensity", m.specularIntensity, kPercent);
+    m.shininess = r.Anim("shininess", m.shininess, kPercent);
+    m.metal = r.Anim("metal", m.metal, kPercent);
+    m.lightTransmission = r.Anim("lightTransmission", m.lightTransmission, kPercent);
     r.Finish();
 }
 
 void Loader::ReadCamera(ObjectReader r, Layer& layer) {
     CameraSettings& cam = layer.camera;
-    cam.nodes = r.Choice<CameraNodes>(
-        "type", CameraNodes::kTwoNode,
-        {{"one-node", CameraNodes::kOneNode}, {"two-node", CameraNodes::kTwoNode}});
-    cam.orthographic = r.Bool("orthographic", false);
-    cam.zoom = r.Anim<1>("zoom", {DefaultCameraDistance(comp_)}, Range::Positive(kFar));
+    cam.nodes =
+        r.Choice("type", cam.nodes,
+                 {{"one-node", CameraNodes::kOneNode}, {"two-node", CameraNodes::kTwoNode}});
+    cam.orthographic = r.Bool("orthographic", cam.orthographic);
+    cam.zoom = r.Anim("zoom", Scalar(Vec<1>{DefaultCameraDistance(comp_)}), Range::Positive(kFar));
     if (cam.nodes == CameraNodes::kTwoNode) {
         layer.hasPointOfInterest = true;
-        layer.pointOfInterest = r.Anim<3>("pointOfInterest", CompCentre(), kCoordinate);
+        layer.pointOfInterest = r.Anim("pointOfInterest", Vector3(CompCentre()), kCoordinate);
     } else if (r.Has("pointOfInterest")) {
         r.Fail("pointOfInterest", "a one-node camera has no point of interest");
     }
 
     ObjectReader d = r.Object("depthOfField");
     DepthOfField& dof = cam.depthOfField;
-    dof.enabled = d.Bool("enabled", false);
-    dof.focusDistance =
-        d.Anim<1>("focusDistance", cam.zoom.Keys().front().value, Range::Positive(kFar));
-    dof.aperture = d.Anim<1>("aperture", {25}, Range::Between(0, 1e5));
-    dof.blurLevel = d.Anim<1>("blurLevel", {100}, Range::Between(0, 1000));
-    dof.irisShape = d.Choice<int32_t>("irisShape", kIrisFastRectangle,
-                                      {{"fast-rectangle", kIrisFastRectangle},
-                                       {"triangle", 3},
-                                       {"square", 4},
-                                       {"pentagon", 5},
-                                       {"hexagon", 6},
-                                       {"heptagon", 7},
-                                       {"octagon", 8},
-                                       {"nonagon", 9},
-                                       {"decagon", 10}});
-    dof.irisRotation = d.Anim<1>("irisRotation", {0}, Range::Between(-1e6, 1e6));
-    dof.irisRoundness = d.Anim<1>("irisRoundness", {0}, kPercent);
-    dof.irisAspect = d.Anim<1>("irisAspect", {1}, Range::Between(0.01, 100));
-    dof.diffractionFringe = d.Anim<1>("diffractionFringe", {0}, Range::Between(0, 1000));
-    dof.highlightGain = d.Anim<1>("highlightGain", {0}, kPercent);
-    dof.highlightThreshold = d.Anim<1>("highlightThreshold", {255}, Range::Between(0, 255));
-    dof.highlightSaturation = d.Anim<1>("highlightSaturation", {0}, kPercent);
+    dof.enabled = d.Bool("enabled", dof.enabled);
+    dof.focusDistance = d.Anim("focusDistance", cam.zoom, Range::Positive(kFar));
+    dof.aperture = d.Anim("aperture", dof.aperture, Range::Between(0, 1e5));
+    dof.blurLevel = d.Anim("blurLevel", dof.blurLevel, Range::Between(0, 1000));
+    dof.irisShape = d.Choice("irisShape", dof.irisShape,
+                             {{"fast-rectangle", kIrisFastRectangle},
+                              {"triangle", 3},
+                              {"square", 4},
+                              {"pentagon", 5},
+                              {"hexagon", 6},
+                              {"heptagon", 7},
+                              {"octagon", 8},
+                              {"nonagon", 9},
+                              {"decagon", 10}});
+    dof.irisRotation = d.Anim("irisRotation", dof.irisRotation, Range::Between(-1e6, 1e6));
+    dof.irisRoundness = d.Anim("irisRoundness", dof.irisRoundness, kPercent);
+    dof.irisAspect = d.Anim("irisAspect", dof.irisAspect, Range::Between(0.01, 100));
+    dof.diffractionFringe =
+        d.Anim("diffractionFringe", dof.diffractionFringe, Range::Between(0, 1000));
+    dof.highlightGain = d.Anim("highlightGain", dof.highlightGain, kPercent);
+    dof.highlightThreshold =
+        d.Anim("highlightThreshold", dof.highlightThreshold, Range::Between(0, 255));
+    dof.highlightSaturation = d.Anim("highlightSaturation", dof.highlightSaturation, kPercent);
     d.Finish();
     r.Finish();
 }
 
 void Loader::ReadLight(ObjectReader r, Layer& layer) {
     LightSettings& light = layer.light;
-    light.type = r.Choice<LightType>("type", LightType::kPoint,
-                                     {{"parallel", LightType::kParallel},
-                                      {"spot", LightType::kSpot},
-                                      {"point", LightType::kPoint},
-                                      {"ambient", LightType::kAmbient}});
+    light.type = r.Choice("type", light.type,
+                          {{"parallel", LightType::kParallel},
+                           {"spot", LightType::kSpot},
+                           {"point", LightType::kPoint},
+                           {"ambient", LightType::kAmbient}});
     if (light.type == LightType::kSpot || light.type == LightType::kParallel) {
         layer.hasPointOfInterest = true;
-        layer.pointOfInterest = r.Anim<3>("pointOfInterest", CompCentre(), kCoordinate);
+        layer.pointOfInterest = r.Anim("pointOfInterest", Vector3(CompCentre()), kCoordinate);
     } else if (r.Has("pointOfInterest")) {
         r.Fail("pointOfInterest", "only spot and parallel lights aim at a point of interest");
     }
-    light.intensity = r.Anim<1>("intensity", {100}, Range::Between(-1e5, 1e5));
-    light.color = r.Anim<3>("color", {1, 1, 1}, Range::Between(0, 1), true);
-    light.coneAngle = r.Anim<1>("coneAngle", {90}, Range::Between(0, 180));
-    light.coneFeather = r.Anim<1>("coneFeather", {50}, kPercent);
-    light.falloff = r.Choice<Falloff>("falloff", Falloff::kNone,
-                                      {{"none", Falloff::kNone},
-                                       {"smooth", Falloff::kSmooth},
-                                       {"inverse-square", Falloff::kInverseSquare}});
-    light.radius = r.Anim<1>("radius", {500}, kDistance);
-    light.distance = r.Anim<1>("distance", {500}, kDistance);
-    light.castsShadows = r.Bool("castsShadows", false);
-    light.shadowDarkness = r.Anim<1>("shadowDarkness", {100}, kPercent);
-    light.shadowDiffusion = r.Anim<1>("shadowDiffusion", {0}, Range::Between(0, 1e4));
-    light.lightsOnlyLayersBelow = r.Bool("lightsOnlyLayersBelow", false);
+    light.intensity = r.Anim("intensity", light.intensity, Range::Between(-1e5, 1e5));
+    light.color = r.Anim("color", light.color, Range::Between(0, 1), true);
+    light.coneAngle = r.Anim("coneAngle", light.coneAngle, Range::Between(0, 180));
+    light.coneFeather = r.Anim("coneFeather", light.coneFeather, kPercent);
+    light.falloff = r.Choice("falloff", light.falloff,
+                             {{"none", Falloff::kNone},
+                              {"smooth", Falloff::kSmooth},
+                              {"inverse-square", Falloff::kInverseSquare}});
+    light.radius = r.Anim("radius", light.radius, kDistance);
+    light.distance = r.Anim("distance", light.distance, kDistance);
+    light.castsShadows = r.Bool("castsShadows", light.castsShadows);
+    light.shadowDarkness = r.Anim("shadowDarkness", light.shadowDarkness, kPercent);
+    light.shadowDiffusion =
+        r.Anim("shadowDiffusion", light.shadowDiffusion, Range::Between(0, 1e4));
+    light.lightsOnlyLayersBelow = r.Bool("lightsOnlyLayersBelow", light.lightsOnlyLayersBelow);
     r.Finish();
 }
 

@@ -84,12 +84,13 @@ public:
     int32_t Integer(std::string_view key, int32_t fallback, int32_t min, int32_t max);
     bool Bool(std::string_view key, bool fallback);
     std::string String(std::string_view key, std::string fallback);
+    // Absent keys keep `current`; arrays of two take z from its first key.
     template <size_t N>
-    Animated<N> Anim(std::string_view key, const Vec<N>& fallback, Range range,
+    Animated<N> Anim(std::string_view key, const Animated<N>& current, Range range,
                      bool color = false) {
         const Json* j = Find(key);
-        return j ? ReadAnimated<N>(c_, *j, PlaceOf(key), fallback, range, color)
-                 : Animated<N>(fallback);
+        return j ? ReadAnimated<N>(c_, *j, PlaceOf(key), current.Keys().front().value, range, color)
+                 : current;
     }
     template <class E>
     E Choice(std::string_view key, E fallback, Choices<E> choices) {
