@@ -2,6 +2,8 @@
 
 #include <new>
 #include <stdexcept>
+#include <thread>
+#include <vector>
 
 #include "composition/composition_error.h"
 #include "composition/image_cache.h"
@@ -158,6 +160,24 @@ TEST_F(ImageCacheTest, RefusesWhatItCannotDeliver) {
     Layer gone = ImageLayer(folder_.Path() / "gone.png", 1, 1);
     EXPECT_THROW(LayerSource(cache_, gone, 8, 1, 1), CompositionError);
     EXPECT_EQ(cache_.Count(), 0u);
+}
+
+// Texture fetches arrive from the renderer's worker threads.
+TEST(ImageCacheThreads, ConcurrentFetchesShareOneDecode) {
+    TempFolder folder;
+    auto file = folder.WriteImage<uint8_t>("shared.png", 2, 2, 4, std::vector<uint8_t>(16, 200));
+    Layer layer = ImageLayer(file, 2, 2);
+    ImageCache cache;
+    std::vector<std::thread> threads;
+    std::vector<int> red(4, 0);
+    for (size_t i = 0; i < red.size(); ++i) {
+        threads.emplace_back(
+            [&, i] { red[i] = LayerSource(cache, layer, 8, 1, 1)->PixelAt<PF_Pixel8>(1, 1)->red; });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(red, (std::vector<int>{200, 200, 200, 200}));
+    EXPECT_EQ(cache.Count(), 1u);
 }
 
 }  // namespace
