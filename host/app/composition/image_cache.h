@@ -1,0 +1,38 @@
+// Decoded images kept across frames, and layer sources delivered as host worlds.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <unordered_map>
+
+#include "composition/composition.h"
+#include "composition/image_file.h"
+#include "pf_world.h"
+
+namespace hostapp {
+
+// Each file is decoded once, on first use; later frames share the decoded pixels. Safe to
+// call from several threads.
+class ImageCache {
+public:
+    // Throws CompositionError when the file cannot be read.
+    std::shared_ptr<const DecodedImage> Get(const std::filesystem::path& file);
+    size_t Count() const;
+
+private:
+    mutable std::mutex mutex_;
+    std::unordered_map<std::string, std::shared_ptr<const DecodedImage>> images_;
+};
+
+// The layer's source pixels at bitDepth (8, 16 or 32), straight colour, alpha first, reduced
+// by the downsample factors to ceil(width / dx) × ceil(height / dy) pixels, each the
+// alpha-weighted mean of its block. 16-bit channels run to 32768. Throws std::invalid_argument
+// for a layer without pixels or bad arguments, CompositionError for an unreadable image and
+// std::bad_alloc when the world cannot be had.
+std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int16_t bitDepth,
+                                      int32_t downsampleX, int32_t downsampleY);
+
+}  // namespace hostapp

@@ -1,0 +1,73 @@
+#include "composition/image_file.h"
+
+#include <OpenImageIO/imageio.h>
+
+#include <algorithm>
+#include <string>
+
+#include "composition/composition_error.h"
+
+namespace hostapp {
+namespace {
+
+[[noreturn]] void Fail(const std::filesystem::path& file, const std::string& reason) {
+    throw CompositionError("cannot read image '" + file.string() + "': " + reason);
+}
+
+std::unique_ptr<OIIO::ImageInput> Open(const std::filesystem::path& file) {
+    if (!std::filesystem::is_regular_file(file)) Fail(file, "no such file");
+    // Ask for colour as stored: readers that can keep alpha unassociated then do so.
+    OIIO::ImageSpec config;
+    config.attribute("oiio:UnassociatedAlpha", 1);
+    auto input = OIIO::ImageInput::open(file.string(), &config);
+    if (!input) {
+        std::string reason = OIIO::geterror();
+        Fail(file, reason.empty() ? "not an image OpenImageIO can read" : reason);
+    }
+    return input;
+}
+
+}  // namespace
+
+ImageInfo ProbeImage(const std::filesystem::path& file) {
+    auto input = Open(file);
+    const OIIO::ImageSpec& spec = input->spec();
+    return {spec.width, spec.height};
+}
+
+DecodedImage DecodeImage(const std::filesystem::path& file) {
+    auto input = Open(file);
+    const OIIO::ImageSpec spec = input->spec();
+    int channels = spec.nchannels;
+    if (channels < 1) Fail(file, "the image has no channels");
+    size_t count = static_cast<size_t>(spec.width) * static_cast<size_t>(spec.height);
+    std::vector<float> stored(count * static_cast<size_t>(channels));
+    if (!input->read_image(0, 0, 0, channels, OIIO::TypeDesc::FLOAT, stored.data())) {
+        Fail(file, input->geterror());
+    }
+
+    // Grey, grey and alpha, colour, or colour and alpha; further channels are ignored.
+    int alphaChannel = spec.alpha_channel >= 0 ? spec.alpha_channel : (channels == 2 ? 1 : -1);
+    if (channels >= 4 && alphaChannel < 0) alphaChannel = 3;
+    int colorChannels = channels >= 3 ? 3 : 1;
+    bool associated = alphaChannel >= 0 && spec.get_int_attribute("oiio:UnassociatedAlpha", 0) == 0;
+
+    DecodedImage image;
+    image.width = spec.width;
+    image.height = spec.height;
+    image.eightBit = spec.format == OIIO::TypeDesc::UINT8;
+    image.pixels.resize(count * 4);
+    for (size_t i = 0; i < count; ++i) {
+        const float* in = &stored[i * static_cast<size_t>(channels)];
+        float* out = &image.pixels[i * 4];
+        float alpha = alphaChannel >= 0 ? in[alphaChannel] : 1.0f;
+        // Files that store premultiplied colour (EXR, for one) are made straight here.
+        float unpremultiply = associated && alpha > 0.0f ? 1.0f / alpha : 1.0f;
+        out[0] = alpha;
+        for (int c = 0; c < 3; ++c)
+            out[1 + c] = in[colorChannels == 3 ? c : 0] * unpremultiply;
+    }
+    return image;
+}
+
+}  // namespace hostapp

@@ -1,0 +1,184 @@
+#include <gtest/gtest.h>
+
+#include <new>
+#include <stdexcept>
+#include <thread>
+#include <vector>
+
+#include "composition/composition_error.h"
+#include "composition/image_cache.h"
+#include "test_files.h"
+#include "u_memory.h"
+
+namespace hostapp {
+namespace {
+
+Layer ImageLayer(const std::filesystem::path& file, int32_t width, int32_t height) {
+    Layer layer;
+    layer.kind = LayerKind::kImage;
+    layer.source.image = file;
+    layer.source.width = width;
+    layer.source.height = height;
+    return layer;
+}
+
+template <class P>
+P At(const PF_World& world, int32_t x, int32_t y) {
+    return *world.PixelAt<P>(x, y);
+}
+
+template <class P>
+void ExpectPixel(const P& actual, const P& expected) {
+    EXPECT_EQ(actual.alpha, expected.alpha);
+    EXPECT_EQ(actual.red, expected.red);
+    EXPECT_EQ(actual.green, expected.green);
+    EXPECT_EQ(actual.blue, expected.blue);
+}
+
+class ImageCacheTest : public ::testing::Test {
+protected:
+    TempFolder folder_;
+    ImageCache cache_;
+};
+
+TEST_F(ImageCacheTest, EightBitFileAtEveryDepthKeepsStraightColour) {
+    // A half-transparent orange pixel keeps its colour exactly: the file stores it straight.
+    auto file = folder_.WriteImage<uint8_t>("straight.png", 2, 1, 4,
+                                            {200, 100, 0, 128, 255, 255, 255, 255});
+    Layer layer = ImageLayer(file, 2, 1);
+
+    auto world8 = LayerSource(cache_, layer, 8, 1, 1);
+    ASSERT_EQ(world8->GetBitDepth(), 8);
+    ASSERT_EQ(world8->width, 2);
+    ExpectPixel(At<PF_Pixel8>(*world8, 0, 0), {128, 200, 100, 0});
+    ExpectPixel(At<PF_Pixel8>(*world8, 1, 0), {255, 255, 255, 255});
+
+    // 16 bits follow the host's exact 8-to-16 conversion, 255 becoming 32768.
+    auto world16 = LayerSource(cache_, layer, 16, 1, 1);
+    ASSERT_EQ(world16->GetBitDepth(), 16);
+    ExpectPixel(At<PF_Pixel16>(*world16, 0, 0), {PF_8To16(128), PF_8To16(200), PF_8To16(100), 0});
+    ExpectPixel(At<PF_Pixel16>(*world16, 1, 0), {32768, 32768, 32768, 32768});
+
+    auto worldFloat = LayerSource(cache_, layer, 32, 1, 1);
+    ASSERT_EQ(worldFloat->GetBitDepth(), 32);
+    PF_PixelFloat p = At<PF_PixelFloat>(*worldFloat, 0, 0);
+    EXPECT_FLOAT_EQ(p.alpha, 128 / 255.0f);
+    EXPECT_FLOAT_EQ(p.red, 200 / 255.0f);
+    EXPECT_FLOAT_EQ(p.green, 100 / 255.0f);
+    EXPECT_FLOAT_EQ(p.blue, 0.0f);
+
+    // One decode served all three depths.
+    EXPECT_EQ(cache_.Count(), 1u);
+}
+
+TEST_F(ImageCacheTest, SixteenBitFileScalesToTheHostMaximum) {
+    // 65535 → 32768; 32768 → 32768 × 32768 / 65535 = 16384.25, rounded to 16384. No alpha
+    // channel means opaque.
+    auto file = folder_.WriteImage<uint16_t>("deep.png", 1, 1, 3, {65535, 32768, 0});
+    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 16, 1, 1);
+    ExpectPixel(At<PF_Pixel16>(*world, 0, 0), {32768, 32768, 16384, 0});
+}
+
+TEST_F(ImageCacheTest, PremultipliedFloatFileBecomesStraight) {
+    // EXR stores colour premultiplied: 0.25 under alpha 0.5 is 0.5 straight.
+    auto file = folder_.WriteImage<float>("float.exr", 1, 1, 4, {0.25f, 0.1f, 0.0f, 0.5f});
+    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 32, 1, 1);
+    PF_PixelFloat p = At<PF_PixelFloat>(*world, 0, 0);
+    EXPECT_NEAR(p.alpha, 0.5f, 1e-3f);  // EXR keeps half floats by default
+    EXPECT_NEAR(p.red, 0.5f, 1e-3f);
+    EXPECT_NEAR(p.green, 0.2f, 1e-3f);
+    EXPECT_EQ(p.blue, 0.0f);
+}
+
+TEST_F(ImageCacheTest, GreyFileFillsAllThreeColours) {
+    auto file = folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77});
+    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1);
+    ExpectPixel(At<PF_Pixel8>(*world, 0, 0), {255, 77, 77, 77});
+}
+
+TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
+    // 3 × 2 at 2 × 2 gives 2 × 1. The left block holds opaque red and blue and two clear
+    // pixels: half covered, half red and half blue, nothing of the clear pixels' colour. The
+    // right block, cut short by the edge, is opaque green.
+    auto file = folder_.WriteImage<uint8_t>("blocks.png", 3, 2, 4,
+                                            {255, 0, 0,   255, 0,   255, 255, 0, 0, 255, 0, 255,  //
+                                             0,   0, 255, 255, 255, 255, 0,   0, 0, 255, 0, 255});
+    auto world = LayerSource(cache_, ImageLayer(file, 3, 2), 8, 2, 2);
+    ASSERT_EQ(world->width, 2);
+    ASSERT_EQ(world->height, 1);
+    ExpectPixel(At<PF_Pixel8>(*world, 0, 0), {128, 128, 0, 128});
+    ExpectPixel(At<PF_Pixel8>(*world, 1, 0), {255, 0, 255, 0});
+}
+
+TEST_F(ImageCacheTest, SolidFillsItsSizeAtTheDownsample) {
+    Layer layer;
+    layer.kind = LayerKind::kSolid;
+    layer.source = {{}, {1.0, 0.5, 0.0}, 3, 2};
+    auto world = LayerSource(cache_, layer, 16, 2, 1);
+    ASSERT_EQ(world->width, 2);
+    ASSERT_EQ(world->height, 2);
+    for (int32_t y = 0; y < 2; ++y) {
+        for (int32_t x = 0; x < 2; ++x)
+            ExpectPixel(At<PF_Pixel16>(*world, x, y), {32768, 32768, 16384, 0});
+    }
+    EXPECT_EQ(cache_.Count(), 0u);
+}
+
+TEST_F(ImageCacheTest, DecodedOnceAcrossFrames) {
+    auto file = folder_.WriteImage<uint8_t>("once.png", 1, 1, 4, {1, 2, 3, 4});
+    auto first = cache_.Get(file);
+    auto second = cache_.Get(file);
+    EXPECT_EQ(first.get(), second.get());
+    EXPECT_EQ(cache_.Count(), 1u);
+}
+
+TEST_F(ImageCacheTest, WorldsReturnTheirMemoryAlsoWhenAllocationFails) {
+    auto file = folder_.WriteImage<uint8_t>("memory.png", 4, 4, 4, std::vector<uint8_t>(64, 9));
+    Layer layer = ImageLayer(file, 4, 4);
+    int64_t start = U_AccountedBytes();
+    {
+        auto world = LayerSource(cache_, layer, 32, 1, 1);
+        EXPECT_GT(U_AccountedBytes(), start);
+    }
+    EXPECT_EQ(U_AccountedBytes(), start);
+    U_FailAllocationAfter(1);
+    EXPECT_THROW(LayerSource(cache_, layer, 16, 1, 1), std::bad_alloc);
+    U_FailAllocationAfter(0);
+    EXPECT_EQ(U_AccountedBytes(), start);
+}
+
+TEST_F(ImageCacheTest, RefusesWhatItCannotDeliver) {
+    Layer null;
+    null.name = "null";
+    EXPECT_THROW(LayerSource(cache_, null, 8, 1, 1), std::invalid_argument);
+    Layer solid;
+    solid.kind = LayerKind::kSolid;
+    solid.source = {{}, {1, 1, 1}, 1, 1};
+    EXPECT_THROW(LayerSource(cache_, solid, 12, 1, 1), std::invalid_argument);
+    EXPECT_THROW(LayerSource(cache_, solid, 8, 0, 1), std::invalid_argument);
+    // An image that went away after loading is reported, and not cached.
+    Layer gone = ImageLayer(folder_.Path() / "gone.png", 1, 1);
+    EXPECT_THROW(LayerSource(cache_, gone, 8, 1, 1), CompositionError);
+    EXPECT_EQ(cache_.Count(), 0u);
+}
+
+// Texture fetches arrive from the renderer's worker threads.
+TEST(ImageCacheThreads, ConcurrentFetchesShareOneDecode) {
+    TempFolder folder;
+    auto file = folder.WriteImage<uint8_t>("shared.png", 2, 2, 4, std::vector<uint8_t>(16, 200));
+    Layer layer = ImageLayer(file, 2, 2);
+    ImageCache cache;
+    std::vector<std::thread> threads;
+    std::vector<int> red(4, 0);
+    for (size_t i = 0; i < red.size(); ++i) {
+        threads.emplace_back(
+            [&, i] { red[i] = LayerSource(cache, layer, 8, 1, 1)->PixelAt<PF_Pixel8>(1, 1)->red; });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(red, (std::vector<int>{200, 200, 200, 200}));
+    EXPECT_EQ(cache.Count(), 1u);
+}
+
+}  // namespace
+}  // namespace hostapp
