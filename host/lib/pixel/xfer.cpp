@@ -1,0 +1,309 @@
+// Transfer functions for every mode number and pixel type, and the mode-name table.
+//
+// Every mode composites source over backdrop in the W3C model: the blend formula acts where
+// both are present, each shows alone where the other is absent. Integer normal blends take an
+// exact integer path (it is most of the renderer's blending); the other modes compute in
+// normalised float and round once.
+#include <array>
+#include <cmath>
+#include <cstring>
+#include <utility>
+
+#include "blend_formulas.h"
+#include "pf_xfer.h"
+
+namespace {
+
+using namespace pf_blend;
+
+struct Unit {
+    float a, r, g, b;
+};
+
+template <class P>
+Unit ToUnit(const P& p) {
+    constexpr float k = 1.0f / PF_PixelTraits<P>::kMax;
+    return {p.alpha * k, p.red * k, p.green * k, p.blue * k};
+}
+
+template <class P>
+void FromUnit(const Unit& u, P& p) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat) {
+        p = {std::clamp(u.a, 0.0f, 1.0f), u.r, u.g, u.b};
+    } else {
+        using C = typename Traits::Channel;
+        auto round = [](float v) {
+            return static_cast<C>(std::clamp(v, 0.0f, 1.0f) * Traits::kMax + 0.5f);
+        };
+        p = {round(u.a), round(u.r), round(u.g), round(u.b)};
+    }
+}
+
+// Source alpha times opacity in unit range.
+template <class P>
+float SourceAlpha(const P& s, PF_XferOpacity<P> opacity) {
+    constexpr float k = 1.0f / PF_PixelTraits<P>::kMax;
+    return std::clamp(s.alpha * k, 0.0f, 1.0f) * std::clamp(opacity * k, 0.0f, 1.0f);
+}
+
+// Straight result of premultiplied colour c over alpha ao.
+inline Unit Straight(float ao, float r, float g, float b) {
+    if (ao <= 0.0f) return {0.0f, 0.0f, 0.0f, 0.0f};
+    float inv = 1.0f / ao;
+    return {ao, r * inv, g * inv, b * inv};
+}
+
+template <int kMode>
+Unit Composite(Unit s, float opacity, Unit d) {
+    if constexpr (kMode == kCopy) {
+        // Opacity is coverage: the copy replaces that share of the pixel.
+        if (opacity >= 1.0f) return s;
+        float ws = s.a * opacity, wd = d.a * (1.0f - opacity);
+        return Straight(ws + wd, ws * s.r + wd * d.r, ws * s.g + wd * d.g, ws * s.b + wd * d.b);
+    } else {
+        float as = std::clamp(s.a, 0.0f, 1.0f) * opacity, ab = d.a;
+        if constexpr (kMode == kBehind) {
+            float ws = as * (1.0f - ab);
+            return Straight(ab + ws, ab * d.r + ws * s.r, ab * d.g + ws * s.g, ab * d.b + ws * s.b);
+        } else if constexpr (kMode == kAdd) {
+            // Sum of the premultiplied colours, capped at full intensity.
+            float ao = std::min(1.0f, as + ab);
+            auto sum = [&](float cs, float cb) { return std::min(ao, as * cs + ab * cb); };
+            return Straight(ao, sum(s.r, d.r), sum(s.g, d.g), sum(s.b, d.b));
+        } else {
+            float wS = as * (1.0f - ab), wBoth = as * ab, wB = (1.0f - as) * ab;
+            Rgb blended;
+            if constexpr (IsNonSeparable(kMode)) {
+                blended = NonSeparable<kMode>({d.r, d.g, d.b}, {s.r, s.g, s.b});
+            } else {
+                blended = {Separable<kMode>(d.r, s.r), Separable<kMode>(d.g, s.g),
+                           Separable<kMode>(d.b, s.b)};
+            }
+            return Straight(as + wB, wS * s.r + wBoth * blended.r + wB * d.r,
+                            wS * s.g + wBoth * blended.g + wB * d.g,
+                            wS * s.b + wBoth * blended.b + wB * d.b);
+        }
+    }
+}
+
+// Exact x / max rounded to nearest, halves up, for x up to max².
+template <class P>
+uint32_t DivMaxRound(uint32_t x) {
+    if constexpr (PF_PixelTraits<P>::kMaxInt == 255) {
+        uint32_t t = x + 128;
+        return (t + (t >> 8)) >> 8;
+    } else {
+        return (x + 16384) >> 15;
+    }
+}
+
+template <class P>
+uint32_t MulRound(uint32_t a, uint32_t b) {
+    return DivMaxRound<P>(a * b);
+}
+
+// Normal mode on integer channels, rounded to nearest (halves up) in every case.
+template <class P>
+void NormalInteger(const P& s, uint32_t as, P& d) {
+    using C = typename PF_PixelTraits<P>::Channel;
+    constexpr uint32_t kMax = PF_PixelTraits<P>::kMaxInt;
+    if (as == kMax) {
+        d = s;
+        return;
+    }
+    uint32_t ab = d.alpha;
+    if (ab == kMax) {
+        auto over = [&](uint32_t cs, uint32_t cb) {
+            return static_cast<C>(DivMaxRound<P>(as * cs + (kMax - as) * cb));
+        };
+        d = {C(kMax), over(s.red, d.red), over(s.green, d.green), over(s.blue, d.blue)};
+        return;
+    }
+    // Weights of source and backdrop scaled by max²; their sum is the result alpha × max.
+    uint64_t wS = uint64_t(as) * kMax, wB = uint64_t(ab) * (kMax - as);
+    double inv = 1.0 / double(wS + wB);
+    // The quotient's fraction is a multiple of 1/(wS + wB) ≥ 2^−30, far above the rounding
+    // error of the reciprocal, so the offset settles exact halves upward and nothing else.
+    auto over = [&](uint32_t cs, uint32_t cb) {
+        return static_cast<C>(double(wS * cs + wB * cb) * inv + (0.5 + 1e-10));
+    };
+    d = {static_cast<C>(as + MulRound<P>(ab, kMax - as)), over(s.red, d.red),
+         over(s.green, d.green), over(s.blue, d.blue)};
+}
+
+// True when the blend leaves the destination as it is.
+template <class P, int kMode>
+bool LeavesDestination(const P& s, PF_XferOpacity<P> opacity) {
+    if constexpr (kMode == kCopy) return !(opacity > 0);
+    return !(s.alpha > 0) || !(opacity > 0);
+}
+
+template <class P, int kMode>
+void BlendDirect(const P& s, PF_XferOpacity<P> opacity, P& d) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (kMode == kNormal && !Traits::kIsFloat) {
+        uint32_t as = opacity == Traits::kMaxInt ? s.alpha : MulRound<P>(s.alpha, opacity);
+        if (as) NormalInteger(s, as, d);
+    } else {
+        constexpr float k = 1.0f / Traits::kMax;
+        float o = std::clamp(opacity * k, 0.0f, 1.0f);
+        FromUnit(Composite<kMode>(ToUnit(s), o, ToUnit(d)), d);
+    }
+}
+
+template <class P>
+PF_Pixel16 ToLinear(const P& p, const PF_LinearBlendingTables& t) {
+    if constexpr (PF_PixelTraits<P>::kBitDepth == 8) {
+        return {PF_8To16(p.alpha), uint16_t(PF_LinearFrom8(t, p.red)),
+                uint16_t(PF_LinearFrom8(t, p.green)), uint16_t(PF_LinearFrom8(t, p.blue))};
+    } else {
+        return {p.alpha, uint16_t(PF_LinearFrom16(t, p.red)), uint16_t(PF_LinearFrom16(t, p.green)),
+                uint16_t(PF_LinearFrom16(t, p.blue))};
+    }
+}
+
+template <class P>
+P FromLinear(const PF_Pixel16& p, const PF_LinearBlendingTables& t) {
+    if constexpr (PF_PixelTraits<P>::kBitDepth == 8) {
+        return {uint8_t((p.alpha * 255u + 16384) >> 15), uint8_t(PF_LinearTo8(t, p.red)),
+                uint8_t(PF_LinearTo8(t, p.green)), uint8_t(PF_LinearTo8(t, p.blue))};
+    } else {
+        return {p.alpha, uint16_t(PF_LinearTo16(t, p.red)), uint16_t(PF_LinearTo16(t, p.green)),
+                uint16_t(PF_LinearTo16(t, p.blue))};
+    }
+}
+
+PF_PixelFloat RaiseColour(PF_PixelFloat p, float exponent) {
+    auto raise = [&](float c) { return c >= 0.0f ? std::pow(c, exponent) : c; };
+    return {p.alpha, raise(p.red), raise(p.green), raise(p.blue)};
+}
+
+template <class P, int kMode>
+void XferOpacity(const P* src, const PF_LinearBlendingTables* tables, PF_XferOpacity<P> opacity,
+                 P* dst) {
+    if (LeavesDestination<P, kMode>(*src, opacity)) return;
+    if (!tables) {
+        BlendDirect<P, kMode>(*src, opacity, *dst);
+    } else if constexpr (PF_PixelTraits<P>::kIsFloat) {
+        PF_PixelFloat d = RaiseColour(*dst, tables->toLinearExponent);
+        BlendDirect<P, kMode>(RaiseColour(*src, tables->toLinearExponent), opacity, d);
+        *dst = RaiseColour(d, tables->fromLinearExponent);
+    } else {
+        PF_Pixel16 d = ToLinear(*dst, *tables);
+        uint16_t opacity16 = PF_PixelTraits<P>::kBitDepth == 8 ? PF_8To16(opacity) : opacity;
+        BlendDirect<PF_Pixel16, kMode>(ToLinear(*src, *tables), opacity16, d);
+        *dst = FromLinear<P>(d, *tables);
+    }
+}
+
+template <class P, int kMode>
+void Xfer(const P* src, const PF_LinearBlendingTables* tables, P* dst) {
+    XferOpacity<P, kMode>(src, tables, static_cast<PF_XferOpacity<P>>(PF_PixelTraits<P>::kMax),
+                          dst);
+}
+
+constexpr int kModeNumbers = 128;
+
+template <class P, size_t... I>
+constexpr std::array<PF_Xfer1Func<P>, kModeNumbers> MakeTable(std::index_sequence<I...>) {
+    return {&Xfer<P, CanonicalMode(int(I))>...};
+}
+
+template <class P, size_t... I>
+constexpr std::array<PF_Xfer1OpacityFunc<P>, kModeNumbers> MakeOpacityTable(
+    std::index_sequence<I...>) {
+    return {&XferOpacity<P, CanonicalMode(int(I))>...};
+}
+
+template <class P>
+constexpr auto kTable = MakeTable<P>(std::make_index_sequence<kModeNumbers>());
+template <class P>
+constexpr auto kOpacityTable = MakeOpacityTable<P>(std::make_index_sequence<kModeNumbers>());
+
+}  // namespace
+
+PF_Xfer1Func<PF_Pixel8> PF_Get_Xfer1_table8(int32_t mode) {
+    return kTable<PF_Pixel8>[mode & 127];
+}
+PF_Xfer1Func<PF_Pixel16> PF_Get_Xfer1_table16(int32_t mode) {
+    return kTable<PF_Pixel16>[mode & 127];
+}
+PF_Xfer1Func<PF_PixelFloat> PF_Get_Xfer1_tableF(int32_t mode) {
+    return kTable<PF_PixelFloat>[mode & 127];
+}
+PF_Xfer1OpacityFunc<PF_Pixel8> PF_Get_Xfer1_Opacity_table8(int32_t mode) {
+    return kOpacityTable<PF_Pixel8>[mode & 127];
+}
+PF_Xfer1OpacityFunc<PF_Pixel16> PF_Get_Xfer1_Opacity_table16(int32_t mode) {
+    return kOpacityTable<PF_Pixel16>[mode & 127];
+}
+PF_Xfer1OpacityFunc<PF_PixelFloat> PF_Get_Xfer1_Opacity_tableF(int32_t mode) {
+    return kOpacityTable<PF_PixelFloat>[mode & 127];
+}
+
+template <class P>
+PF_Xfer1Func<P> PF_Get_Xfer1(int32_t mode) {
+    return kTable<P>[mode & 127];
+}
+template <class P>
+PF_Xfer1OpacityFunc<P> PF_Get_Xfer1_Opacity(int32_t mode) {
+    return kOpacityTable<P>[mode & 127];
+}
+template PF_Xfer1Func<PF_Pixel8> PF_Get_Xfer1(int32_t);
+template PF_Xfer1Func<PF_Pixel16> PF_Get_Xfer1(int32_t);
+template PF_Xfer1Func<PF_PixelFloat> PF_Get_Xfer1(int32_t);
+template PF_Xfer1OpacityFunc<PF_Pixel8> PF_Get_Xfer1_Opacity(int32_t);
+template PF_Xfer1OpacityFunc<PF_Pixel16> PF_Get_Xfer1_Opacity(int32_t);
+template PF_Xfer1OpacityFunc<PF_PixelFloat> PF_Get_Xfer1_Opacity(int32_t);
+
+const PF_XferModeName PF_XferModeNames[] = {
+    {kCopy, "copy"},
+    {kBehind, "behind"},
+    {kNormal, "normal"},
+    {kDissolve, "dissolve"},
+    {kAdd, "add"},
+    {kMultiply, "multiply"},
+    {kScreen, "screen"},
+    {kOverlay, "overlay"},
+    {kSoftLight, "soft-light"},
+    {kHardLight, "hard-light"},
+    {kDarken, "darken"},
+    {kLighten, "lighten"},
+    {kDifference, "difference"},
+    {kHue, "hue"},
+    {kSaturation, "saturation"},
+    {kColor, "color"},
+    {kLuminosity, "luminosity"},
+    {kStencilAlpha, "stencil-alpha"},
+    {kStencilLuma, "stencil-luma"},
+    {kColorDodge, "color-dodge"},
+    {kColorBurn, "color-burn"},
+    {kExclusion, "exclusion"},
+    {kSubtract, "subtract"},
+    {kDivide, "divide"},
+    {kLinearDodge, "linear-dodge"},
+    {kLinearBurn, "linear-burn"},
+    {kLinearLight, "linear-light"},
+    {kVividLight, "vivid-light"},
+    {kPinLight, "pin-light"},
+    {kHardMix, "hard-mix"},
+    {kLighterColor, "lighter-color"},
+    {kDarkerColor, "darker-color"},
+};
+const int32_t PF_XferModeNameCount = sizeof(PF_XferModeNames) / sizeof(PF_XferModeNames[0]);
+static_assert(sizeof(PF_XferModeNames) / sizeof(PF_XferModeNames[0]) == kModeCount);
+
+const char* PF_XferModeToName(int32_t mode) {
+    for (const PF_XferModeName& m : PF_XferModeNames) {
+        if (m.number == mode) return m.name;
+    }
+    return nullptr;
+}
+
+int32_t PF_XferModeFromName(std::string_view name) {
+    for (const PF_XferModeName& m : PF_XferModeNames) {
+        if (name == m.name) return m.number;
+    }
+    return -1;
+}
