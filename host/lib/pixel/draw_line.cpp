@@ -1,5 +1,6 @@
 // Anti-aliased lines: each step along the major axis covers the two pixels nearest the line,
-// shared by its distance to their centres.
+// shared by its distance to their centres. Ends are capped half a pixel beyond the end points,
+// so that edges meeting at a vertex cover its pixel fully.
 #include <algorithm>
 #include <cmath>
 #include <utility>
@@ -71,10 +72,10 @@ void Draw(const PF_World& world, double x0, double y0, double x1, double y1,
         blend(&source, nullptr, opacity, world.PixelAt<P>(px, py));
     };
     double dx = x1 - x0, gradient = dx > 0.0 ? (y1 - y0) / dx : 0.0;
-    double first = std::round(x0), last = std::round(x1);
+    double first = std::floor(x0), last = std::floor(x1 + 1.0);
     for (double x = first; x <= last; x += 1.0) {
-        // The share of this column the segment spans, and where it crosses the column.
-        double span = std::min(x + 0.5, x1) - std::max(x - 0.5, x0);
+        // The share of this column the capped segment spans, and where it crosses the column.
+        double span = std::min(x, x1) - std::max(x, x0) + 1.0;
         double y = y0 + gradient * (std::clamp(x, x0, x1) - x0);
         double below = std::floor(y), share = y - below;
         plot(x, below, span * (1.0 - share));
