@@ -88,22 +88,18 @@ inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* ou
     int32_t ix = x >> 16, iy = y >> 16;
     float fx = static_cast<float>(x & 0xFFFF) * kFixedToTexels;
     float fy = static_cast<float>(y & 0xFFFF) * kFixedToTexels;
-    PF_Float4 t00, t10, t01, t11;
+    PF_Float4 t0[2], t1[2];  // rows iy and iy + 1
     if (ix >= 0 && iy >= 0 && ix + 1 < w.width && iy + 1 < w.height) {
-        const P* row0 = w.PixelAt<P>(ix, iy);
-        const P* row1 = w.PixelAt<P>(ix, iy + 1);
-        t00 = PF_LoadPremultiplied(row0[0]);
-        t10 = PF_LoadPremultiplied(row0[1]);
-        t01 = PF_LoadPremultiplied(row1[0]);
-        t11 = PF_LoadPremultiplied(row1[1]);
+        PF_LoadPremultipliedRow<2>(w.PixelAt<P>(ix, iy), t0);
+        PF_LoadPremultipliedRow<2>(w.PixelAt<P>(ix, iy + 1), t1);
     } else {
-        t00 = TexelOrClear<P>(w, ix, iy);
-        t10 = TexelOrClear<P>(w, ix + 1, iy);
-        t01 = TexelOrClear<P>(w, ix, iy + 1);
-        t11 = TexelOrClear<P>(w, ix + 1, iy + 1);
+        for (int i = 0; i < 2; ++i) {
+            t0[i] = TexelOrClear<P>(w, ix + i, iy);
+            t1[i] = TexelOrClear<P>(w, ix + i, iy + 1);
+        }
     }
-    PF_Float4 top = t00 + (t10 - t00) * fx;
-    PF_Float4 bottom = t01 + (t11 - t01) * fx;
+    PF_Float4 top = t0[0] + (t0[1] - t0[0]) * fx;
+    PF_Float4 bottom = t1[0] + (t1[1] - t1[0]) * fx;
     PF_StorePremultiplied(top + (bottom - top) * fy, out);
 }
 
@@ -119,11 +115,9 @@ inline void PF_SubpixelBicubic(int32_t x, int32_t y, const PF_SampPB& pb, P* out
     PF_Float4 sum = {0.0f, 0.0f, 0.0f, 0.0f};
     if (ix >= 0 && iy >= 0 && ix + 3 < w.width && iy + 3 < w.height) {
         for (int j = 0; j < 4; ++j) {
-            const P* row = w.PixelAt<P>(ix, iy + j);
-            PF_Float4 r =
-                PF_LoadPremultiplied(row[0]) * wx[0] + PF_LoadPremultiplied(row[1]) * wx[1] +
-                PF_LoadPremultiplied(row[2]) * wx[2] + PF_LoadPremultiplied(row[3]) * wx[3];
-            sum += r * wy[j];
+            PF_Float4 t[4];
+            PF_LoadPremultipliedRow<4>(w.PixelAt<P>(ix, iy + j), t);
+            sum += (t[0] * wx[0] + t[1] * wx[1] + t[2] * wx[2] + t[3] * wx[3]) * wy[j];
         }
     } else {
         for (int j = 0; j < 4; ++j) {
@@ -160,7 +154,12 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
         using Cells = PF_BoxCellsPixel<PF_AreaSum64>;
         sum = PF_BoxSum<Cells>(table.Cells<PF_AreaSum64>(), table.Stride(), ax, ay);
     } else {
-        sum = PF_BoxSum<PF_BoxCellsUint>(table.Cells<PF_Uint4>(), table.Stride(), ax, ay);
+        // Sums of alpha × colour (at most 65025 a texel) fit 31 bits in boxes of up to 33025
+        // texels: radii below about 90.
+        int32_t texels = (ax.edge[3] - ax.edge[0]) * (ay.edge[3] - ay.edge[0]);
+        const PF_Uint4* cells = table.Cells<PF_Uint4>();
+        sum = texels <= 33025 ? PF_BoxSum<PF_BoxCellsUint<true>>(cells, table.Stride(), ax, ay)
+                              : PF_BoxSum<PF_BoxCellsUint<false>>(cells, table.Stride(), ax, ay);
     }
     PF_StorePremultiplied(sum * (1.0f / (4.0f * rx * ry)), out);
 }

@@ -67,12 +67,9 @@ inline void PF_SummedAreaTable_SampleDraft(int32_t width, int32_t height, const 
     const S* top = sums + ptrdiff_t(std::clamp(y0, 0, height)) * stride;
     const S* bottom = sums + ptrdiff_t(std::clamp(y1, 0, height)) * stride;
     int32_t left = std::clamp(x0, 0, width), right = std::clamp(x1, 0, width);
-    typename Cells::Acc sum = Cells::Zero();
-    Cells::Add(
-        sum, Cells::Sub(Cells::Sub(bottom[right], bottom[left]), Cells::Sub(top[right], top[left])),
-        1.0f);
+    S box = Cells::Sub(Cells::Sub(bottom[right], top[right]), Cells::Sub(bottom[left], top[left]));
     float area = x1 > x0 && y1 > y0 ? float(x1 - x0) * float(y1 - y0) : 0.0f;
-    pf_tables::StoreAverage(Cells::ToFloat4(sum), area, out);
+    pf_tables::StoreAverage(Cells::ToFloat4(Cells::Widen(box)), area, out);
 }
 
 // Average over the box [x0, x1] × [y0, y1] with fractional edges, where pixel i covers

@@ -1,25 +1,76 @@
 // Four-lane vectors for the pixel library's per-pixel arithmetic: one lane per channel, in the
-// pixel order alpha, red, green, blue. Plain compiler vectors, so they map to SSE registers.
+// pixel order alpha, red, green, blue. Compiler vectors that are SSE registers, so arithmetic
+// reads as arithmetic and loads and stores use the SSE2 instructions every x86-64 has.
 #pragma once
 
 #include <cstdint>
+#include <cstring>
+
+#include <emmintrin.h>
 
 #include "pf_pixel.h"
 
 typedef float PF_Float4 __attribute__((vector_size(16)));
 typedef uint32_t PF_Uint4 __attribute__((vector_size(16)));
 
-template <class P>
-inline PF_Float4 PF_LoadFloat4(const P& p) {
-    return PF_Float4{static_cast<float>(p.alpha), static_cast<float>(p.red),
-                     static_cast<float>(p.green), static_cast<float>(p.blue)};
+// The channels of a pixel as a vector: one load and a widening conversion.
+inline PF_Float4 PF_LoadFloat4(const PF_Pixel8& p) {
+    int32_t bytes;
+    std::memcpy(&bytes, &p, sizeof bytes);
+    __m128i zero = _mm_setzero_si128();
+    __m128i lanes = _mm_unpacklo_epi16(_mm_unpacklo_epi8(_mm_cvtsi32_si128(bytes), zero), zero);
+    return _mm_cvtepi32_ps(lanes);
+}
+inline PF_Float4 PF_LoadFloat4(const PF_Pixel16& p) {
+    __m128i shorts = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(&p));
+    return _mm_cvtepi32_ps(_mm_unpacklo_epi16(shorts, _mm_setzero_si128()));
+}
+inline PF_Float4 PF_LoadFloat4(const PF_PixelFloat& p) {
+    return _mm_loadu_ps(&p.alpha);
+}
+
+// (1, v0, v0, v0): the factors that premultiply, or with v0 = 1/alpha unpremultiply.
+inline PF_Float4 PF_AlphaFactors(PF_Float4 v) {
+    return _mm_move_ss(_mm_shuffle_ps(v, v, 0), _mm_set_ss(1.0f));
 }
 
 // A texel in premultiplied form: (alpha, alpha × colour) in channel units.
 template <class P>
 inline PF_Float4 PF_LoadPremultiplied(const P& p) {
     PF_Float4 v = PF_LoadFloat4(p);
-    return v * PF_Float4{1.0f, v[0], v[0], v[0]};
+    return v * PF_AlphaFactors(v);
+}
+
+// N adjacent texels (N = 2 or 4) premultiplied.
+template <int N, class P>
+inline void PF_LoadPremultipliedRow(const P* texels, PF_Float4* out) {
+    for (int i = 0; i < N; ++i)
+        out[i] = PF_LoadPremultiplied(texels[i]);
+}
+
+// 8-bit texels premultiply exactly in 16-bit lanes (255 × 255 fits), two texels at a time.
+template <int N>
+inline void PF_LoadPremultipliedRow(const PF_Pixel8* texels, PF_Float4* out) {
+    const __m128i zero = _mm_setzero_si128();
+    // Multipliers (1, a, a, a) per texel: alpha spread over its texel, 1 in the alpha lane.
+    const __m128i alphaLanes = _mm_set_epi16(0, 0, 0, -1, 0, 0, 0, -1);
+    const __m128i ones = _mm_set_epi16(0, 0, 0, 1, 0, 0, 0, 1);
+    auto premultiplyPair = [&](__m128i shorts, PF_Float4* pair) {
+        __m128i alpha = _mm_shufflehi_epi16(_mm_shufflelo_epi16(shorts, 0), 0);
+        alpha = _mm_or_si128(_mm_andnot_si128(alphaLanes, alpha), ones);
+        __m128i premultiplied = _mm_mullo_epi16(shorts, alpha);
+        pair[0] = _mm_cvtepi32_ps(_mm_unpacklo_epi16(premultiplied, zero));
+        pair[1] = _mm_cvtepi32_ps(_mm_unpackhi_epi16(premultiplied, zero));
+    };
+    if constexpr (N == 2) {
+        __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(texels));
+        premultiplyPair(_mm_unpacklo_epi8(bytes, zero), out);
+    } else {
+        static_assert(N == 4);
+        __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i*>(texels));
+        premultiplyPair(_mm_unpacklo_epi8(bytes, zero), out);
+        premultiplyPair(_mm_unpackhi_epi8(bytes, zero), out + 2);
+    }
 }
 
 // Writes a premultiplied value (alpha, alpha × colour in channel units) as a straight pixel.
@@ -28,26 +79,29 @@ inline PF_Float4 PF_LoadPremultiplied(const P& p) {
 template <class P>
 inline void PF_StorePremultiplied(PF_Float4 v, P* out) {
     using Traits = PF_PixelTraits<P>;
-    using C = typename Traits::Channel;
     float a = v[0];
+    constexpr float kMinAlpha = Traits::kIsFloat ? 0.0f : 0.5f;
+    if (!(a > kMinAlpha)) {
+        *out = P{};
+        return;
+    }
+    PF_Float4 c = v * PF_AlphaFactors(_mm_div_ss(_mm_set_ss(1.0f), v));
     if constexpr (Traits::kIsFloat) {
-        if (!(a > 0.0f)) {
-            *out = {0.0f, 0.0f, 0.0f, 0.0f};
-            return;
-        }
-        PF_Float4 c = v * (1.0f / a);
-        *out = {a < 1.0f ? a : 1.0f, c[1], c[2], c[3]};
+        c[0] = a < 1.0f ? a : 1.0f;
+        _mm_storeu_ps(&out->alpha, c);
     } else {
-        if (!(a >= 0.5f)) {
-            *out = {0, 0, 0, 0};
-            return;
+        c = _mm_min_ps(_mm_max_ps(c, _mm_setzero_ps()), _mm_set1_ps(Traits::kMax));
+        __m128i lanes = _mm_cvttps_epi32(c + 0.5f);
+        if constexpr (Traits::kBitDepth == 8) {
+            __m128i bytes = _mm_packus_epi16(_mm_packs_epi32(lanes, lanes), lanes);
+            int32_t packed = _mm_cvtsi128_si32(bytes);
+            std::memcpy(out, &packed, sizeof packed);
+        } else {
+            // 0..32768 does not fit the signed pack: shift into its range and back.
+            __m128i bias = _mm_set1_epi32(32768);
+            __m128i shorts = _mm_packs_epi32(_mm_sub_epi32(lanes, bias), lanes);
+            shorts = _mm_xor_si128(shorts, _mm_set1_epi16(static_cast<int16_t>(0x8000)));
+            _mm_storel_epi64(reinterpret_cast<__m128i*>(out), shorts);
         }
-        PF_Float4 c = v * PF_Float4{1.0f, 1.0f / a, 1.0f / a, 1.0f / a};
-        PF_Float4 lo = {0.0f, 0.0f, 0.0f, 0.0f},
-                  hi = {Traits::kMax, Traits::kMax, Traits::kMax, Traits::kMax};
-        c = (c < lo ? lo : c);
-        c = (c > hi ? hi : c) + 0.5f;
-        *out = {static_cast<C>(c[0]), static_cast<C>(c[1]), static_cast<C>(c[2]),
-                static_cast<C>(c[3])};
     }
 }
