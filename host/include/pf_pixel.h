@@ -52,14 +52,8 @@ struct PF_PixelTraits<PF_PixelFloat> {
 };
 
 // Product of two 16-bit channel values, rounded, in the 0..32768 range.
-constexpr uint32_t PF_Mul16(uint32_t a, uint32_t b) {
-    return (a * b + 16383) >> 15;
-}
+constexpr uint32_t PF_Mul16(uint32_t a, uint32_t b) { return (a * b + 16383) >> 15; }
 
 // The host's exact conversions between depths: 255 maps to 32768 and 1.0f to 32768.
-constexpr uint16_t PF_8To16(uint32_t c) {
-    return static_cast<uint16_t>((c * 0x808080u + 33200u) >> 16);
-}
-constexpr uint16_t PF_FloatTo16(float c) {
-    return static_cast<uint16_t>(c * 32768.0f + 0.5f);
-}
+constexpr uint16_t PF_8To16(uint32_t c) { return static_cast<uint16_t>((c * 0x808080u + 33200u) >> 16); }
+constexpr uint16_t PF_FloatTo16(float c) { return static_cast<uint16_t>(c * 32768.0f + 0.5f); }

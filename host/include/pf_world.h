@@ -58,8 +58,7 @@ public:
 
     template <class P>
     P* Row(int32_t y) const {
-        return reinterpret_cast<P*>(static_cast<char*>(data) +
-                                    static_cast<ptrdiff_t>(y) * rowBytes);
+        return reinterpret_cast<P*>(static_cast<char*>(data) + static_cast<ptrdiff_t>(y) * rowBytes);
     }
     template <class P>
     P* PixelAt(int32_t x, int32_t y) const {

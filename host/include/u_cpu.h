@@ -4,9 +4,9 @@
 #include <cstdint>
 
 struct U_CPU_Data {
-    int32_t processorCount;  // logical processors this process may use
+    int32_t processorCount;   // logical processors this process may use
     int32_t reserved;
-    int32_t hasVectorUnits;  // non-zero when SSE4.1 is there: the renderer's vector paths
+    int32_t hasVectorUnits;   // non-zero when SSE4.1 is there: the renderer's vector paths
 };
 
 const U_CPU_Data* U_G_CPU_DataP();

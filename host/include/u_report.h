@@ -10,8 +10,8 @@ inline constexpr int32_t kU_ErrInternal = 0x13A80003;
 struct U_Report {
     enum class Kind { kErrorString, kFailedVerification, kException, kMath };
     Kind kind;
-    int32_t code;      // the error code reported with the text
-    int32_t severity;  // the host's severity (4 warning, 8 error) or the source line
+    int32_t code;     // the error code reported with the text
+    int32_t severity; // the host's severity (4 warning, 8 error) or the source line
     const char* text;
 };
 

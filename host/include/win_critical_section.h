@@ -26,9 +26,7 @@ inline void EnterCriticalSection(CRITICAL_SECTION* section) {
     pthread_mutex_lock(&section->mutex);
 }
 
-inline void LeaveCriticalSection(CRITICAL_SECTION* section) {
-    pthread_mutex_unlock(&section->mutex);
-}
+inline void LeaveCriticalSection(CRITICAL_SECTION* section) { pthread_mutex_unlock(&section->mutex); }
 
 inline void DeleteCriticalSection(CRITICAL_SECTION* section) {
     pthread_mutex_destroy(&section->mutex);

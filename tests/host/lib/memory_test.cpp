@@ -50,9 +50,7 @@ TEST(Memory, PurgeLoopRetriesOnceAfterPurging) {
         U_FailAllocationAfter(c.failAfter);
         U_PurgeRecord record;
         record.count = 4;
-        EXPECT_EQ(U_PurgeLoop(
-                      4 * sizeof(int), [](void* e) { *static_cast<int*>(e) = 7; }, &record, 0),
-                  0);
+        EXPECT_EQ(U_PurgeLoop(4 * sizeof(int), [](void* e) { *static_cast<int*>(e) = 7; }, &record, 0), 0);
         EXPECT_EQ(record.array != nullptr, c.succeeds);
         EXPECT_EQ(gPurges, c.purges);
         ASSERT_NE(record.array, nullptr);

@@ -110,7 +110,6 @@ TEST(SummedAreaTable, EmptyBoxesAreTransparent) {
 }
 
 TEST(SummedAreaTable, MemoryIsAccountedAndReturned) {
-    int64_t start = U_AccountedBytes();
     PF_WorldX<PF_PixelFloat> world(10, 6);
     int64_t withWorld = U_AccountedBytes();
     {
@@ -126,7 +125,6 @@ TEST(SummedAreaTable, MemoryIsAccountedAndReturned) {
                                                       nullptr, false),
                  std::bad_alloc);
     EXPECT_EQ(U_AccountedBytes(), withWorld);
-    (void)start;
 }
 
 template <class P>
