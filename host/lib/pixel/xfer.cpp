@@ -12,6 +12,7 @@
 #include <emmintrin.h>
 
 #include "blend_formulas.h"
+#include "pf_vec4.h"
 #include "pf_xfer.h"
 
 namespace {
@@ -128,9 +129,11 @@ uint32_t MulRound(uint32_t a, uint32_t b) {
 
 // Normal mode on integer channels, rounded to nearest (halves up) in every case.
 template <class P>
-[[gnu::always_inline]] inline void NormalInteger(const P& s, uint32_t as, P& d) {
+[[gnu::always_inline]] inline void NormalInteger(const P& s, PF_XferOpacity<P> opacity, P& d) {
     using C = typename PF_PixelTraits<P>::Channel;
     constexpr uint32_t kMax = PF_PixelTraits<P>::kMaxInt;
+    uint32_t as = opacity == kMax ? s.alpha : MulRound<P>(s.alpha, opacity);
+    if (!as) return;
     if (as == kMax) {
         d = s;
         return;
@@ -159,6 +162,20 @@ template <class P>
          over(s.green, d.green), over(s.blue, d.blue)};
 }
 
+// Normal mode on float pixels: the general compositing with the blend formula folded away.
+[[gnu::always_inline]] inline void NormalFloat(const PF_PixelFloat& s, float opacity,
+                                               PF_PixelFloat& d) {
+    float as = std::clamp(s.alpha, 0.0f, 1.0f) * std::clamp(opacity, 0.0f, 1.0f);
+    float wB = d.alpha * (1.0f - as), ao = as + wB;
+    if (!(ao > 0.0f)) {
+        d = {0.0f, 0.0f, 0.0f, 0.0f};
+        return;
+    }
+    PF_Float4 c = (_mm_loadu_ps(&s.alpha) * as + _mm_loadu_ps(&d.alpha) * wB) * (1.0f / ao);
+    c[0] = std::min(ao, 1.0f);
+    _mm_storeu_ps(&d.alpha, c);
+}
+
 // True when the blend leaves the destination as it is.
 template <class P, int kMode>
 bool LeavesDestination(const P& s, PF_XferOpacity<P> opacity) {
@@ -170,8 +187,7 @@ template <class P, int kMode>
 void BlendDirect(const P& s, PF_XferOpacity<P> opacity, P& d) {
     using Traits = PF_PixelTraits<P>;
     if constexpr (kMode == kNormal && !Traits::kIsFloat) {
-        uint32_t as = opacity == Traits::kMaxInt ? s.alpha : MulRound<P>(s.alpha, opacity);
-        if (as) NormalInteger(s, as, d);
+        NormalInteger(s, opacity, d);
     } else {
         constexpr float k = 1.0f / Traits::kMax;
         float o = std::clamp(opacity * k, 0.0f, 1.0f);
@@ -228,10 +244,17 @@ template <class P, int kMode>
 [[gnu::always_inline]] inline void Apply(const P* src, const PF_LinearBlendingTables* tables,
                                          PF_XferOpacity<P> opacity, P* dst) {
     if (LeavesDestination<P, kMode>(*src, opacity)) return;
-    if (tables)
+    if (tables) {
         ApplyLinear<P, kMode>(*src, *tables, opacity, dst);
-    else
+    } else if constexpr (kMode == kNormal) {
+        // Most of the renderer's blending: inlined here, where the opacity may be a constant.
+        if constexpr (PF_PixelTraits<P>::kIsFloat)
+            NormalFloat(*src, opacity, *dst);
+        else
+            NormalInteger(*src, opacity, *dst);
+    } else {
         BlendDirect<P, kMode>(*src, opacity, *dst);
+    }
 }
 
 template <class P, int kMode>
