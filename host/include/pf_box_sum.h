@@ -32,6 +32,19 @@ inline PF_BoxAxis PF_MakeBoxAxis(float a, float b, int32_t size) {
             {std::min(first + 1.0f, b) - a, 1.0f, std::max(b - last, 0.0f)}};
 }
 
+// The same for a box given in 16.16 fixed point: integer steps throughout, short to compute.
+inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
+    constexpr float kUnit = 1.0f / 65536.0f;
+    int64_t limit = int64_t(size) << 16;
+    lo = std::min(limit, std::max(int64_t(0), lo));
+    hi = std::min(limit, std::max(lo, hi));
+    int64_t first = lo >> 16, last = std::max(hi >> 16, first + 1);
+    auto e0 = static_cast<int32_t>(first), e2 = static_cast<int32_t>(last);
+    return {{e0, std::min(e0 + 1, size), std::min(e2, size), std::min(e2 + 1, size)},
+            {static_cast<float>(std::min((first + 1) << 16, hi) - lo) * kUnit, 1.0f,
+             static_cast<float>(std::max(hi - (last << 16), int64_t(0))) * kUnit}};
+}
+
 // Table cells that hold unsigned sums modulo 2^32: differences are exact as long as the box's
 // true sum stays below 2^32. kBelow2To31 says the caller knows it stays below 2^31, where the
 // conversion to float is a single instruction.

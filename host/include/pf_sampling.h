@@ -139,13 +139,12 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     using Traits = PF_PixelTraits<P>;
     const PF_World& w = *pb.src;
     const PF_AreaTable& table = PF_AreaTableOf<P>(w);
-    float rx = static_cast<float>(std::clamp(pb.xRadius, 32768, kMaxAreaRadius)) * kFixedToTexels;
-    float ry = static_cast<float>(std::clamp(pb.yRadius, 32768, kMaxAreaRadius)) * kFixedToTexels;
+    int64_t rx = std::clamp(pb.xRadius, 32768, kMaxAreaRadius);
+    int64_t ry = std::clamp(pb.yRadius, 32768, kMaxAreaRadius);
     // Texel centres at integers become edges at integers.
-    float cx = static_cast<float>(x) * kFixedToTexels + 0.5f;
-    float cy = static_cast<float>(y) * kFixedToTexels + 0.5f;
-    PF_BoxAxis ax = PF_MakeBoxAxis(cx - rx, cx + rx, w.width);
-    PF_BoxAxis ay = PF_MakeBoxAxis(cy - ry, cy + ry, w.height);
+    int64_t cx = int64_t(x) + 32768, cy = int64_t(y) + 32768;
+    PF_BoxAxis ax = PF_MakeBoxAxisFixed(cx - rx, cx + rx, w.width);
+    PF_BoxAxis ay = PF_MakeBoxAxisFixed(cy - ry, cy + ry, w.height);
     PF_Float4 sum;
     if constexpr (Traits::kIsFloat) {
         using Cells = PF_BoxCellsPixel<PF_PixelDouble>;
@@ -161,7 +160,9 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
         sum = texels <= 33025 ? PF_BoxSum<PF_BoxCellsUint<true>>(cells, table.Stride(), ax, ay)
                               : PF_BoxSum<PF_BoxCellsUint<false>>(cells, table.Stride(), ax, ay);
     }
-    PF_StorePremultiplied(sum * (1.0f / (4.0f * rx * ry)), out);
+    float area =
+        4.0f * static_cast<float>(rx) * static_cast<float>(ry) * (kFixedToTexels * kFixedToTexels);
+    PF_StorePremultiplied(sum, out, 1.0f / area);
 }
 
 // The host's entry points, by the names the renderer calls. progress is not used (pass null).
