@@ -112,22 +112,23 @@ inline void PF_SubpixelBicubic(int32_t x, int32_t y, const PF_SampPB& pb, P* out
     float wx[4], wy[4];
     CubicWeights(static_cast<float>(x & 0xFFFF) * kFixedToTexels, wx);
     CubicWeights(static_cast<float>(y & 0xFFFF) * kFixedToTexels, wy);
-    PF_Float4 sum = {0.0f, 0.0f, 0.0f, 0.0f};
+    // Sums are taken in pairs so that few additions wait on each other.
+    PF_Float4 rows[4];
     if (ix >= 0 && iy >= 0 && ix + 3 < w.width && iy + 3 < w.height) {
         for (int j = 0; j < 4; ++j) {
             PF_Float4 t[4];
             PF_LoadPremultipliedRow<4>(w.PixelAt<P>(ix, iy + j), t);
-            sum += (t[0] * wx[0] + t[1] * wx[1] + t[2] * wx[2] + t[3] * wx[3]) * wy[j];
+            rows[j] = (t[0] * wx[0] + t[1] * wx[1]) + (t[2] * wx[2] + t[3] * wx[3]);
         }
     } else {
         for (int j = 0; j < 4; ++j) {
-            PF_Float4 r = {0.0f, 0.0f, 0.0f, 0.0f};
+            rows[j] = PF_Float4{0.0f, 0.0f, 0.0f, 0.0f};
             for (int i = 0; i < 4; ++i)
-                r += TexelOrClear<P>(w, ix + i, iy + j) * wx[i];
-            sum += r * wy[j];
+                rows[j] += TexelOrClear<P>(w, ix + i, iy + j) * wx[i];
         }
     }
-    PF_StorePremultiplied(sum, out);
+    PF_StorePremultiplied((rows[0] * wy[0] + rows[1] * wy[1]) + (rows[2] * wy[2] + rows[3] * wy[3]),
+                          out);
 }
 
 // Box average of the texels over [x − xRadius, x + xRadius] × [y − yRadius, y + yRadius], texel

@@ -48,31 +48,6 @@ inline void PF_LoadPremultipliedRow(const P* texels, PF_Float4* out) {
         out[i] = PF_LoadPremultiplied(texels[i]);
 }
 
-// 8-bit texels premultiply exactly in 16-bit lanes (255 × 255 fits), two texels at a time.
-template <int N>
-inline void PF_LoadPremultipliedRow(const PF_Pixel8* texels, PF_Float4* out) {
-    const __m128i zero = _mm_setzero_si128();
-    // Multipliers (1, a, a, a) per texel: alpha spread over its texel, 1 in the alpha lane.
-    const __m128i alphaLanes = _mm_set_epi16(0, 0, 0, -1, 0, 0, 0, -1);
-    const __m128i ones = _mm_set_epi16(0, 0, 0, 1, 0, 0, 0, 1);
-    auto premultiplyPair = [&](__m128i shorts, PF_Float4* pair) {
-        __m128i alpha = _mm_shufflehi_epi16(_mm_shufflelo_epi16(shorts, 0), 0);
-        alpha = _mm_or_si128(_mm_andnot_si128(alphaLanes, alpha), ones);
-        __m128i premultiplied = _mm_mullo_epi16(shorts, alpha);
-        pair[0] = _mm_cvtepi32_ps(_mm_unpacklo_epi16(premultiplied, zero));
-        pair[1] = _mm_cvtepi32_ps(_mm_unpackhi_epi16(premultiplied, zero));
-    };
-    if constexpr (N == 2) {
-        __m128i bytes = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(texels));
-        premultiplyPair(_mm_unpacklo_epi8(bytes, zero), out);
-    } else {
-        static_assert(N == 4);
-        __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i*>(texels));
-        premultiplyPair(_mm_unpacklo_epi8(bytes, zero), out);
-        premultiplyPair(_mm_unpackhi_epi8(bytes, zero), out + 2);
-    }
-}
-
 // Writes a premultiplied value (alpha, alpha × colour in channel units) as a straight pixel,
 // its alpha scaled by alphaScale (colour is a ratio: the scale does not change it). Integer
 // channels are rounded and kept in range; float alpha is kept in 0..1 and float colour keeps
