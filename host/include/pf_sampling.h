@@ -21,8 +21,8 @@ struct PF_SampPB {
 
 // Premultiplied prefix sums of one texture, so that a box average costs the same at any size.
 // Integer textures keep exact sums of alpha and alpha × colour, modulo 2^32 for 8-bit and 2^64
-// for 16-bit; float textures keep double sums. Cell (x, y) of
-// (width + 1) × (height + 1) holds the sum over texels [0, x) × [0, y).
+// for 16-bit; float textures keep double sums. Cell (x, y) of (width + 1) × (height + 1) holds
+// the sum over texels [0, x) × [0, y).
 class PF_AreaTable {
 public:
     int32_t width = 0;

@@ -73,6 +73,22 @@ TEST(LinearBlendingTables, FollowTheirCurves) {
     EXPECT_FLOAT_EQ(t.fromLinearExponent, 1.0f / 2.2f);
 }
 
+// 16-bit codes read the forward table between its entries in steps of 1/32768 of a code.
+TEST(LinearBlendingTables, SixteenBitCodesInterpolate) {
+    PF_LinearBlendingTables t;
+    PF_BuildLinearBlendingTablesSRGB(&t);
+    EXPECT_EQ(PF_LinearFrom16(t, 32768), t.forward[255]);
+    EXPECT_EQ(PF_LinearFrom16(t, 0), t.forward[0]);
+    // 16384 × 255 / 32768 = 127.5: halfway between entries 127 and 128.
+    EXPECT_EQ(PF_LinearFrom16(t, 16384),
+              t.forward[127] + (t.forward[128] - t.forward[127] + 1) / 2);
+    // The inverse table in steps of 8: 8 × 2048 = 16384 is entry 2048; 16388 lies halfway on.
+    EXPECT_EQ(PF_LinearTo16(t, 16384), t.inverse[2048]);
+    EXPECT_EQ(PF_LinearTo16(t, 16388),
+              t.inverse[2048] + (t.inverse[2049] - t.inverse[2048] + 1) / 2);
+    EXPECT_EQ(PF_LinearTo16(t, 32768), 32768u);
+}
+
 // With tables, 8- and 16-bit blends mix light, not code values: black at half opacity over
 // white gives linear 0.5, which sRGB writes as code 188 (0.7354 × 255 = 187.5).
 TEST(LinearBlendingTables, BlendsHappenInLinearLight) {

@@ -196,6 +196,24 @@ TYPED_TEST(Samplers, AreaSampleIsTheBoxAverage) {
     }
 }
 
+// A float texel that is not a number must not spoil every box after it in the table.
+TEST(AreaTable, FloatTexelsThatAreNotNumbersAddNothing) {
+    PF_WorldX<PF_PixelFloat> world(8, 8);
+    for (int32_t y = 0; y < 8; ++y) {
+        for (int32_t x = 0; x < 8; ++x)
+            world.At(x, y) = {1, 0.5f, 0.5f, 0.5f};
+    }
+    world.At(1, 1).red = std::nanf("");
+    world.At(2, 1).alpha = INFINITY;
+    PF_SampPB pb;
+    pb.src = &world;
+    pb.xRadius = pb.yRadius = 2 * kOne;
+    PF_PixelFloat out;
+    PF_AreaSample(5 * kOne, 5 * kOne, pb, &out);
+    EXPECT_FLOAT_EQ(out.alpha, 1.0f);
+    EXPECT_FLOAT_EQ(out.red, 0.5f);
+}
+
 TEST(AreaTable, LivesAndDiesWithItsWorld) {
     int64_t start = U_AccountedBytes();
     {
