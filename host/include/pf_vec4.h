@@ -48,24 +48,12 @@ inline void PF_LoadPremultipliedRow(const P* texels, PF_Float4* out) {
         out[i] = PF_LoadPremultiplied(texels[i]);
 }
 
-// Writes a premultiplied value (alpha, alpha × colour in channel units) as a straight pixel,
-// its alpha scaled by alphaScale (colour is a ratio: the scale does not change it). Integer
-// channels are rounded and kept in range; float alpha is kept in 0..1 and float colour keeps
-// its extended range. A pixel without alpha is transparent black.
+// Writes channel values in channel units: integer channels clamped to their range and rounded,
+// float channels as they are.
 template <class P>
-inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaScale = 1.0f) {
+inline void PF_StoreChannels(PF_Float4 c, P* out) {
     using Traits = PF_PixelTraits<P>;
-    float a = v[0] * alphaScale;
-    constexpr float kMinAlpha = Traits::kIsFloat ? 0.0f : 0.5f;
-    if (!(a > kMinAlpha)) {
-        *out = P{};
-        return;
-    }
-    // (alphaScale, 1/alpha, 1/alpha, 1/alpha)
-    PF_Float4 inverse = _mm_div_ss(_mm_set_ss(1.0f), v);
-    PF_Float4 c = v * _mm_move_ss(_mm_shuffle_ps(inverse, inverse, 0), _mm_set_ss(alphaScale));
     if constexpr (Traits::kIsFloat) {
-        c[0] = a < 1.0f ? a : 1.0f;
         _mm_storeu_ps(&out->alpha, c);
     } else {
         c = _mm_min_ps(_mm_max_ps(c, _mm_setzero_ps()), _mm_set1_ps(Traits::kMax));
@@ -82,4 +70,24 @@ inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaScale = 1.0f) 
             _mm_storel_epi64(reinterpret_cast<__m128i*>(out), shorts);
         }
     }
+}
+
+// Writes a premultiplied value (alpha, alpha × colour in channel units) as a straight pixel,
+// its alpha scaled by alphaScale (colour is a ratio: the scale does not change it). Integer
+// channels are rounded and kept in range; float alpha is kept in 0..1 and float colour keeps
+// its extended range. A pixel without alpha is transparent black.
+template <class P>
+inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaScale = 1.0f) {
+    using Traits = PF_PixelTraits<P>;
+    float a = v[0] * alphaScale;
+    constexpr float kMinAlpha = Traits::kIsFloat ? 0.0f : 0.5f;
+    if (!(a > kMinAlpha)) {
+        *out = P{};
+        return;
+    }
+    // (alphaScale, 1/alpha, 1/alpha, 1/alpha)
+    PF_Float4 inverse = _mm_div_ss(_mm_set_ss(1.0f), v);
+    PF_Float4 c = v * _mm_move_ss(_mm_shuffle_ps(inverse, inverse, 0), _mm_set_ss(alphaScale));
+    if constexpr (Traits::kIsFloat) c[0] = a < 1.0f ? a : 1.0f;
+    PF_StoreChannels(c, out);
 }

@@ -19,42 +19,42 @@ namespace {
 
 using namespace pf_blend;
 
-struct Unit {
-    float a, r, g, b;
-};
+// Channels normalised to 0..1 (float pixels may lie outside), in pixel order.
+using Unit = PF_Float4;
 
 template <class P>
 Unit ToUnit(const P& p) {
-    constexpr float k = 1.0f / PF_PixelTraits<P>::kMax;
-    return {p.alpha * k, p.red * k, p.green * k, p.blue * k};
+    return PF_LoadFloat4(p) * (1.0f / PF_PixelTraits<P>::kMax);
 }
 
 template <class P>
-void FromUnit(const Unit& u, P& p) {
-    using Traits = PF_PixelTraits<P>;
-    if constexpr (Traits::kIsFloat) {
-        p = {std::clamp(u.a, 0.0f, 1.0f), u.r, u.g, u.b};
+void FromUnit(Unit u, P& p) {
+    if constexpr (PF_PixelTraits<P>::kIsFloat) u[0] = std::clamp(u[0], 0.0f, 1.0f);
+    PF_StoreChannels(u * PF_PixelTraits<P>::kMax, &p);
+}
+
+// Straight result of premultiplied colour over alpha ao.
+inline Unit Straight(float ao, Unit premultiplied) {
+    if (!(ao > 0.0f)) return Unit{0.0f, 0.0f, 0.0f, 0.0f};
+    Unit c = premultiplied * (1.0f / ao);
+    c[0] = ao;
+    return c;
+}
+
+// The blend formula of a mode on the colour lanes.
+template <int kMode>
+Unit Blend(Unit cb, Unit cs) {
+    if constexpr (IsNonSeparable(kMode)) {
+        Rgb c = NonSeparable<kMode>({cb[1], cb[2], cb[3]}, {cs[1], cs[2], cs[3]});
+        return Unit{0.0f, c.r, c.g, c.b};
+    } else if constexpr (kMode == kMultiply) {
+        return cb * cs;  // the formula, all lanes at once
+    } else if constexpr (kMode == kScreen) {
+        return cb + cs - cb * cs;
     } else {
-        using C = typename Traits::Channel;
-        auto round = [](float v) {
-            return static_cast<C>(std::clamp(v, 0.0f, 1.0f) * Traits::kMax + 0.5f);
-        };
-        p = {round(u.a), round(u.r), round(u.g), round(u.b)};
+        return Unit{0.0f, Separable<kMode>(cb[1], cs[1]), Separable<kMode>(cb[2], cs[2]),
+                    Separable<kMode>(cb[3], cs[3])};
     }
-}
-
-// Source alpha times opacity in unit range.
-template <class P>
-float SourceAlpha(const P& s, PF_XferOpacity<P> opacity) {
-    constexpr float k = 1.0f / PF_PixelTraits<P>::kMax;
-    return std::clamp(s.alpha * k, 0.0f, 1.0f) * std::clamp(opacity * k, 0.0f, 1.0f);
-}
-
-// Straight result of premultiplied colour c over alpha ao.
-inline Unit Straight(float ao, float r, float g, float b) {
-    if (ao <= 0.0f) return {0.0f, 0.0f, 0.0f, 0.0f};
-    float inv = 1.0f / ao;
-    return {ao, r * inv, g * inv, b * inv};
 }
 
 template <int kMode>
@@ -62,30 +62,20 @@ Unit Composite(Unit s, float opacity, Unit d) {
     if constexpr (kMode == kCopy) {
         // Opacity is coverage: the copy replaces that share of the pixel.
         if (opacity >= 1.0f) return s;
-        float ws = s.a * opacity, wd = d.a * (1.0f - opacity);
-        return Straight(ws + wd, ws * s.r + wd * d.r, ws * s.g + wd * d.g, ws * s.b + wd * d.b);
+        float ws = s[0] * opacity, wd = d[0] * (1.0f - opacity);
+        return Straight(ws + wd, s * ws + d * wd);
     } else {
-        float as = std::clamp(s.a, 0.0f, 1.0f) * opacity, ab = d.a;
+        float as = std::clamp(s[0], 0.0f, 1.0f) * opacity, ab = d[0];
         if constexpr (kMode == kBehind) {
             float ws = as * (1.0f - ab);
-            return Straight(ab + ws, ab * d.r + ws * s.r, ab * d.g + ws * s.g, ab * d.b + ws * s.b);
+            return Straight(ab + ws, d * ab + s * ws);
         } else if constexpr (kMode == kAdd) {
             // Sum of the premultiplied colours, capped at full intensity.
             float ao = std::min(1.0f, as + ab);
-            auto sum = [&](float cs, float cb) { return std::min(ao, as * cs + ab * cb); };
-            return Straight(ao, sum(s.r, d.r), sum(s.g, d.g), sum(s.b, d.b));
+            return Straight(ao, _mm_min_ps(s * as + d * ab, _mm_set1_ps(ao)));
         } else {
             float wS = as * (1.0f - ab), wBoth = as * ab, wB = (1.0f - as) * ab;
-            Rgb blended;
-            if constexpr (IsNonSeparable(kMode)) {
-                blended = NonSeparable<kMode>({d.r, d.g, d.b}, {s.r, s.g, s.b});
-            } else {
-                blended = {Separable<kMode>(d.r, s.r), Separable<kMode>(d.g, s.g),
-                           Separable<kMode>(d.b, s.b)};
-            }
-            return Straight(as + wB, wS * s.r + wBoth * blended.r + wB * d.r,
-                            wS * s.g + wBoth * blended.g + wB * d.g,
-                            wS * s.b + wBoth * blended.b + wB * d.b);
+            return Straight(as + wB, s * wS + Blend<kMode>(d, s) * wBoth + d * wB);
         }
     }
 }
