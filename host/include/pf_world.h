@@ -1,6 +1,7 @@
 // Worlds: the host's pixel rectangles. Destination, textures and mattes are all worlds.
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 
@@ -18,6 +19,32 @@ public:
 // 16-bit and float variants, named so that a reader of the class sees the family.
 template <class A, class B, class C>
 class PF_PixelContainer : public PF_PixelContainerBase, public U_MemTrackedObject {};
+
+class PF_AreaTable;
+
+// The sampling tables the pixel library builds for a world on first use (area sampling's
+// summed-area table). They describe the world they sit in: a copy or an assigned world starts
+// without them, and they are freed with the world.
+class PF_WorldSamplingTables {
+public:
+    PF_WorldSamplingTables() = default;
+    PF_WorldSamplingTables(const PF_WorldSamplingTables&) noexcept {}
+    PF_WorldSamplingTables& operator=(const PF_WorldSamplingTables&) noexcept {
+        Drop();
+        return *this;
+    }
+    ~PF_WorldSamplingTables() { Drop(); }
+
+    // Frees the tables. Call it when the world's pixels change, while no sampler reads it.
+    void Drop() noexcept {
+        if (area.load(std::memory_order_relaxed)) Free();
+    }
+
+    std::atomic<const PF_AreaTable*> area{nullptr};
+
+private:
+    void Free() noexcept;
+};
 
 // A view of pixels owned elsewhere (or by PF_WorldX below): width × height pixels, rows
 // rowBytes apart, of the depth bitDepth (8, 16 or 32).
@@ -44,6 +71,7 @@ public:
     int32_t rowBytes = 0;
     int16_t bitDepth = 0;
     void* data = nullptr;
+    mutable PF_WorldSamplingTables samplingTables;
 };
 
 // A world that owns its pixels: allocated through the host's accounted allocator and

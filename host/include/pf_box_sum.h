@@ -1,0 +1,135 @@
+// Box sums with fractional edges over a summed-area table, at constant cost whatever the box
+// size: the shared core of area sampling and the summed-area table samplers.
+#pragma once
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <cstdint>
+#include <type_traits>
+
+#include "pf_pixel.h"
+#include "pf_vec4.h"
+
+// One axis of a box: four texel edges (clamped to the table) and the weights of the three
+// ranges between them: the partly covered first texel, the whole texels, the partly covered
+// last texel. Ranges outside the texture come out empty, which makes outside transparent.
+struct PF_BoxAxis {
+    int32_t edge[4];
+    float weight[3];
+};
+
+// The box [a, b] in edge coordinates, where texel i covers [i, i + 1), over size texels. The
+// box is first cut to the texture, as what lies outside adds nothing.
+inline PF_BoxAxis PF_MakeBoxAxis(float a, float b, int32_t size) {
+    float limit = static_cast<float>(size);
+    a = std::min(limit, std::max(0.0f, a));
+    b = std::min(limit, std::max(a, b));
+    float first = std::floor(a), last = std::max(std::floor(b), first + 1.0f);
+    auto e0 = static_cast<int32_t>(first), e2 = static_cast<int32_t>(last);
+    // Inside one texel the last range is empty and its weight zero.
+    return {{e0, std::min(e0 + 1, size), std::min(e2, size), std::min(e2 + 1, size)},
+            {std::min(first + 1.0f, b) - a, 1.0f, std::max(b - last, 0.0f)}};
+}
+
+// The same for a box given in 16.16 fixed point: integer steps throughout, short to compute.
+inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
+    constexpr float kUnit = 1.0f / 65536.0f;
+    int64_t limit = int64_t(size) << 16;
+    lo = std::min(limit, std::max(int64_t(0), lo));
+    hi = std::min(limit, std::max(lo, hi));
+    int64_t first = lo >> 16, last = std::max(hi >> 16, first + 1);
+    auto e0 = static_cast<int32_t>(first), e2 = static_cast<int32_t>(last);
+    return {{e0, std::min(e0 + 1, size), std::min(e2, size), std::min(e2 + 1, size)},
+            {static_cast<float>(std::min((first + 1) << 16, hi) - lo) * kUnit, 1.0f,
+             static_cast<float>(std::max(hi - (last << 16), int64_t(0))) * kUnit}};
+}
+
+// Table cells that hold unsigned sums modulo 2^32: differences are exact as long as the box's
+// true sum stays below 2^32. kBelow2To31 says the caller knows it stays below 2^31, where the
+// conversion to float is a single instruction.
+template <bool kBelow2To31>
+struct PF_BoxCellsUint {
+    using Cell = PF_Uint4;
+    using Acc = PF_Float4;
+    static Cell Sub(Cell a, Cell b) { return a - b; }
+    static Acc Widen(Cell r) {
+        if constexpr (kBelow2To31) {
+            return _mm_cvtepi32_ps(reinterpret_cast<__m128i>(r));
+        } else {
+            // High and low halves convert exactly; their sum rounds once.
+            PF_Float4 high = _mm_cvtepi32_ps(reinterpret_cast<__m128i>(r >> 16));
+            PF_Float4 low = _mm_cvtepi32_ps(reinterpret_cast<__m128i>(r & 0xFFFF));
+            return high * 65536.0f + low;
+        }
+    }
+    static PF_Float4 ToFloat4(Acc acc) { return acc; }
+};
+
+// 64-bit sums of 16-bit premultiplied texels, modulo 2^64 like the 32-bit ones.
+struct PF_AreaSum64 {
+    uint64_t alpha, red, green, blue;
+};
+
+// Four doubles with the arithmetic the box sum needs.
+struct PF_Double4 {
+    double v[4];
+    PF_Double4 operator+(const PF_Double4& o) const {
+        return {{v[0] + o.v[0], v[1] + o.v[1], v[2] + o.v[2], v[3] + o.v[3]}};
+    }
+    PF_Double4 operator*(float w) const { return {{v[0] * w, v[1] * w, v[2] * w, v[3] * w}}; }
+};
+
+// Table cells with named channels: float sums accumulate in float, double and 64-bit integer
+// sums in double.
+template <class Pixel>
+struct PF_BoxCellsPixel {
+    using Cell = Pixel;
+    using Value = decltype(Pixel::alpha);
+    static constexpr bool kFloat = std::is_same_v<Value, float>;
+    using Acc = std::conditional_t<kFloat, PF_Float4, PF_Double4>;
+    static Cell Sub(const Cell& a, const Cell& b) {
+        return {a.alpha - b.alpha, a.red - b.red, a.green - b.green, a.blue - b.blue};
+    }
+    static Acc Widen(const Cell& r) {
+        if constexpr (kFloat) {
+            return PF_Float4{r.alpha, r.red, r.green, r.blue};
+        } else {
+            return {{double(r.alpha), double(r.red), double(r.green), double(r.blue)}};
+        }
+    }
+    static PF_Float4 ToFloat4(const Acc& acc) {
+        if constexpr (kFloat) {
+            return acc;
+        } else {
+            return PF_Float4{float(acc.v[0]), float(acc.v[1]), float(acc.v[2]), float(acc.v[3])};
+        }
+    }
+};
+
+// Weighted sum over the box of a table whose cell (x, y), stride cells per row, holds the sum
+// of the texels [0, x) × [0, y). Every difference is taken against the box's first row and
+// column, so it sums texels inside the box only: small, and exact for integer cells.
+template <class Cells>
+inline PF_Float4 PF_BoxSum(const typename Cells::Cell* table, ptrdiff_t stride,
+                           const PF_BoxAxis& ax, const PF_BoxAxis& ay) {
+    using Cell = typename Cells::Cell;
+    // Weights of the box's corners (x1, x2, x3 and y1, y2, y3) from those of its ranges.
+    const float cx[3] = {ax.weight[0] - ax.weight[1], ax.weight[1] - ax.weight[2], ax.weight[2]};
+    const float cy[3] = {ay.weight[0] - ay.weight[1], ay.weight[1] - ay.weight[2], ay.weight[2]};
+    const Cell* top = table + ay.edge[0] * stride;
+    const Cell t0 = top[ax.edge[0]], t1 = top[ax.edge[1]], t2 = top[ax.edge[2]],
+               t3 = top[ax.edge[3]];
+    typename Cells::Acc rows[3];
+    for (int l = 1; l < 4; ++l) {
+        const Cell* row = table + ay.edge[l] * stride;
+        // Sums over [x0, xk) × [y0, yl).
+        Cell left = Cells::Sub(row[ax.edge[0]], t0);
+        auto box = [&](int32_t k, const Cell& t) {
+            return Cells::Widen(Cells::Sub(Cells::Sub(row[ax.edge[k]], t), left));
+        };
+        rows[l - 1] = (box(1, t1) * cx[0] + box(2, t2) * cx[1]) + box(3, t3) * cx[2];
+    }
+    typename Cells::Acc sum = (rows[0] * cy[0] + rows[1] * cy[1]) + rows[2] * cy[2];
+    return Cells::ToFloat4(sum);
+}

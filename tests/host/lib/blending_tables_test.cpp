@@ -1,0 +1,118 @@
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <string>
+
+#include "pf_xfer.h"
+
+namespace {
+
+struct Curve {
+    const char* name;
+    float gamma;  // 0: sRGB
+};
+
+const Curve kCurves[] = {{"sRGB", 0.0f},      {"gamma 1.0", 1.0f}, {"gamma 1.8", 1.8f},
+                         {"gamma 2.2", 2.2f}, {"gamma 2.4", 2.4f}, {"gamma 0.45", 0.45f}};
+
+PF_LinearBlendingTables Build(const Curve& c) {
+    PF_LinearBlendingTables t;
+    if (c.gamma > 0.0f)
+        PF_BuildLinearBlendingTablesGamma(c.gamma, &t);
+    else
+        PF_BuildLinearBlendingTablesSRGB(&t);
+    return t;
+}
+
+TEST(LinearBlendingTables, MembersSitWhereReadersLookForThem) {
+    PF_LinearBlendingTables t;
+    auto* base = reinterpret_cast<const char*>(&t);
+    EXPECT_EQ(reinterpret_cast<const char*>(&t.inverse[0]) - base, 256 * 2);
+    EXPECT_EQ(reinterpret_cast<const char*>(&t.toLinearExponent) - base, 8708);
+    EXPECT_EQ(reinterpret_cast<const char*>(&t.fromLinearExponent) - base, 8712);
+}
+
+TEST(LinearBlendingTables, EveryCodeSurvivesTheRoundTrip) {
+    for (const Curve& c : kCurves) {
+        PF_LinearBlendingTables t = Build(c);
+        EXPECT_EQ(t.forward[0], 0) << c.name;
+        EXPECT_EQ(t.forward[255], 32768) << c.name;
+        EXPECT_EQ(t.inverse[0], 0) << c.name;
+        EXPECT_EQ(t.inverse[4096], 32768) << c.name;
+        for (uint32_t code = 0; code < 256; ++code) {
+            EXPECT_EQ(PF_LinearTo8(t, PF_LinearFrom8(t, code)), code) << c.name;
+            if (code) {
+                EXPECT_GT(t.forward[code], t.forward[code - 1]) << c.name << " " << code;
+            }
+        }
+        // 16-bit codes come back within a few steps of 1/32768 (the tables are 8-bit fine).
+        for (uint32_t code = 0; code <= 32768; code += 7) {
+            EXPECT_NEAR(PF_LinearTo16(t, PF_LinearFrom16(t, code)), code, 16) << c.name;
+        }
+    }
+}
+
+TEST(LinearBlendingTables, FollowTheirCurves) {
+    struct Case {
+        Curve curve;
+        int code;
+        double linear;  // 0..1
+    };
+    // sRGB: code 128 is ((128/255 + 0.055)/1.055)^2.4 = 0.2158; code 10 lies on the toe:
+    // 10/255/12.92 = 0.003035. Gamma 2.2 at code 128: 0.5020^2.2 = 0.2195.
+    const Case cases[] = {{{"sRGB", 0}, 128, 0.21586},
+                          {{"sRGB", 0}, 10, 0.003035},
+                          {{"gamma 2.2", 2.2f}, 128, 0.21953},
+                          {{"gamma 1.0", 1.0f}, 51, 0.2}};
+    for (const Case& c : cases) {
+        PF_LinearBlendingTables t = Build(c.curve);
+        EXPECT_NEAR(t.forward[c.code] / 32768.0, c.linear, 1.0 / 32768) << c.curve.name;
+    }
+    PF_LinearBlendingTables t = Build({"gamma 2.2", 2.2f});
+    EXPECT_FLOAT_EQ(t.toLinearExponent, 2.2f);
+    EXPECT_FLOAT_EQ(t.fromLinearExponent, 1.0f / 2.2f);
+}
+
+// 16-bit codes read the forward table between its entries in steps of 1/32768 of a code.
+TEST(LinearBlendingTables, SixteenBitCodesInterpolate) {
+    PF_LinearBlendingTables t;
+    PF_BuildLinearBlendingTablesSRGB(&t);
+    EXPECT_EQ(PF_LinearFrom16(t, 32768), t.forward[255]);
+    EXPECT_EQ(PF_LinearFrom16(t, 0), t.forward[0]);
+    // 16384 × 255 / 32768 = 127.5: halfway between entries 127 and 128.
+    EXPECT_EQ(PF_LinearFrom16(t, 16384),
+              t.forward[127] + (t.forward[128] - t.forward[127] + 1) / 2);
+    // The inverse table in steps of 8: 8 × 2048 = 16384 is entry 2048; 16388 lies halfway on.
+    EXPECT_EQ(PF_LinearTo16(t, 16384), t.inverse[2048]);
+    EXPECT_EQ(PF_LinearTo16(t, 16388),
+              t.inverse[2048] + (t.inverse[2049] - t.inverse[2048] + 1) / 2);
+    EXPECT_EQ(PF_LinearTo16(t, 32768), 32768u);
+}
+
+// With tables, 8- and 16-bit blends mix light, not code values: black at half opacity over
+// white gives linear 0.5, which sRGB writes as code 188 (0.7354 × 255 = 187.5).
+TEST(LinearBlendingTables, BlendsHappenInLinearLight) {
+    PF_LinearBlendingTables t;
+    PF_BuildLinearBlendingTablesSRGB(&t);
+    PF_Pixel8 black8 = {128, 0, 0, 0}, white8 = {255, 255, 255, 255};
+    PF_Get_Xfer1_table8(kPF_XferNormal)(&black8, &t, &white8);
+    EXPECT_NEAR(white8.red, 188, 1);
+    EXPECT_EQ(white8.alpha, 255);
+
+    PF_Pixel16 black16 = {16384, 0, 0, 0}, white16 = {32768, 32768, 32768, 32768};
+    PF_Get_Xfer1_table16(kPF_XferNormal)(&black16, &t, &white16);
+    EXPECT_NEAR(white16.red / 32768.0, 0.7354, 0.002);
+
+    PF_PixelFloat blackF = {0.5f, 0, 0, 0}, whiteF = {1, 1, 1, 1};
+    PF_Get_Xfer1_tableF(kPF_XferNormal)(&blackF, &t, &whiteF);
+    EXPECT_NEAR(whiteF.red, std::pow(0.5, 1 / 2.2), 1e-5);
+
+    // An opaque source still hides the backdrop exactly.
+    PF_Pixel8 src = {255, 17, 130, 250}, dst = {255, 3, 4, 5};
+    PF_Get_Xfer1_table8(kPF_XferNormal)(&src, &t, &dst);
+    EXPECT_EQ(dst.red, 17);
+    EXPECT_EQ(dst.green, 130);
+    EXPECT_EQ(dst.blue, 250);
+}
+
+}  // namespace

@@ -1,0 +1,271 @@
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <set>
+#include <string>
+
+#include "host/lib/pixel_test_support.h"
+#include "pf_xfer.h"
+
+namespace {
+
+using pixel_test::FromUnit;
+using pixel_test::Step;
+using pixel_test::Unit;
+
+struct Argb {
+    float a, r, g, b;
+};
+
+template <class P>
+Argb Blend(int32_t mode, Argb src, Argb dst, const PF_LinearBlendingTables* tables = nullptr) {
+    P s = FromUnit<P>(src.a, src.r, src.g, src.b);
+    P d = FromUnit<P>(dst.a, dst.r, dst.g, dst.b);
+    PF_Get_Xfer1<P>(mode)(&s, tables, &d);
+    return {float(Unit<P>(d.alpha)), float(Unit<P>(d.red)), float(Unit<P>(d.green)),
+            float(Unit<P>(d.blue))};
+}
+
+// The value a pixel of type P holds for v.
+template <class P>
+Argb Quantised(Argb v) {
+    P p = FromUnit<P>(v.a, v.r, v.g, v.b);
+    return {float(Unit<P>(p.alpha)), float(Unit<P>(p.red)), float(Unit<P>(p.green)),
+            float(Unit<P>(p.blue))};
+}
+
+void ExpectNear(Argb got, Argb want, double tolerance, const std::string& what) {
+    EXPECT_NEAR(got.a, want.a, tolerance) << what << " alpha";
+    EXPECT_NEAR(got.r, want.r, tolerance) << what << " red";
+    EXPECT_NEAR(got.g, want.g, tolerance) << what << " green";
+    EXPECT_NEAR(got.b, want.b, tolerance) << what << " blue";
+}
+
+template <class P>
+class XferModes : public ::testing::Test {};
+using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
+TYPED_TEST_SUITE(XferModes, PixelTypes);
+
+TYPED_TEST(XferModes, Identities) {
+    using P = TypeParam;
+    const Argb dst = {0.6f, 0.2f, 0.4f, 0.8f};
+    const Argb opaqueDst = {1.0f, 0.2f, 0.4f, 0.8f};
+    const Argb src = {1.0f, 0.9f, 0.5f, 0.1f};
+    // Exact: these are the guarantees layers rely on.
+    ExpectNear(Blend<P>(kPF_XferNormal, src, dst), Quantised<P>(src), 0.0, "normal, opaque source");
+    const Argb half = {0.3f, 0.9f, 0.5f, 0.1f};
+    ExpectNear(Blend<P>(kPF_XferCopy, half, dst), Quantised<P>(half), 0.0, "copy");
+    for (int32_t mode = 1; mode < 128; ++mode) {
+        ExpectNear(Blend<P>(mode, {0.0f, 0.9f, 0.5f, 0.1f}, dst), Quantised<P>(dst), 0.0,
+                   "transparent source, mode " + std::to_string(mode));
+    }
+    for (float alpha : {1.0f, 0.5f}) {
+        ExpectNear(Blend<P>(kPF_XferMultiply, {alpha, 1.0f, 1.0f, 1.0f}, opaqueDst),
+                   Quantised<P>(opaqueDst), 0.0, "multiply by white");
+        ExpectNear(Blend<P>(PF_XferModeFromName("screen"), {alpha, 0.0f, 0.0f, 0.0f}, opaqueDst),
+                   Quantised<P>(opaqueDst), 0.0, "screen by black");
+    }
+}
+
+// Opaque source over opaque backdrop gives the blend formula itself; values picked so that
+// the published formulas can be worked by hand.
+TYPED_TEST(XferModes, FormulasOfSeparableModes) {
+    using P = TypeParam;
+    struct Case {
+        const char* mode;
+        float cb, cs, want;
+    };
+    const Case cases[] = {
+        {"normal", 0.2f, 0.6f, 0.6f},
+        {"multiply", 0.5f, 0.5f, 0.25f},
+        {"screen", 0.5f, 0.5f, 0.75f},
+        {"overlay", 0.25f, 0.5f, 0.25f},
+        {"overlay", 0.75f, 0.5f, 0.75f},
+        {"hard-light", 0.25f, 0.75f, 0.625f},
+        {"soft-light", 0.25f, 0.75f, 0.375f},
+        {"soft-light", 0.64f, 0.75f, 0.72f},
+        {"soft-light", 0.5f, 0.25f, 0.375f},
+        {"darken", 0.3f, 0.6f, 0.3f},
+        {"lighten", 0.3f, 0.6f, 0.6f},
+        {"difference", 0.3f, 0.6f, 0.3f},
+        {"color-dodge", 0.25f, 0.5f, 0.5f},
+        {"color-dodge", 0.0f, 1.0f, 0.0f},
+        {"color-burn", 0.75f, 0.5f, 0.5f},
+        {"color-burn", 1.0f, 0.0f, 1.0f},
+        {"exclusion", 0.5f, 0.5f, 0.5f},
+        {"exclusion", 0.25f, 1.0f, 0.75f},
+        {"subtract", 0.6f, 0.2f, 0.4f},
+        {"subtract", 0.2f, 0.6f, 0.0f},
+        {"divide", 0.3f, 0.6f, 0.5f},
+        {"divide", 0.6f, 0.3f, 1.0f},
+        {"linear-dodge", 0.6f, 0.6f, 1.0f},
+        {"linear-dodge", 0.2f, 0.3f, 0.5f},
+        {"linear-burn", 0.6f, 0.6f, 0.2f},
+        {"linear-burn", 0.2f, 0.3f, 0.0f},
+        {"linear-light", 0.4f, 0.6f, 0.6f},
+        {"linear-light", 0.4f, 0.1f, 0.0f},
+        {"vivid-light", 0.5f, 0.75f, 1.0f},
+        {"vivid-light", 0.5f, 0.25f, 0.0f},
+        {"vivid-light", 0.8f, 0.4f, 0.75f},
+        {"pin-light", 0.2f, 0.8f, 0.6f},
+        {"pin-light", 0.6f, 0.2f, 0.4f},
+        {"hard-mix", 0.6f, 0.5f, 1.0f},
+        {"hard-mix", 0.3f, 0.5f, 0.0f},
+        {"add", 0.2f, 0.3f, 0.5f},
+        {"add", 0.6f, 0.6f, 1.0f},
+    };
+    // Integer depths quantise inputs and result; dodge and burn double the input's error.
+    double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-5 : 2.5 * Step<P>();
+    for (const Case& c : cases) {
+        int32_t mode = PF_XferModeFromName(c.mode);
+        ASSERT_GE(mode, 0) << c.mode;
+        Argb got = Blend<P>(mode, {1.0f, c.cs, c.cs, c.cs}, {1.0f, c.cb, c.cb, c.cb});
+        ExpectNear(
+            got, {1.0f, c.want, c.want, c.want}, tolerance,
+            std::string(c.mode) + " cb " + std::to_string(c.cb) + " cs " + std::to_string(c.cs));
+    }
+}
+
+TYPED_TEST(XferModes, FormulasOfNonSeparableModes) {
+    using P = TypeParam;
+    struct Case {
+        const char* mode;
+        Argb src, dst, want;
+    };
+    // Backdrop (0.2, 0.4, 0.6): luminosity 0.3·0.2 + 0.59·0.4 + 0.11·0.6 = 0.362, saturation 0.4.
+    const Argb backdrop = {1.0f, 0.2f, 0.4f, 0.6f};
+    const Case cases[] = {
+        {"luminosity", {1, 0.5f, 0.5f, 0.5f}, backdrop, {1, 0.338f, 0.538f, 0.738f}},
+        {"saturation", {1, 0.5f, 0.5f, 0.5f}, backdrop, {1, 0.362f, 0.362f, 0.362f}},
+        {"color", {1, 0.8f, 0.8f, 0.8f}, backdrop, {1, 0.362f, 0.362f, 0.362f}},
+        // Red at saturation 0.4 is (0.4, 0, 0), luminosity 0.12: lifted by 0.242.
+        {"hue", {1, 1, 0, 0}, backdrop, {1, 0.642f, 0.242f, 0.242f}},
+        {"lighter-color", {1, 0, 1, 0}, {1, 1, 0, 0}, {1, 0, 1, 0}},
+        {"darker-color", {1, 0, 1, 0}, {1, 1, 0, 0}, {1, 1, 0, 0}},
+    };
+    double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-5 : 1.5 * Step<P>();
+    for (const Case& c : cases) {
+        ExpectNear(Blend<P>(PF_XferModeFromName(c.mode), c.src, c.dst), c.want, tolerance, c.mode);
+    }
+}
+
+// Partly transparent layers: the compositing around the blend formula.
+TYPED_TEST(XferModes, TranslucentCompositing) {
+    using P = TypeParam;
+    struct Case {
+        const char* mode;
+        Argb src, dst, want;
+    };
+    const Case cases[] = {
+        // Half red over opaque blue.
+        {"normal", {0.5f, 1, 0, 0}, {1, 0, 0, 1}, {1, 0.5f, 0, 0.5f}},
+        // Halves over each other: alpha 0.75, colour (0.5·src + 0.25·dst) / 0.75.
+        {"normal", {0.5f, 0.9f, 0.3f, 0}, {0.5f, 0.3f, 0.9f, 0}, {0.75f, 0.7f, 0.5f, 0}},
+        // Multiply shows the source where the backdrop is absent: half backdrop alpha.
+        {"multiply", {1, 0.5f, 0.5f, 0.5f}, {0.5f, 0.5f, 0.5f, 0.5f}, {1, 0.375f, 0.375f, 0.375f}},
+        {"behind", {1, 1, 0, 0}, {0.5f, 0, 0, 1}, {1, 0.5f, 0, 0.5f}},
+        {"add", {0.5f, 1, 0, 0}, {0.5f, 0, 0, 1}, {1, 0.5f, 0, 0.5f}},
+        {"copy", {0.5f, 1, 0, 0}, {1, 0, 0, 1}, {0.5f, 1, 0, 0}},
+    };
+    double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-5 : 1.5 * Step<P>();
+    for (const Case& c : cases) {
+        ExpectNear(Blend<P>(PF_XferModeFromName(c.mode), c.src, c.dst), c.want, tolerance, c.mode);
+    }
+}
+
+TYPED_TEST(XferModes, OpacityScalesTheSource) {
+    using P = TypeParam;
+    using Opacity = PF_XferOpacity<P>;
+    constexpr float kMax = PF_PixelTraits<P>::kMax;
+    struct Case {
+        const char* mode;
+        float opacity;
+        Argb src, dst, want;
+    };
+    const Case cases[] = {
+        {"normal", 0.5f, {1, 1, 0, 0}, {1, 0, 0, 1}, {1, 0.5f, 0, 0.5f}},
+        {"normal", 0.0f, {1, 1, 0, 0}, {1, 0, 0, 1}, {1, 0, 0, 1}},
+        {"multiply", 0.5f, {1, 0, 0, 0}, {1, 1, 1, 1}, {1, 0.5f, 0.5f, 0.5f}},
+        // Copy replaces the covered share of the pixel.
+        {"copy", 0.25f, {1, 1, 0, 0}, {1, 0, 0, 1}, {1, 0.25f, 0, 0.75f}},
+        {"copy", 0.0f, {0, 1, 0, 0}, {1, 0, 0, 1}, {1, 0, 0, 1}},
+    };
+    double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-5 : 1.5 * Step<P>();
+    for (const Case& c : cases) {
+        P s = FromUnit<P>(c.src.a, c.src.r, c.src.g, c.src.b);
+        P d = FromUnit<P>(c.dst.a, c.dst.r, c.dst.g, c.dst.b);
+        auto opacity = static_cast<Opacity>(c.opacity * kMax);
+        PF_Get_Xfer1_Opacity<P>(PF_XferModeFromName(c.mode))(&s, nullptr, opacity, &d);
+        ExpectNear({float(Unit<P>(d.alpha)), float(Unit<P>(d.red)), float(Unit<P>(d.green)),
+                    float(Unit<P>(d.blue))},
+                   c.want, tolerance, c.mode);
+    }
+}
+
+// 8-bit, 16-bit and float blends of the same values agree within the 8-bit step (the 16-bit
+// inputs are themselves rounded). Modes with a jump (hard mix, lighter and darker colour) may
+// fall either side of it and are left out.
+TEST(XferDepths, AgreeWithinQuantisation) {
+    const float values[] = {0.0f, 0.1f, 0.3f, 0.5f, 0.7f, 1.0f};
+    const float alphas[] = {0.25f, 0.6f, 1.0f};
+    std::set<std::string> jumps = {"hard-mix", "lighter-color", "darker-color"};
+    for (int32_t i = 0; i < PF_XferModeNameCount; ++i) {
+        const PF_XferModeName& mode = PF_XferModeNames[i];
+        if (jumps.count(mode.name)) continue;
+        for (float as : alphas) {
+            for (float ab : alphas) {
+                for (float cs : values) {
+                    for (float cb : values) {
+                        Argb src = {as, cs, 1.0f - cs, 0.5f}, dst = {ab, cb, 0.5f, 1.0f - cb};
+                        // Float sees the very values the 8-bit pixel holds.
+                        auto q = [](float v) { return std::round(v * 255.0f) / 255.0f; };
+                        Argb src8 = {q(src.a), q(src.r), q(src.g), q(src.b)};
+                        Argb dst8 = {q(dst.a), q(dst.r), q(dst.g), q(dst.b)};
+                        Argb f = Blend<PF_PixelFloat>(mode.number, src8, dst8);
+                        std::string what = std::string(mode.name) + " as " + std::to_string(as) +
+                                           " ab " + std::to_string(ab) + " cs " +
+                                           std::to_string(cs) + " cb " + std::to_string(cb);
+                        ExpectNear(Blend<PF_Pixel8>(mode.number, src, dst), f, 1.01 / 255, what);
+                        ExpectNear(Blend<PF_Pixel16>(mode.number, src8, dst8), f, 1.01 / 255, what);
+                    }
+                }
+            }
+        }
+    }
+}
+
+TEST(XferModeNames, NumbersAndNamesMapBothWays) {
+    std::set<std::string> names;
+    for (int32_t i = 0; i < PF_XferModeNameCount; ++i) {
+        const PF_XferModeName& m = PF_XferModeNames[i];
+        EXPECT_TRUE(names.insert(m.name).second) << m.name;
+        if (i > 0) {
+            EXPECT_GT(m.number, PF_XferModeNames[i - 1].number);
+        }
+        EXPECT_EQ(PF_XferModeFromName(m.name), m.number);
+        EXPECT_STREQ(PF_XferModeToName(m.number), m.name);
+    }
+    struct Fixed {
+        const char* name;
+        int32_t number;
+    };
+    for (Fixed f : {Fixed{"copy", 0}, Fixed{"behind", 1}, Fixed{"normal", 2}, Fixed{"dissolve", 3},
+                    Fixed{"multiply", 5}, Fixed{"stencil-alpha", 17}, Fixed{"stencil-luma", 18}}) {
+        EXPECT_EQ(PF_XferModeFromName(f.name), f.number) << f.name;
+    }
+    EXPECT_EQ(PF_XferModeFromName("no such mode"), -1);
+    EXPECT_EQ(PF_XferModeFromName("Normal"), -1);
+    EXPECT_EQ(PF_XferModeToName(100), nullptr);
+}
+
+TEST(XferModeNames, ModesWithoutABlendOfTheirOwnAreNormal) {
+    for (int32_t mode : {3, 17, 18, 40, 127, 128 + 2}) {
+        Argb got = Blend<PF_Pixel8>(mode, {0.5f, 1, 0, 0}, {1, 0, 0, 1});
+        ExpectNear(got, {1, 0.5f, 0, 0.5f}, 1.0 / 255, std::to_string(mode));
+    }
+    EXPECT_EQ(PF_Get_Xfer1_table8(kPF_XferNormal), PF_Get_Xfer1<PF_Pixel8>(kPF_XferNormal));
+    EXPECT_EQ(PF_Get_Xfer1_tableF(kPF_XferMultiply), PF_Get_Xfer1<PF_PixelFloat>(5));
+    EXPECT_EQ(PF_Get_Xfer1_Opacity_table16(4), PF_Get_Xfer1_Opacity<PF_Pixel16>(4));
+}
+
+}  // namespace
