@@ -1,0 +1,57 @@
+// Shaders: what a layer's pixels need besides their texels. The span routines ask a shader
+// which work to do once per span and hand it the surface point and normal of each pixel.
+#pragma once
+
+#include <cstdint>
+
+#include "renderer/scene/light_state.h"
+#include "renderer/scene/owned_array.h"
+#include "renderer/scene/specular_table.h"
+#include "u_memory.h"
+
+class SY_Shader : public U_MemTrackedObject {
+public:
+    virtual ~SY_Shader() = default;
+    // The span routine must step the ray to each pixel's surface point.
+    virtual bool NeedsSurfacePoint() const { return false; }
+    // Radius in pixels of the blur a shadow caster is sampled with; 0 for sharp sampling.
+    virtual int32_t ShadowBlurRadius() const { return 0; }
+    // The shader draws a frame's layer (rather than an occluder into a shadow map), so an
+    // unbounded layer may take the simple path.
+    virtual bool IsFrameShader() const { return true; }
+};
+
+// Per-channel lighting of one pixel: texel × diffuse + specular × channel maximum.
+struct SY_Lighting {
+    float diffuse[3];
+    float specular[3];
+};
+
+class SY_LayerShader : public SY_Shader {
+public:
+    bool NeedsSurfacePoint() const override { return needsPoint != 0; }
+
+    // Lights the surface point p with the unit normal n (both in world space).
+    void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
+    // Lights two points of the layer at once; the same results as two calls of LightOnePixel.
+    void LightTwoPixels(const double p1[3], const double p2[3], const double n[3], SY_Lighting* out1,
+                        SY_Lighting* out2) const;
+
+    uint16_t layerId = 0;  // passed to every shadow lookup
+    uint8_t mode = 2;      // transfer mode byte, keep-alpha in bit 7
+    double opacity = 1;
+    double ambient = 0;
+    double diffuse = 0;
+    double specular = 0;
+    double lightTransmission = 0;
+    double metal = 0;
+    const SY_SpecularTable* specularTable = nullptr;
+    SY_OwnedArray<const SY_LightState*> lights;
+    double eye[3] = {};      // camera position, in world space like the surface points
+    float depthOffset = 0;   // added to every depth key; layers later in render order lie behind
+    uint8_t acceptsShadows = 0;  // 2: the texel's colour is replaced by white, only shadows show
+    uint8_t acceptsLights = 0;   // 0 takes the shadow-only path
+    uint8_t softShadowLookup = 0;
+    uint8_t shaded = 0;      // 0: pixels pass unlit
+    uint8_t needsPoint = 0;
+};
