@@ -34,8 +34,8 @@ public:
     // Lights the surface point p with the unit normal n (both in world space).
     void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
     // Lights two points of the layer at once; the same results as two calls of LightOnePixel.
-    void LightTwoPixels(const double p1[3], const double p2[3], const double n[3], SY_Lighting* out1,
-                        SY_Lighting* out2) const;
+    void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
+                        SY_Lighting* out1, SY_Lighting* out2) const;
 
     uint16_t layerId = 0;  // passed to every shadow lookup
     uint8_t mode = 2;      // transfer mode byte, keep-alpha in bit 7
@@ -47,11 +47,11 @@ public:
     double metal = 0;
     const SY_SpecularTable* specularTable = nullptr;
     SY_OwnedArray<const SY_LightState*> lights;
-    double eye[3] = {};      // camera position, in world space like the surface points
-    float depthOffset = 0;   // added to every depth key; layers later in render order lie behind
+    double eye[3] = {};     // camera position, in world space like the surface points
+    float depthOffset = 0;  // added to every depth key; layers later in render order lie behind
     uint8_t acceptsShadows = 0;  // 2: the texel's colour is replaced by white, only shadows show
     uint8_t acceptsLights = 0;   // 0 takes the shadow-only path
     uint8_t softShadowLookup = 0;
-    uint8_t shaded = 0;      // 0: pixels pass unlit
+    uint8_t shaded = 0;  // 0: pixels pass unlit
     uint8_t needsPoint = 0;
 };

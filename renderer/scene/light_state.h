@@ -10,8 +10,9 @@
 struct SY_LightState {
     int32_t type = kSY_LightParallel;
     int32_t id = 0;
-    double position[3] = {};   // not set for ambient lights
-    double direction[3] = {};  // unit vector the light shines along; not set for ambient lights
+    double position[3] = {};  // not set for ambient lights
+    double direction[3] =
+        {};  // unit vector from the lit area back toward the light; not set for ambient
     double color[4] = {};
     float cosOuter = 0;   // spot only: cosine of the cone's half angle
     float cosInner = 0;   // spot only: cosine of the fully lit inner angle
