@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 
 #include "renderer/scene/light_state.h"
 #include "renderer/scene/owned_array.h"
@@ -22,6 +23,9 @@ public:
 };
 
 // Per-channel lighting of one pixel: texel × diffuse + specular × channel maximum.
+struct SY_RenderContext;
+class SY_TRLayer;
+
 struct SY_Lighting {
     float diffuse[3];
     float specular[3];
@@ -55,3 +59,8 @@ public:
     uint8_t shaded = 0;  // 0: pixels pass unlit
     uint8_t needsPoint = 0;
 };
+
+// The shader of a renderable drawn into the frame: its material, its lights, and which work
+// its pixels need. Layers without lights, or a frame without lights, pass their pixels unlit.
+std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
+                                                   const SY_TRLayer& renderable);
