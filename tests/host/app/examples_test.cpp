@@ -8,7 +8,7 @@
 #include "composition/render_order.h"
 #include "composition/transform.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 const std::filesystem::path kExamples =
@@ -32,4 +32,4 @@ TEST(Examples, CardsInPerspectiveLoadAndDeliverTheirImages) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel
