@@ -1,0 +1,12 @@
+// The frame's colour settings as "PF Color Settings Suite" reports them.
+#pragma once
+
+#include <cstdint>
+
+#include "composition/composition.h"
+
+namespace ostrel {
+
+uint64_t FrameColorSettings(const Composition& comp);
+
+}  // namespace ostrel
