@@ -128,6 +128,11 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     FrameTimes all;
     std::string firstFile, lastFile;
     for (int32_t frame = range.first; frame <= range.last; ++frame) {
+        if (Interrupted()) {
+            progress.Clear();
+            throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
+                            ": interrupted");
+        }
         Clock::time_point frameStart = Clock::now();
         FrameTimes times;
         FrameSession session(comp, images, options.settings, frame);

@@ -1,5 +1,7 @@
 #include "session/frame_session.h"
 
+#include <unistd.h>
+
 #include <stdexcept>
 
 #include "composition/render_order.h"
@@ -38,6 +40,21 @@ int32_t CeilDiv(int32_t a, int32_t b) {
     return (a + b - 1) / b;
 }
 
+// A frame larger than the machine's memory would be cleared page by page until the system
+// ends the program; it is refused before it is made.
+void CheckFits(int32_t width, int32_t height, int16_t bitDepth) {
+    uint64_t bytes = uint64_t{4} * static_cast<uint64_t>(bitDepth / 8) *
+                     static_cast<uint64_t>(width) * static_cast<uint64_t>(height);
+    uint64_t memory = static_cast<uint64_t>(sysconf(_SC_PHYS_PAGES)) *
+                      static_cast<uint64_t>(sysconf(_SC_PAGE_SIZE));
+    if (bytes > memory) {
+        throw std::invalid_argument(
+            "a frame of " + std::to_string(width) + " × " + std::to_string(height) + " pixels at " +
+            std::to_string(bitDepth) + " bits needs " + std::to_string(bytes >> 20) +
+            " MB, more than this machine has");
+    }
+}
+
 }  // namespace
 
 FrameSession::FrameSession(const Composition& comp, ImageCache& images,
@@ -55,8 +72,10 @@ FrameSession::FrameSession(const Composition& comp, ImageCache& images,
     layers_.reserve(comp.layers.size());
     for (size_t i = 0; i < comp.layers.size(); ++i)
         layers_.push_back({this, static_cast<int32_t>(i)});
-    destination_ = MakeWorld(bitDepth_, CeilDiv(region_.right - region_.left, settings.downsampleX),
-                             CeilDiv(region_.bottom - region_.top, settings.downsampleY));
+    int32_t width = CeilDiv(region_.right - region_.left, settings.downsampleX);
+    int32_t height = CeilDiv(region_.bottom - region_.top, settings.downsampleY);
+    CheckFits(width, height, bitDepth_);
+    destination_ = MakeWorld(bitDepth_, width, height);
     BeginPass(0);
 }
 
