@@ -1,4 +1,3 @@
-// The frame's colour settings as "PF Color Settings Suite" reports them.
 #pragma once
 
 #include <cstdint>
