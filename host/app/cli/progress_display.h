@@ -18,6 +18,10 @@ class ProgressDisplay : public FrameProgress {
 public:
     ProgressDisplay(std::ostream& out, bool terminal, int32_t frameCount)
         : out_(out), terminal_(terminal), frameCount_(frameCount) {}
+    // Clears the bar, also when a failure ends the run, so that its message starts a line.
+    ~ProgressDisplay() override { Clear(); }
+    ProgressDisplay(const ProgressDisplay&) = delete;
+    ProgressDisplay& operator=(const ProgressDisplay&) = delete;
 
     void BeginFrame(int32_t frame);
     // After a frame is written: seconds it took, layers it rendered, the file. Prints the

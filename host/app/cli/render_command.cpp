@@ -129,7 +129,6 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     std::string firstFile, lastFile;
     for (int32_t frame = range.first; frame <= range.last; ++frame) {
         if (Interrupted()) {
-            progress.Clear();
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
                             ": interrupted");
         }
@@ -144,22 +143,14 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             Clock::time_point entry = Clock::now();
             int32_t code = instance.Render(session);
             times.entry += Seconds(Clock::now() - entry);
-            if (code) {
-                progress.Clear();
-                throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
-            }
+            if (code) throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
         }
         times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
 
         Clock::time_point output = Clock::now();
         std::filesystem::path file = ExpandFramePattern(pattern, frame);
         MakeOutputFolder(file);
-        try {
-            WriteWorld(session.Destination(), file);
-        } catch (const HostError&) {
-            progress.Clear();
-            throw;
-        }
+        WriteWorld(session.Destination(), file);
         times.output = Seconds(Clock::now() - output);
         times.total = Seconds(Clock::now() - frameStart);
         all += times;
