@@ -1,6 +1,7 @@
 // `ostrel info` and `ostrel about`: what a composition will render, and the renderer's note.
 #pragma once
 
+#include <cstdint>
 #include <filesystem>
 #include <ostream>
 #include <vector>
