@@ -4,7 +4,7 @@
 #include <cmath>
 #include <stdexcept>
 
-namespace hostapp {
+namespace ostrel {
 
 int32_t Composition::FrameCount() const {
     double frames = duration * frameRate.numerator / frameRate.denominator;
@@ -26,4 +26,4 @@ int32_t Composition::LayerIndex(std::string_view name) const {
     return found == layers.end() ? -1 : static_cast<int32_t>(found - layers.begin());
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

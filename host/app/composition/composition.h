@@ -12,7 +12,7 @@
 #include "composition/keyframes.h"
 #include "t_time.h"
 
-namespace hostapp {
+namespace ostrel {
 
 using Color = std::array<double, 3>;  // red, green, blue; 0 to 1
 
@@ -187,4 +187,4 @@ struct Composition {
     int32_t LayerIndex(std::string_view name) const;
 };
 
-}  // namespace hostapp
+}  // namespace ostrel

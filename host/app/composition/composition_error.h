@@ -4,7 +4,7 @@
 #include <stdexcept>
 #include <string>
 
-namespace hostapp {
+namespace ostrel {
 
 // The message names the file, the place in it (such as "layers[3].transform.position") and
 // the problem, ready to show as it is.
@@ -13,4 +13,4 @@ public:
     using std::runtime_error::runtime_error;
 };
 
-}  // namespace hostapp
+}  // namespace ostrel

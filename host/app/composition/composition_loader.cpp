@@ -12,7 +12,7 @@
 #include "composition/json_reader.h"
 #include "composition/transform.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 // Larger sides are typing mistakes rather than compositions; the limit also keeps every
@@ -493,4 +493,4 @@ Composition LoadComposition(const std::filesystem::path& file) {
     return ParseComposition(text.str(), file);
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 #include "composition/composition.h"
 #include "composition/composition_error.h"
 
-namespace hostapp {
+namespace ostrel {
 
 // Reads, validates and resolves the file: layer names become indices, image paths become
 // absolute, defaults are filled in, and every image is opened once to learn its size. Any
@@ -17,4 +17,4 @@ Composition LoadComposition(const std::filesystem::path& file);
 // The same for text already in memory; file names it in messages and anchors relative paths.
 Composition ParseComposition(std::string_view text, const std::filesystem::path& file);
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -1,6 +1,6 @@
 #include "composition/host_codes.h"
 
-namespace hostapp {
+namespace ostrel {
 
 int32_t CompFlags(const Composition& comp) {
     return (comp.motionBlur.enabled ? kCompFlagMotionBlur : 0) |
@@ -33,4 +33,4 @@ int32_t CameraType(const Layer& camera) {
     return camera.camera.orthographic ? kCameraTypeOrthographic : kCameraTypePerspective;
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -5,7 +5,7 @@
 
 #include "composition/composition.h"
 
-namespace hostapp {
+namespace ostrel {
 
 // Comp flags.
 inline constexpr int32_t kCompFlagMotionBlur = 0x8;
@@ -34,4 +34,4 @@ int32_t TransferFlags(const Layer& layer);
 int32_t ObjectType(const Layer& layer);
 int32_t CameraType(const Layer& camera);
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <stdexcept>
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 // One channel from a 0..1 float in the world's depth. Files of 8 bits reach 16 bits through
@@ -127,4 +127,4 @@ std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int
     }
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -12,7 +12,7 @@
 #include "composition/image_file.h"
 #include "pf_world.h"
 
-namespace hostapp {
+namespace ostrel {
 
 // Each file is decoded once, on first use; later frames share the decoded pixels. Safe to
 // call from several threads.
@@ -35,4 +35,4 @@ private:
 std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int16_t bitDepth,
                                       int32_t downsampleX, int32_t downsampleY);
 
-}  // namespace hostapp
+}  // namespace ostrel

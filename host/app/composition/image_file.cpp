@@ -7,7 +7,7 @@
 
 #include "composition/composition_error.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 [[noreturn]] void Fail(const std::filesystem::path& file, const std::string& reason) {
@@ -70,4 +70,4 @@ DecodedImage DecodeImage(const std::filesystem::path& file) {
     return image;
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

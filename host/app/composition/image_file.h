@@ -5,7 +5,7 @@
 #include <filesystem>
 #include <vector>
 
-namespace hostapp {
+namespace ostrel {
 
 struct ImageInfo {
     int32_t width = 0;
@@ -27,4 +27,4 @@ struct DecodedImage {
 ImageInfo ProbeImage(const std::filesystem::path& file);
 DecodedImage DecodeImage(const std::filesystem::path& file);
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 
 #include "composition/composition_error.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 const Json kEmptyObject = Json::object();
@@ -247,4 +247,4 @@ void ObjectReader::Finish(std::string_view what,
     }
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -16,7 +16,7 @@
 
 #include "composition/keyframes.h"
 
-namespace hostapp {
+namespace ostrel {
 
 using Json = nlohmann::json;
 
@@ -68,7 +68,7 @@ public:
     ObjectReader(const JsonContext& c, const Json* node, std::string place);
 
     const std::string& Place() const { return place_; }
-    std::string PlaceOf(std::string_view key) const { return hostapp::PlaceOf(place_, key); }
+    std::string PlaceOf(std::string_view key) const { return ostrel::PlaceOf(place_, key); }
     const JsonContext& Context() const { return c_; }
     [[noreturn]] void Fail(std::string_view key, const std::string& problem) const {
         c_.Fail(PlaceOf(key), problem);
@@ -121,4 +121,4 @@ private:
     std::set<std::string, std::less<>> known_;
 };
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-namespace hostapp {
+namespace ostrel {
 
 template <size_t N>
 using Vec = std::array<double, N>;
@@ -63,4 +63,4 @@ private:
 using Scalar = Animated<1>;
 using Vector3 = Animated<3>;
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -1,6 +1,6 @@
 #include "composition/render_order.h"
 
-namespace hostapp {
+namespace ostrel {
 
 std::vector<int32_t> RenderOrder(const Composition& comp, double seconds) {
     std::vector<bool> isMatte(comp.layers.size(), false);
@@ -26,4 +26,4 @@ M_LRect SourceBounds(const Layer& layer) {
     return {0, 0, layer.source.width, layer.source.height};
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 #include "composition/composition.h"
 #include "m_matrix.h"
 
-namespace hostapp {
+namespace ostrel {
 
 // Comp indices of the layers the host hands to the artisan at that time: the 3-D image and
 // solid layers that are active and do not serve another layer as its track matte, from the
@@ -18,4 +18,4 @@ std::vector<int32_t> RenderOrder(const Composition& comp, double seconds);
 // exclusive): the image or solid size, empty for layers without pixels.
 M_LRect SourceBounds(const Layer& layer);
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -4,7 +4,7 @@
 #include <stdexcept>
 #include <string>
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 StreamVector One(double value) {
@@ -169,4 +169,4 @@ double StreamValue(const Layer& layer, int32_t stream, double seconds) {
     return StreamValues(layer, stream, seconds).values[0];
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

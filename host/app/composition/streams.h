@@ -6,7 +6,7 @@
 
 #include "composition/composition.h"
 
-namespace hostapp {
+namespace ostrel {
 
 enum Stream : int32_t {
     kStreamAnchorPoint = 0,
@@ -68,4 +68,4 @@ StreamVector StreamValues(const Layer& layer, int32_t stream, double seconds);
 // The first component of StreamValues: the whole value of a one-dimensional stream.
 double StreamValue(const Layer& layer, int32_t stream, double seconds);
 
-}  // namespace hostapp
+}  // namespace ostrel

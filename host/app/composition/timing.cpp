@@ -2,7 +2,7 @@
 
 #include <stdexcept>
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 // Degrees of a frame as a time: frameDuration × degrees / 360.
@@ -32,4 +32,4 @@ int32_t MotionBlurSamples(const Composition& comp) {
     return comp.motionBlur.samplesPerFrame;
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

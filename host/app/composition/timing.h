@@ -6,7 +6,7 @@
 #include "composition/composition.h"
 #include "t_time.h"
 
-namespace hostapp {
+namespace ostrel {
 
 struct ShutterInterval {
     T_Time start;
@@ -22,4 +22,4 @@ ShutterInterval ShutterIntervalAt(const Composition& comp, T_Time frameTime);
 // capture clamps it further.
 int32_t MotionBlurSamples(const Composition& comp);
 
-}  // namespace hostapp
+}  // namespace ostrel

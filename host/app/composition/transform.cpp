@@ -4,7 +4,7 @@
 #include <numbers>
 #include <stdexcept>
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 constexpr double kRadiansPerDegree = std::numbers::pi / 180.0;
@@ -87,4 +87,4 @@ M_Matrix4 DefaultCameraPlacement(const Composition& comp) {
     return m;
 }
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 #include "composition/composition.h"
 #include "m_matrix.h"
 
-namespace hostapp {
+namespace ostrel {
 
 // Distance of the default camera from the comp plane, which is also its zoom: the focal
 // length of a 50 mm lens on a 36 mm film back spanning the comp's width, width × 50 / 36.
@@ -32,4 +32,4 @@ int32_t ActiveCamera(const Composition& comp, double seconds);
 // looking down +z.
 M_Matrix4 DefaultCameraPlacement(const Composition& comp);
 
-}  // namespace hostapp
+}  // namespace ostrel

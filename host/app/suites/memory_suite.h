@@ -4,6 +4,7 @@
 #include <cstdint>
 
 #include "qngp_suites.h"
+#include "suites/suite_errors.h"
 
 namespace ostrel {
 
@@ -13,7 +14,5 @@ const QNGP_MemorySuite1* MemorySuite();
 // clean up after themselves.
 int64_t LiveMemoryHandles();
 int64_t LockedMemoryHandles();
-
-inline constexpr int32_t kErrBadHandle = 0x13A80020;
 
 }  // namespace ostrel

@@ -5,7 +5,7 @@
 #include "composition/composition_loader.h"
 #include "test_files.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 // The message of the CompositionError that parsing the text throws, or "" when none is.
@@ -122,7 +122,8 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
         {"{\"width\": 10,\n\"height\": 10,\n}",
          "bad.json: malformed JSON: line 3, column 1: syntax error while parsing object key"},
         {"{\"width\": 10\n\"height\": 10}",
-         "bad.json: malformed JSON: line 2, column 8: syntax error while parsing object - unexpected string literal"},
+         "bad.json: malformed JSON: line 2, column 8: syntax error while parsing object - "
+         "unexpected string literal"},
         {"",
          "bad.json: malformed JSON: line 1, column 1: syntax error while parsing value - "
          "unexpected end of input"},
@@ -273,4 +274,4 @@ TEST(CompositionLoader, MissingFileIsReported) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

@@ -8,7 +8,7 @@
 #include "composition/render_order.h"
 #include "composition/transform.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 const std::filesystem::path kExamples =
@@ -31,5 +31,19 @@ TEST(Examples, CardsInPerspectiveLoadAndDeliverTheirImages) {
     EXPECT_EQ(cache.Count(), 2u);
 }
 
+TEST(Examples, EveryExampleLoadsAndHandsTheRendererItsLayers) {
+    struct Case {
+        const char* file;
+        size_t layers;  // rendered at the first frame
+    };
+    for (const Case& c : {Case{"cards/cards.json", 3}, Case{"intersecting/intersecting.json", 3},
+                          Case{"camera-move/camera-move.json", 3}}) {
+        SCOPED_TRACE(c.file);
+        Composition comp = LoadComposition(kExamples / c.file);
+        EXPECT_EQ(RenderOrder(comp, 0.0).size(), c.layers);
+        EXPECT_GE(ActiveCamera(comp, 0.0), 0);
+    }
+}
+
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

@@ -10,7 +10,7 @@
 #include "test_files.h"
 #include "u_memory.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 Layer ImageLayer(const std::filesystem::path& file, int32_t width, int32_t height) {
@@ -181,4 +181,4 @@ TEST(ImageCacheThreads, ConcurrentFetchesShareOneDecode) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

@@ -2,7 +2,7 @@
 
 #include "composition/keyframes.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 // Keys at 0 s (value 0) and 2 s (value 10); the first key's interpolation varies.
@@ -50,4 +50,4 @@ TEST(Keyframes, EachSegmentUsesItsOwnKey) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

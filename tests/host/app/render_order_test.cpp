@@ -6,7 +6,7 @@
 #include "composition/composition_loader.h"
 #include "composition/render_order.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 Composition Parse(const std::string& layers) {
@@ -53,4 +53,4 @@ TEST(RenderOrder, SourceBoundsAreTheLayerPixels) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

@@ -7,7 +7,7 @@
 #include "composition/host_codes.h"
 #include "composition/streams.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 Composition Parse(const std::string& layers) {
@@ -124,4 +124,4 @@ TEST(Streams, StreamsALayerLacksAreRefused) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

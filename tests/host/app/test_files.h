@@ -10,7 +10,7 @@
 #include <string_view>
 #include <vector>
 
-namespace hostapp {
+namespace ostrel {
 
 // A fresh folder under the system's temporary folder, removed with everything in it.
 class TempFolder {
@@ -62,4 +62,4 @@ private:
     std::filesystem::path path_;
 };
 
-}  // namespace hostapp
+}  // namespace ostrel

@@ -5,7 +5,7 @@
 #include "composition/composition_loader.h"
 #include "composition/timing.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 Composition WithRate(const std::string& rate, const std::string& blur) {
@@ -62,4 +62,4 @@ TEST(Timing, FramesAndSamples) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

@@ -5,7 +5,7 @@
 #include "composition/composition_loader.h"
 #include "composition/transform.h"
 
-namespace hostapp {
+namespace ostrel {
 namespace {
 
 constexpr double kTolerance = 1e-9;
@@ -162,4 +162,4 @@ TEST(Transform, ActiveCameraIsTheTopmostOneShowing) {
 }
 
 }  // namespace
-}  // namespace hostapp
+}  // namespace ostrel

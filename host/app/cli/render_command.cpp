@@ -1,0 +1,181 @@
+#include "cli/render_command.h"
+
+#include <chrono>
+#include <cstdio>
+#include <sstream>
+#include <stdexcept>
+
+#include "cli/arguments.h"
+#include "cli/artisan_instance.h"
+#include "cli/progress_display.h"
+#include "composition/composition_loader.h"
+#include "host_error.h"
+#include "output/image_writer.h"
+#include "session/frame_suites.h"
+#include "suites/iterate_suite.h"
+#include "suites/persistent_data_suite.h"
+#include "suites/suite_errors.h"
+
+namespace ostrel {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+double Seconds(Clock::duration d) {
+    return std::chrono::duration<double>(d).count();
+}
+
+// Where the time of a frame went: inside the plug-in's render entry (less the host's work of
+// delivering layer pixels, which the entry waits for), and the host's own work.
+struct FrameTimes {
+    double total = 0;
+    double entry = 0;
+    double pixels = 0;
+    double output = 0;
+
+    double PlugIn() const { return entry - pixels; }
+    double Host() const { return total - PlugIn(); }
+    FrameTimes& operator+=(const FrameTimes& o) {
+        total += o.total;
+        entry += o.entry;
+        pixels += o.pixels;
+        output += o.output;
+        return *this;
+    }
+};
+
+std::string Milliseconds(double seconds) {
+    char text[32];
+    std::snprintf(text, sizeof text, "%.1f ms", seconds * 1000);
+    return text;
+}
+
+std::string Split(const FrameTimes& t) {
+    char share[32];
+    std::snprintf(share, sizeof share, " (%.1f %%)", t.total > 0 ? 100 * t.PlugIn() / t.total : 0);
+    return Milliseconds(t.total) + "; plug-in " + Milliseconds(t.PlugIn()) + share + ", host " +
+           Milliseconds(t.Host()) + " (layer pixels " + Milliseconds(t.pixels) + ", output " +
+           Milliseconds(t.output) + ")";
+}
+
+// Rethrows a problem of the options as one that names the composition file.
+template <class Parse>
+auto Checked(const Composition& comp, const std::string& option, Parse&& parse) {
+    try {
+        return parse();
+    } catch (const std::invalid_argument& error) {
+        throw HostError(comp.file.string() + ": " + option + ": " + error.what());
+    }
+}
+
+std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_t frame,
+                         int32_t code, const std::string& hostFailure) {
+    std::string where = comp.file.string() + ": frame " + std::to_string(frame) + ": ";
+    if (code == kErrUserCancel) return where + "interrupted";
+    if (!hostFailure.empty()) return hostFailure + " (frame " + std::to_string(frame) + ")";
+    std::ostringstream text;
+    text << where << "the renderer \"" << artisan.displayName << "\" failed with error " << code
+         << " (0x" << std::hex << code << ")";
+    return text.str();
+}
+
+void MakeOutputFolder(const std::filesystem::path& file) {
+    std::filesystem::path folder = file.parent_path();
+    if (folder.empty()) return;
+    std::error_code error;
+    std::filesystem::create_directories(folder, error);
+    if (error) {
+        throw HostError(file.string() + ": cannot make the folder " + folder.string() + ": " +
+                        error.message());
+    }
+}
+
+}  // namespace
+
+std::string DefaultOutputPattern(const std::filesystem::path& composition) {
+    return (composition.parent_path() / composition.stem()).string() + ".####.png";
+}
+
+void RunRender(const RenderOptions& options, std::ostream& out) {
+    Clock::time_point start = Clock::now();
+    Composition comp = LoadComposition(options.composition);
+    FrameRange range{0, comp.FrameCount() - 1};
+    if (!options.frames.empty()) {
+        range = Checked(comp, "--frames",
+                        [&] { return ParseFrameRange(options.frames, comp.FrameCount()); });
+    }
+    std::string pattern =
+        options.outputPattern.empty() ? DefaultOutputPattern(comp.file) : options.outputPattern;
+    ImageCache images;
+    // Settings the comp cannot take fail here, before any plug-in is loaded.
+    Checked(comp, "render settings", [&] {
+        FrameSession probe(comp, images, options.settings, range.first);
+        return 0;
+    });
+
+    SetApplicationSetting("Tessary 3D", "Enable Multiprocessing", options.multiprocessing ? 1 : 0);
+    SetIterateThreads(options.threads);
+    HostSuites suites;
+    PluginHost plugins;
+    std::vector<std::filesystem::path> folders = options.pluginFolders;
+    folders.push_back(DefaultPluginFolder());
+    const Artisan& artisan = LoadArtisan(plugins, folders, kRendererMatchName);
+    ArtisanInstance instance(plugins, artisan, comp.rendererOptions);
+
+    int32_t frameCount = range.last - range.first + 1;
+    ProgressDisplay progress(out, options.terminal, frameCount);
+    CatchInterrupts();
+    FrameTimes all;
+    std::string firstFile, lastFile;
+    for (int32_t frame = range.first; frame <= range.last; ++frame) {
+        if (Interrupted()) {
+            throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
+                            ": interrupted");
+        }
+        Clock::time_point frameStart = Clock::now();
+        FrameTimes times;
+        FrameSession session(comp, images, options.settings, frame);
+        session.SetProgress(&progress);
+        progress.BeginFrame(frame);
+        int32_t layers = session.LayerContextCount();
+        for (int32_t pass = 0; pass < session.PassCount(); ++pass) {
+            session.BeginPass(pass);
+            Clock::time_point entry = Clock::now();
+            int32_t code = instance.Render(session);
+            times.entry += Seconds(Clock::now() - entry);
+            if (code) throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
+        }
+        times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
+
+        Clock::time_point output = Clock::now();
+        std::filesystem::path file = ExpandFramePattern(pattern, frame);
+        MakeOutputFolder(file);
+        WriteWorld(session.Destination(), file);
+        times.output = Seconds(Clock::now() - output);
+        times.total = Seconds(Clock::now() - frameStart);
+        all += times;
+        if (firstFile.empty()) firstFile = file.string();
+        lastFile = file.string();
+        progress.EndFrame(times.total, layers, file.string());
+        if (options.stats) {
+            progress.Clear();
+            out << "frame " << frame << " split: " << Split(times) << '\n';
+        }
+    }
+    progress.Clear();
+    if (options.terminal) {
+        // The bar is gone: one line says what became of the run.
+        char summary[64];
+        std::snprintf(summary, sizeof summary, "%d frame%s in %.2f s -> ", frameCount,
+                      frameCount == 1 ? "" : "s", Seconds(Clock::now() - start));
+        out << summary << firstFile << (frameCount > 1 ? " ... " + lastFile : "") << '\n';
+    }
+    if (options.stats) {
+        // Loading the composition and the plug-ins counts as the host's.
+        all.total = Seconds(Clock::now() - start);
+        out << "total, " << frameCount << " frame" << (frameCount == 1 ? "" : "s")
+            << " with loading: " << Split(all) << '\n';
+    }
+}
+
+}  // namespace ostrel

@@ -1,0 +1,35 @@
+// `ostrel render`: a composition rendered frame by frame through the renderer plug-in, each
+// frame written to an image file.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "session/frame_session.h"
+
+namespace ostrel {
+
+struct RenderOptions {
+    std::filesystem::path composition;
+    std::string outputPattern;  // empty: the composition's stem + ".####.png" beside it
+    std::string frames;         // "A-B" or "A"; empty: every frame
+    RenderSettings settings;
+    bool multiprocessing = true;
+    int32_t threads = 0;  // 0: one per processor
+    std::vector<std::filesystem::path> pluginFolders;
+    bool stats = false;
+    bool terminal = false;  // draw a progress bar instead of a line per frame
+};
+
+// Renders and writes every frame; throws HostError or CompositionError with a message for the
+// user at the first problem. A frame's file is written whole or not at all.
+void RunRender(const RenderOptions& options, std::ostream& out);
+
+// The pattern used when none is given.
+std::string DefaultOutputPattern(const std::filesystem::path& composition);
+
+}  // namespace ostrel

@@ -1,0 +1,258 @@
+#include <chrono>
+
+#include "composition/render_order.h"
+#include "composition/streams.h"
+#include "composition/timing.h"
+#include "composition/transform.h"
+#include "session/frame_suites.h"
+#include "session/suite_guard.h"
+
+namespace ostrel {
+namespace {
+
+bool Owns(FrameSession& session, QNGP_LayerContextH context) {
+    return context && context->layer && context->layer->session == &session;
+}
+
+int32_t GetCompToRender(QNGP_RenderContextH context, QNGP_CompH* comp) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!comp) return kErrBadArgument;
+        *comp = session.CompHandle();
+        return 0;
+    });
+}
+
+int32_t GetRenderTime(QNGP_RenderContextH context, T_Time* time, T_Time* timeStep) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!time || !timeStep) return kErrBadArgument;
+        *time = session.RenderTime();
+        *timeStep = session.TimeStep();
+        return 0;
+    });
+}
+
+int32_t GetCompDestination(QNGP_RenderContextH context, QNGP_CompH comp, PF_World** world) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!world) return kErrBadArgument;
+        if (comp != session.CompHandle()) return kErrBadHandle;
+        *world = &session.Destination();
+        return 0;
+    });
+}
+
+int32_t GetDownsample(QNGP_RenderContextH context, int16_t* dx, int16_t* dy) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!dx || !dy) return kErrBadArgument;
+        *dx = session.DownsampleX();
+        *dy = session.DownsampleY();
+        return 0;
+    });
+}
+
+int32_t GetRegionOfInterest(QNGP_RenderContextH context, QNGP_ShortRect* region) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!region) return kErrBadArgument;
+        *region = session.Region();
+        return 0;
+    });
+}
+
+int32_t GetFieldRender(QNGP_RenderContextH context, int32_t* fieldMode) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!fieldMode) return kErrBadArgument;
+        *fieldMode = session.FieldMode();
+        return 0;
+    });
+}
+
+int32_t GetNumLayersToRender(QNGP_RenderContextH context, int32_t* count) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!count) return kErrBadArgument;
+        *count = session.LayerContextCount();
+        return 0;
+    });
+}
+
+int32_t GetNthLayerContext(QNGP_RenderContextH context, int32_t index,
+                           QNGP_LayerContextH* layerContext) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!layerContext) return kErrBadArgument;
+        if (index < 0 || index >= session.LayerContextCount()) return kErrBadIndex;
+        *layerContext = session.LayerContext(index);
+        return 0;
+    });
+}
+
+int32_t GetLayerFromLayerContext(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                                 QNGP_LayerH* layer) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!layer) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        *layer = layerContext->layer;
+        return 0;
+    });
+}
+
+// Compositions have no nested comps: every layer is its own top-level layer.
+int32_t GetTopLevelLayer(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                         QNGP_LayerH* layer) {
+    return GetLayerFromLayerContext(context, layerContext, layer);
+}
+
+int32_t GetRenderLayerToWorldXform(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                                   const T_Time* time, M_Matrix4* transform) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!time || !transform) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        *transform = LayerToWorld(session.Comp(), layerContext->layer->index, T_Seconds(*time));
+        return 0;
+    });
+}
+
+int32_t GetRenderLayerBounds(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                             const T_Time* time, QNGP_ShortRect* bounds) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!time || !bounds) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        M_LRect r = SourceBounds(session.LayerAt(layerContext->layer->index));
+        *bounds = {static_cast<int16_t>(r.top), static_cast<int16_t>(r.left),
+                   static_cast<int16_t>(r.bottom), static_cast<int16_t>(r.right)};
+        return 0;
+    });
+}
+
+int32_t GetRenderOpacity(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                         const T_Time* time, double* opacity) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!time || !opacity) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        const Layer& layer = session.LayerAt(layerContext->layer->index);
+        *opacity = StreamValue(layer, kStreamOpacity, T_Seconds(*time)) / 100;
+        return 0;
+    });
+}
+
+// Every layer with pixels has a finite source: images and solids both have a size.
+int32_t IsLayerUnbounded(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                         bool* unbounded) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!unbounded) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        *unbounded = false;
+        return 0;
+    });
+}
+
+// The layer's pixels at the frame's depth and downsample, timed as host work.
+std::unique_ptr<PF_World> DeliverPixels(FrameSession& session, int32_t layerIndex) {
+    auto start = std::chrono::steady_clock::now();
+    std::unique_ptr<PF_World> world = session.LayerPixels(layerIndex);
+    session.AddPixelDeliveryNanoseconds(std::chrono::duration_cast<std::chrono::nanoseconds>(
+                                            std::chrono::steady_clock::now() - start)
+                                            .count());
+    return world;
+}
+
+// A matte (mode 0) becomes the caller's to delete; a whole layer (mode 2) is handed back
+// through DisposeTexture like a texture.
+int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerContextH layerContext,
+                    int32_t mode, PF_World** world) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!world) return kErrBadArgument;
+        *world = nullptr;
+        if (!Owns(session, layerContext) || layer != layerContext->layer) return kErrBadHandle;
+        if (mode == kQNGP_RenderMatte) {
+            *world = DeliverPixels(session, layer->index).release();
+        } else if (mode == kQNGP_RenderWholeLayer) {
+            *world = session.HandOut(DeliverPixels(session, layer->index));
+        } else {
+            return kErrBadArgument;
+        }
+        return 0;
+    });
+}
+
+// Textures are whole layers at the downsample whatever the hints ask: the source matrix stays
+// identity and the plug-in scales texture pixels up by the downsample factors.
+int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerContext, int32_t,
+                      const double*, const M_LRect*, M_Matrix3* sourceMatrix, PF_World** world) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!sourceMatrix || !world) return kErrBadArgument;
+        *world = nullptr;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        M_SetIdentityMatrix(sourceMatrix);
+        *world = session.HandOut(DeliverPixels(session, layerContext->layer->index));
+        return 0;
+    });
+}
+
+int32_t DisposeTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                       PF_World* world) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        return session.TakeBack(world) ? 0 : kErrBadHandle;
+    });
+}
+
+int32_t GetTrackMatteContext(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
+                             QNGP_LayerContextH* matteContext) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!matteContext) return kErrBadArgument;
+        if (!Owns(session, layerContext)) return kErrBadHandle;
+        *matteContext = layerContext->matte;
+        return 0;
+    });
+}
+
+int32_t ReportRenderProgress(QNGP_RenderContextH context, int32_t count, int32_t total) {
+    return Serve(context, [&](FrameSession& session) {
+        FrameProgress* progress = session.Progress();
+        return !progress || progress->Renderables(count, total) ? 0 : kErrUserCancel;
+    });
+}
+
+int32_t ReportRowProgress(QNGP_RenderContextH context, int32_t count, int32_t total) {
+    return Serve(context, [&](FrameSession& session) {
+        FrameProgress* progress = session.Progress();
+        return !progress || progress->Rows(count, total) ? 0 : kErrUserCancel;
+    });
+}
+
+int32_t GetShutterInterval(QNGP_RenderContextH context, T_Time* start, T_Time* duration) {
+    return Serve(context, [&](FrameSession& session) {
+        if (!start || !duration) return kErrBadArgument;
+        ShutterInterval shutter = ShutterIntervalAt(session.Comp(), session.RenderTime());
+        *start = shutter.start;
+        *duration = shutter.duration;
+        return 0;
+    });
+}
+
+}  // namespace
+
+const QNGP_CanvasSuite13* CanvasSuite() {
+    static const QNGP_CanvasSuite13 suite{{&GetCompToRender,
+                                           &GetRenderTime,
+                                           &GetCompDestination,
+                                           &GetDownsample,
+                                           &GetRegionOfInterest,
+                                           &GetFieldRender,
+                                           &GetNumLayersToRender,
+                                           &GetNthLayerContext,
+                                           &GetLayerFromLayerContext,
+                                           &GetTopLevelLayer,
+                                           &GetRenderLayerToWorldXform,
+                                           &GetRenderLayerBounds,
+                                           &GetRenderOpacity,
+                                           &IsLayerUnbounded,
+                                           &RenderLayer,
+                                           &RenderTexture,
+                                           &DisposeTexture,
+                                           &GetTrackMatteContext,
+                                           &ReportRenderProgress,
+                                           &ReportRowProgress},
+                                          &GetShutterInterval};
+    return &suite;
+}
+
+}  // namespace ostrel

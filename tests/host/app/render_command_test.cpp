@@ -1,0 +1,163 @@
+// `ostrel render` in this process: every way a render can be refused, and the frames it writes.
+#include <gtest/gtest.h>
+
+#include <OpenImageIO/imageio.h>
+
+#include <filesystem>
+#include <functional>
+#include <sstream>
+#include <string>
+
+#include "cli/render_command.h"
+#include "suites/memory_suite.h"
+#include "suites/persistent_data_suite.h"
+#include "suites/suite_registry.h"
+#include "test_files.h"
+#include "u_memory.h"
+
+namespace ostrel {
+namespace {
+
+const std::filesystem::path kCards = std::filesystem::path(__FILE__).parent_path() / ".." / ".." /
+                                     ".." / "examples" / "cards" / "cards.json";
+
+RenderOptions OptionsFor(const std::filesystem::path& comp, const TempFolder& folder) {
+    RenderOptions options;
+    options.composition = comp;
+    options.outputPattern = (folder.Path() / "out" / "frame.####.png").string();
+    options.frames = "0";
+    options.pluginFolders = {ORMOND_PLUGIN_DIR};
+    return options;
+}
+
+// The message of the render's failure, or "" when it succeeds.
+std::string Failure(const RenderOptions& options, std::string* out = nullptr) {
+    std::ostringstream printed;
+    std::string message;
+    try {
+        RunRender(options, printed);
+    } catch (const std::exception& error) {
+        message = error.what();
+    }
+    if (out) *out = printed.str();
+    return message;
+}
+
+size_t FilesIn(const std::filesystem::path& folder) {
+    size_t count = 0;
+    std::error_code error;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(folder, error))
+        count += entry.is_regular_file();
+    return count;
+}
+
+TEST(RenderCommand, RefusesWithAMessageNamingTheFileAndWritesNothing) {
+    struct Case {
+        const char* name;
+        const char* composition;  // written as comp.json; empty: the cards example
+        std::function<void(RenderOptions&)> change;
+        const char* message;
+    };
+    const std::string kSolid = R"({"width": 64, "height": 64, "duration": 1, "layers": [
+        {"kind": "solid", "source": {"color": "#ffffff"}, "threeD": true}]})";
+    const Case kCases[] = {
+        {"missing image",
+         R"({"width": 64, "height": 64, "duration": 1, "layers": [
+              {"kind": "image", "source": "nowhere.png", "threeD": true}]})",
+         [](RenderOptions&) {}, "comp.json: layers[0].source: cannot read image"},
+        {"unknown transfer mode",
+         R"({"width": 64, "height": 64, "duration": 1, "layers": [
+              {"kind": "solid", "source": {"color": "#ffffff"}, "threeD": true,
+               "transferMode": "sparkle"}]})",
+         [](RenderOptions&) {},
+         "comp.json: layers[0].transferMode: no transfer mode is named \"sparkle\" (frame 0)"},
+        {"frame past the end", "", [](RenderOptions& o) { o.frames = "40-48"; },
+         "cards.json: --frames: the frame range 40-48 reaches outside the frames 0-47"},
+        {"frame range backwards", "", [](RenderOptions& o) { o.frames = "5-2"; },
+         "cards.json: --frames: the frame range 5-2 ends before it starts"},
+        {"not a frame range", "", [](RenderOptions& o) { o.frames = "five"; },
+         "cards.json: --frames: \"five\" is not a frame range like 0-47"},
+        {"negative frame", "", [](RenderOptions& o) { o.frames = "-1"; },
+         "cards.json: --frames: \"-1\" is not a frame range"},
+        {"region outside the comp", "",
+         [](RenderOptions& o) {
+             o.settings.region = M_LRect{0, 0, 2000, 100};
+         },
+         "cards.json: render settings: a region of interest that is empty or reaches outside"},
+        {"unknown image format", "", [](RenderOptions& o) { o.outputPattern += ".nothing"; },
+         ".png.nothing: cannot write"},
+        {"no renderer", "", [](RenderOptions& o) { o.pluginFolders.clear(); },
+         "no plug-in registers the renderer \"VLMR Ormond\""},
+        {"missing composition", "", [](RenderOptions& o) { o.composition = "/nowhere/shot.json"; },
+         "/nowhere/shot.json"},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.name);
+        TempFolder folder;
+        std::filesystem::path comp = kCards;
+        if (*c.composition) comp = folder.WriteText("comp.json", c.composition);
+        RenderOptions options = OptionsFor(comp, folder);
+        c.change(options);
+        size_t before = FilesIn(folder.Path());
+        int64_t bytes = U_AccountedBytes();
+        EXPECT_NE(Failure(options).find(c.message), std::string::npos) << Failure(options);
+        EXPECT_EQ(FilesIn(folder.Path()), before);
+        EXPECT_EQ(U_AccountedBytes(), bytes);
+        EXPECT_EQ(LiveMemoryHandles(), 0);
+        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
+    }
+    ClearApplicationSettings();
+}
+
+TEST(RenderCommand, FramesOfTheRequestedSizeDepthAndFormat) {
+    struct Case {
+        const char* name;
+        std::function<void(RenderOptions&)> change;
+        const char* file;
+        int width, height;
+        OIIO::TypeDesc::BASETYPE type;
+    };
+    const Case kCases[] = {
+        {"comp's own", [](RenderOptions&) {}, "frame.0000.png", 960, 540, OIIO::TypeDesc::UINT8},
+        {"float to OpenEXR",
+         [](RenderOptions& o) {
+             o.settings.bitDepth = 32;
+             o.outputPattern = o.outputPattern.substr(0, o.outputPattern.size() - 3) + "exr";
+         },
+         "frame.0000.exr", 960, 540, OIIO::TypeDesc::FLOAT},
+        {"16 bits to TIFF",
+         [](RenderOptions& o) {
+             o.settings.bitDepth = 16;
+             o.outputPattern = o.outputPattern.substr(0, o.outputPattern.size() - 3) + "tif";
+         },
+         "frame.0000.tif", 960, 540, OIIO::TypeDesc::UINT16},
+        {"region and downsample, interlaced, one thread",
+         [](RenderOptions& o) {
+             o.settings.region = M_LRect{100, 50, 301, 150};
+             o.settings.downsampleX = 2;
+             o.settings.fields = RenderSettings::Fields::kUpperFirst;
+             o.multiprocessing = false;
+             o.threads = 1;
+         },
+         "frame.0000.png", 101, 100, OIIO::TypeDesc::UINT8},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.name);
+        TempFolder folder;
+        RenderOptions options = OptionsFor(kCards, folder);
+        c.change(options);
+        std::string out;
+        ASSERT_EQ(Failure(options, &out), "");
+        EXPECT_EQ(out, "frame 0: " + out.substr(9, out.find(" s, ") - 9) + " s, 3 layers -> " +
+                           (folder.Path() / "out" / c.file).string() + "\n");
+        auto in = OIIO::ImageInput::open((folder.Path() / "out" / c.file).string());
+        ASSERT_TRUE(in);
+        EXPECT_EQ(in->spec().width, c.width);
+        EXPECT_EQ(in->spec().height, c.height);
+        EXPECT_EQ(in->spec().format.basetype, c.type);
+    }
+    ClearApplicationSettings();
+}
+
+}  // namespace
+}  // namespace ostrel
