@@ -7,7 +7,7 @@
 #include "composition/transform.h"
 #include "host_error.h"
 #include "session/frame_suites.h"
-#include "session/transfer_modes.h"
+#include "pf_xfer.h"
 
 namespace ostrel {
 namespace {
@@ -114,7 +114,7 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
         out << "    " << std::setw(3) << i << "  " << std::left << std::setw(24)
             << Quoted(layer.name) << std::setw(6) << KindName(layer.kind) << " 3-D  "
             << std::setw(10) << QualityName(layer.quality) << layer.transferMode
-            << (TransferModeNumber(layer.transferMode) < 0 ? " (unknown mode)" : "")
+            << (PF_XferModeFromName(layer.transferMode) < 0 ? " (unknown mode)" : "")
             << (layer.trackMatte != TrackMatte::kNone
                     ? ", matte " + Quoted(comp.layers[static_cast<size_t>(layer.matteLayer)].name)
                     : "")

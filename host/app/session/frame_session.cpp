@@ -5,7 +5,6 @@
 #include <stdexcept>
 
 #include "composition/render_order.h"
-#include "session/color_settings.h"
 
 namespace ostrel {
 namespace {
@@ -76,6 +75,10 @@ FrameSession::FrameSession(const Composition& comp, ImageCache& images,
     int32_t height = CeilDiv(region_.bottom - region_.top, settings.downsampleY);
     CheckFits(width, height, bitDepth_);
     destination_ = MakeWorld(bitDepth_, width, height);
+    if (comp.blending.linear) {
+        blending_ = std::make_unique<PF_LinearBlendingTables>();
+        PF_BuildLinearBlendingTablesGamma(static_cast<float>(comp.blending.gamma), blending_.get());
+    }
     BeginPass(0);
 }
 
@@ -142,7 +145,7 @@ bool FrameSession::TakeBack(PF_World* world) {
 }
 
 uint64_t FrameSession::ColorSettings() const {
-    return FrameColorSettings(comp_);
+    return reinterpret_cast<uint64_t>(blending_.get());
 }
 
 void FrameSession::NoteFailure(const std::string& message) {

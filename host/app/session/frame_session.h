@@ -16,6 +16,7 @@
 #include "composition/image_cache.h"
 #include "m_matrix.h"
 #include "pf_world.h"
+#include "pf_xfer.h"
 #include "qngp_suites.h"
 #include "t_time.h"
 
@@ -145,6 +146,8 @@ private:
     std::vector<QNGP_LayerContext> contexts_;       // render order
     std::vector<QNGP_LayerContext> matteContexts_;  // one per context with a matte
     std::unique_ptr<PF_World> destination_;
+    // Linear-light blending of the comp, or null: the colour settings the resolve receives.
+    std::unique_ptr<PF_LinearBlendingTables> blending_;
 
     mutable std::mutex mutex_;  // guards what the artisan's threads reach: textures, failure
     std::set<PF_World*> handedOut_;

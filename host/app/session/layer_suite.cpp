@@ -6,7 +6,7 @@
 #include "composition/transform.h"
 #include "session/frame_suites.h"
 #include "session/suite_guard.h"
-#include "session/transfer_modes.h"
+#include "pf_xfer.h"
 
 namespace ostrel {
 namespace {
@@ -74,7 +74,7 @@ int32_t GetLayerTransferMode(QNGP_LayerH layer, QNGP_LayerTransferMode* mode) {
     return Serve(layer, [&](FrameSession& session) {
         if (!mode) return kErrBadArgument;
         const Layer& l = session.LayerAt(layer->index);
-        int32_t number = l.HasPixels() ? TransferModeNumber(l.transferMode) : kNormalMode;
+        int32_t number = l.HasPixels() ? PF_XferModeFromName(l.transferMode) : kNormalMode;
         if (number < 0) {
             session.NoteFailure(
                 session.Comp().file.string() + ": layers[" + std::to_string(layer->index) +

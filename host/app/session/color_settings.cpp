@@ -1,9 +1,0 @@
-#include "session/color_settings.h"
-
-namespace ostrel {
-
-uint64_t FrameColorSettings(const Composition&) {
-    return 0;
-}
-
-}  // namespace ostrel
