@@ -35,18 +35,26 @@ typename L::Single SY_SpotEdge(const SY_LightState& light, typename L::Real c) {
                            L::SplatSingle(1.0f));
 }
 
-// Distance falloff at the surface point p: 1 inside the radius; beyond it a smooth fade over the
-// falloff distance, or the inverse square of the distance relative to the radius.
+// Squared distance between the light and the surface points; equal, bit for bit, to the squared
+// length of the unnormalised light vector, which callers that have it pass instead.
 template <class L>
-typename L::Single SY_Falloff(const SY_LightState& light, const typename L::Real p[3]) {
+typename L::Real SY_DistanceSquared(const SY_LightState& light, const typename L::Real p[3]) {
+    typename L::Real d[3] = {p[0] - L::Splat(light.position[0]), p[1] - L::Splat(light.position[1]),
+                             p[2] - L::Splat(light.position[2])};
+    return SY_Dot<L>(d, d);
+}
+
+// Distance falloff for the squared distance from the light: 1 inside the radius; beyond it a
+// smooth fade over the falloff distance, or the inverse square of the distance relative to the
+// radius.
+template <class L>
+typename L::Single SY_Falloff(const SY_LightState& light, typename L::Real distanceSquared) {
     using Real = typename L::Real;
     using Single = typename L::Single;
     const Single one = L::SplatSingle(1.0f), zero = L::SplatSingle(0.0f);
     if (!SY_FalloffUsesDistance(light)) return one;
-    Real d[3] = {p[0] - L::Splat(light.position[0]), p[1] - L::Splat(light.position[1]),
-                 p[2] - L::Splat(light.position[2])};
-    // Squared distance rounded to a float: the zone edges are compared at that precision.
-    Real d2 = L::ToReal(L::ToSingle(SY_Dot<L>(d, d)));
+    // Rounded to a float: the zone edges are compared at that precision.
+    Real d2 = L::ToReal(L::ToSingle(distanceSquared));
     typename L::Mask inside = L::Less(d2, L::Splat(light.radiusSquared));
     if (light.falloffType == kSY_FalloffInverseSquare) {
         // With a zero radius the light's own position gets nothing rather than infinity.

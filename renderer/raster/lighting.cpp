@@ -61,17 +61,20 @@ struct PixelLighting {
     void LightFromSource(const SY_LightState& light, const Real v[3]) {
         Mask active = L::All();
         Real l[3];
+        Real distanceSquared = L::Splat(0.0);
         if (light.type == kSY_LightParallel) {
             for (int k = 0; k < 3; ++k)
                 l[k] = L::Splat(light.direction[k]);
+            if (SY_FalloffUsesDistance(light)) distanceSquared = SY_DistanceSquared<L>(light, p);
         } else {
             for (int k = 0; k < 3; ++k)
                 l[k] = L::Splat(light.position[k]) - p[k];
-            Real lengthSquared = SY_Dot<L>(l, l);
+            // The light vector's length is the light's distance.
+            distanceSquared = SY_Dot<L>(l, l);
             // A light on the surface point has no direction: it is left out, not reported.
-            active = L::AndNot(L::Less(lengthSquared, L::Splat(1e-12)), active);
+            active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
             if (L::None(active)) return;
-            Real inverse = L::Splat(1.0) / L::Sqrt(lengthSquared);
+            Real inverse = L::Splat(1.0) / L::Sqrt(distanceSquared);
             for (int k = 0; k < 3; ++k)
                 l[k] = l[k] * inverse;
         }
@@ -94,7 +97,7 @@ struct PixelLighting {
             if (L::None(active)) return;
             spot = SY_SpotEdge<L>(light, c);
         }
-        Single k = spot * SY_Falloff<L>(light, p);
+        Single k = spot * SY_Falloff<L>(light, distanceSquared);
         if (shader.lightTransmission != 0.0) {
             k = L::SelectSingle(
                 behind, k * L::SplatSingle(static_cast<float>(shader.lightTransmission)), k);
@@ -179,20 +182,22 @@ struct PixelLighting {
         }
         Mask active = L::AndNot(L::LessEqual(SY_Dot<L>(n, l), L::Splat(0.0)), L::All());
         if (L::None(active)) return;
+        // For a light with a position, its distance is the light vector's length.
+        Real distanceSquared =
+            light.type == kSY_LightParallel ? SY_DistanceSquared<L>(light, p) : SY_Dot<L>(l, l);
         Single spot = L::SplatSingle(1.0f);
         if (light.type == kSY_LightSpot) {
-            Real lengthSquared = SY_Dot<L>(l, l);
-            active = L::AndNot(L::Less(lengthSquared, L::Splat(1e-12)), active);
+            active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
             if (L::None(active)) return;
             Real axis[3] = {L::Splat(light.direction[0]), L::Splat(light.direction[1]),
                             L::Splat(light.direction[2])};
-            Real c = SY_Dot<L>(l, axis) / L::Sqrt(lengthSquared);
+            Real c = SY_Dot<L>(l, axis) / L::Sqrt(distanceSquared);
             active = L::AndNot(L::Less(c, L::Splat(light.cosOuter)), active);
             if (L::None(active)) return;
             spot = SY_SpotEdge<L>(light, c);
         }
         Single w = L::ToSingle(L::ToReal(spot) * L::Splat(light.shadowDarkness) *
-                               L::ToReal(SY_Falloff<L>(light, p)));
+                               L::ToReal(SY_Falloff<L>(light, distanceSquared)));
         active = L::AndNot(L::LessEqualSingle(w, L::SplatSingle(0.0f)), active);
         if (L::None(active)) return;
         Single t[3], a[3];
