@@ -1,5 +1,6 @@
 #include <algorithm>
 
+#include "renderer/raster/light_terms.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
 
@@ -7,6 +8,14 @@ namespace {
 
 // Layers later in render order lie this much farther behind per index, as in their geometry.
 constexpr double kDepthStepPerIndex = 1e-7;
+
+// The lit path reads the surface point for the light's direction and distance, for the view
+// vector of highlights, and for shadow lookups.
+bool LitReadsPoint(const SY_LayerShader& shader, const SY_LightState& light) {
+    if (light.type == kSY_LightAmbient) return false;
+    return light.type != kSY_LightParallel || SY_FalloffUsesDistance(light) ||
+           shader.specular != 0.0 || (shader.acceptsShadows != 0 && light.shadowMap);
+}
 
 }  // namespace
 
@@ -26,19 +35,30 @@ std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
     shader->depthOffset = static_cast<float>(-material.depthIndex * kDepthStepPerIndex);
     shader->acceptsShadows = material.acceptsShadows;
     shader->acceptsLights = material.acceptsLights;
+    shader->softShadowLookup = material.acceptsShadows != 0 && material.bestQuality;
 
     shader->lights.Allocate(renderable.lights.Count());
     std::copy(renderable.lights.begin(), renderable.lights.end(), shader->lights.begin());
-    auto casting = [](const SY_LightState* light) { return light->shadowMap != nullptr; };
-    auto located = [](const SY_LightState* light) { return light->type != kSY_LightAmbient; };
-    bool lit = material.acceptsLights && !shader->lights.Empty();
-    bool shadowed = !material.acceptsLights &&
-                    std::any_of(shader->lights.begin(), shader->lights.end(), casting);
-    shader->shaded = lit || shadowed;
-    shader->needsPoint =
-        shader->shaded && std::any_of(shader->lights.begin(), shader->lights.end(), located);
-    if (lit && material.specular != 0.0) {
-        shader->specularTable = &context->specularTables.ForShininess(material.shininess);
+    const SY_LightState* const* first = shader->lights.begin();
+    const SY_LightState* const* last = shader->lights.end();
+    if (material.acceptsLights) {
+        shader->shaded = first != last;
+        shader->needsPoint = std::any_of(first, last, [&](const SY_LightState* light) {
+            return LitReadsPoint(*shader, *light);
+        });
+        bool located = std::any_of(first, last, [](const SY_LightState* light) {
+            return light->type != kSY_LightAmbient;
+        });
+        if (material.specular != 0.0 && located) {
+            shader->specularTable = &context->specularTables.ForShininess(material.shininess);
+        }
+    } else {
+        // Only shadows can change such a layer's pixels, and every shadow lookup reads the point.
+        shader->shaded = material.acceptsShadows != 0 &&
+                         std::any_of(first, last, [](const SY_LightState* light) {
+                             return light->shadowMap != nullptr;
+                         });
+        shader->needsPoint = shader->shaded;
     }
     return shader;
 }

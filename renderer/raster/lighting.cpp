@@ -1,128 +1,246 @@
-#include <cmath>
-
+// Lighting of layer pixels: one pixel, or two pixels of one layer at once. Both run the same
+// code over different lane packs (light_lanes.h), so a pair lights exactly as its two pixels do
+// alone. Geometry is worked in doubles, the light terms are gathered in floats.
+#include "renderer/raster/light_terms.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/messages.h"
 
 namespace {
 
-double Dot(const double a[3], const double b[3]) {
-    return a[0] * b[0] + a[1] * b[1] + a[2] * b[2];
-}
+template <class L>
+struct PixelLighting {
+    using Real = typename L::Real;
+    using Single = typename L::Single;
+    using Mask = typename L::Mask;
 
-// Smooth step of the spot cone between its outer and inner cosines; 1 inside, 0 outside.
-float SpotFactor(const SY_LightState& light, double cosine) {
-    if (cosine < light.cosOuter) return -1.0f;  // outside the cone: the light is skipped
-    if (cosine > light.cosInner) return 1.0f;
-    float t = static_cast<float>(cosine - light.cosOuter) * light.coneScale;
-    return t * t * (3.0f - 2.0f * t);
-}
+    const SY_LayerShader& shader;
+    Real p[3];  // surface points; read only when the shader needs them
+    Real n[3];
+    Single diffuse[3];
+    Single specular[3];
 
-// Distance falloff for the squared distance d2 from the light.
-float Falloff(const SY_LightState& light, float d2) {
-    switch (light.falloffType) {
-        case 1: {
-            if (d2 < light.radiusSquared) return 1.0f;
-            if (d2 > light.outerSquared || light.falloffDistance == 0.0) return 0.0f;
-            auto u = static_cast<float>(1.0 - (std::sqrt(d2) - light.falloffRadius) *
-                                                  light.inverseDistance);
-            return u * u * (3.0f - 2.0f * u);
+    void Store(SY_Lighting* const out[L::kCount]) const {
+        for (int i = 0; i < L::kCount; ++i) {
+            for (int c = 0; c < 3; ++c) {
+                out[i]->diffuse[c] = L::LaneSingle(diffuse[c], i);
+                out[i]->specular[c] = L::LaneSingle(specular[c], i);
+            }
         }
-        case 2:
-            if (d2 < light.radiusSquared) return 1.0f;
-            return d2 == 0.0f ? 0.0f : static_cast<float>(light.radiusSquared / d2);
-        default:
-            return 1.0f;
     }
-}
 
-float DistanceSquared(const SY_LightState& light, const double p[3]) {
-    double d[3] = {p[0] - light.position[0], p[1] - light.position[1], p[2] - light.position[2]};
-    return static_cast<float>(Dot(d, d));
+    // Unit vector from the surface toward the eye; an eye on the surface ends the frame.
+    void ViewVector(Real v[3]) const {
+        for (int k = 0; k < 3; ++k)
+            v[k] = L::Splat(shader.eye[k]) - p[k];
+        Real lengthSquared = SY_Dot<L>(v, v);
+        if (L::Any(L::Less(lengthSquared, L::Splat(1e-48)))) SY_ThrowZeroLengthVector();
+        Real inverse = L::Splat(1.0) / L::Sqrt(lengthSquared);
+        for (int k = 0; k < 3; ++k)
+            v[k] = v[k] * inverse;
+    }
+
+    void Lit() {
+        for (int c = 0; c < 3; ++c)
+            diffuse[c] = specular[c] = L::SplatSingle(0.0f);
+        Real v[3] = {L::Splat(0.0), L::Splat(0.0), L::Splat(0.0)};
+        if (shader.needsPoint) ViewVector(v);
+        for (const SY_LightState* light : shader.lights) {
+            if (light->type == kSY_LightAmbient) {
+                if (shader.ambient == 0.0) continue;
+                for (int c = 0; c < 3; ++c) {
+                    diffuse[c] =
+                        diffuse[c] +
+                        L::SplatSingle(static_cast<float>(light->color[1 + c] * shader.ambient));
+                }
+                continue;
+            }
+            LightFromSource(*light, v);
+        }
+    }
+
+    void LightFromSource(const SY_LightState& light, const Real v[3]) {
+        Mask active = L::All();
+        Real l[3];
+        Real distanceSquared = L::Splat(0.0);
+        if (light.type == kSY_LightParallel) {
+            for (int k = 0; k < 3; ++k)
+                l[k] = L::Splat(light.direction[k]);
+            if (SY_FalloffUsesDistance(light)) distanceSquared = SY_DistanceSquared<L>(light, p);
+        } else {
+            for (int k = 0; k < 3; ++k)
+                l[k] = L::Splat(light.position[k]) - p[k];
+            // The light vector's length is the light's distance.
+            distanceSquared = SY_Dot<L>(l, l);
+            // A light on the surface point has no direction: it is left out, not reported.
+            active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
+            if (L::None(active)) return;
+            Real inverse = L::Splat(1.0) / L::Sqrt(distanceSquared);
+            for (int k = 0; k < 3; ++k)
+                l[k] = l[k] * inverse;
+        }
+
+        // A light in the layer's plane counts as behind it.
+        Real facing = SY_Dot<L>(n, l);
+        Mask behind = L::LessEqual(facing, L::Splat(0.0));
+        if (shader.lightTransmission == 0.0) {
+            active = L::AndNot(behind, active);
+            if (L::None(active)) return;
+        }
+        facing = L::Select(behind, -facing, facing);
+
+        Single spot = L::SplatSingle(1.0f);
+        if (light.type == kSY_LightSpot) {
+            Real axis[3] = {L::Splat(light.direction[0]), L::Splat(light.direction[1]),
+                            L::Splat(light.direction[2])};
+            Real c = SY_Dot<L>(l, axis);
+            active = L::AndNot(L::Less(c, L::Splat(light.cosOuter)), active);
+            if (L::None(active)) return;
+            spot = SY_SpotEdge<L>(light, c);
+        }
+        Single k = spot * SY_Falloff<L>(light, distanceSquared);
+        if (shader.lightTransmission != 0.0) {
+            k = L::SelectSingle(
+                behind, k * L::SplatSingle(static_cast<float>(shader.lightTransmission)), k);
+        }
+
+        Single e[3];
+        for (int c = 0; c < 3; ++c)
+            e[c] = L::SplatSingle(static_cast<float>(light.color[1 + c]));
+        if (shader.acceptsShadows != 0 && light.shadowMap) {
+            Single t[3], a[3];
+            SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId,
+                                     p, active, t);
+            SY_ShadowAttenuation<L>(t, L::SplatSingle(static_cast<float>(light.shadowDarkness)),
+                                    L::Uniform(light.shadowDarkness == 1.0), a);
+            Single most = L::Max(L::Max(a[0], a[1]), a[2]);
+            active = L::AndNot(L::LessEqualSingle(most, L::SplatSingle(0.0f)), active);
+            if (L::None(active)) return;
+            for (int c = 0; c < 3; ++c)
+                e[c] = e[c] * a[c];
+        }
+
+        if (shader.diffuse != 0.0) {
+            Single amount = L::ToSingle(L::ToReal(k) * L::Splat(shader.diffuse) * facing);
+            for (int c = 0; c < 3; ++c)
+                diffuse[c] = diffuse[c] + L::Keep(active, e[c] * amount);
+        }
+        if (shader.specular != 0.0) Highlight(l, v, facing, behind, k, e, active);
+    }
+
+    // Blinn highlight from the power table; a light behind the layer shines through toward the
+    // eye instead.
+    void Highlight(const Real l[3], const Real v[3], Real facing, Mask behind, Single k,
+                   const Single e[3], Mask active) {
+        Real h[3] = {l[0] + v[0], l[1] + v[1], l[2] + v[2]};
+        Real nh = SY_Dot<L>(n, h);
+        Real q = nh * nh / SY_Dot<L>(h, h);
+        Mask turnedAway = L::LessEqual(nh, L::Splat(0.0));
+        if (shader.lightTransmission != 0.0) {
+            Real lv = SY_Dot<L>(l, v);
+            q = L::Select(behind, lv * lv, q);
+            turnedAway = L::AndNot(behind, turnedAway);
+        }
+        active = L::AndNot(turnedAway, active);
+        if (L::None(active)) return;
+        Single power = L::Lookup(shader.specularTable->values, L::Select(active, q, L::Splat(0.0)),
+                                 SY_SpecularTable::kSteps);
+        Single sigma = L::ToSingle(L::ToReal(k) * L::Splat(shader.specular)) * power;
+        // Highlights fade out as the light grazes the surface.
+        sigma = L::SelectSingle(L::Less(facing, L::Splat(0.01)),
+                                sigma * L::ToSingle(L::Splat(100.0) * facing), sigma);
+        const float metal = static_cast<float>(shader.metal);
+        for (int c = 0; c < 3; ++c) {
+            // Metal gives the highlight the texture's colour by adding it to the diffuse factor.
+            Single highlight = L::Keep(active, e[c] * sigma);
+            if (metal == 0.0f) {
+                specular[c] = specular[c] + highlight;
+            } else if (metal == 1.0f) {
+                diffuse[c] = diffuse[c] + highlight;
+            } else {
+                diffuse[c] = diffuse[c] + L::SplatSingle(metal) * highlight;
+                specular[c] = specular[c] + L::SplatSingle(1.0f - metal) * highlight;
+            }
+        }
+    }
+
+    // A layer that takes no light shows its texture, darkened where shadows fall on it.
+    void ShadowOnly() {
+        for (int c = 0; c < 3; ++c) {
+            diffuse[c] = L::SplatSingle(1.0f);
+            specular[c] = L::SplatSingle(0.0f);
+        }
+        for (const SY_LightState* light : shader.lights) {
+            if (light->shadowMap) Darken(*light);
+        }
+    }
+
+    void Darken(const SY_LightState& light) {
+        Real l[3];
+        for (int k = 0; k < 3; ++k) {
+            l[k] = light.type == kSY_LightParallel ? L::Splat(light.direction[k])
+                                                   : L::Splat(light.position[k]) - p[k];
+        }
+        Mask active = L::AndNot(L::LessEqual(SY_Dot<L>(n, l), L::Splat(0.0)), L::All());
+        if (L::None(active)) return;
+        // For a light with a position, its distance is the light vector's length.
+        Real distanceSquared =
+            light.type == kSY_LightParallel ? SY_DistanceSquared<L>(light, p) : SY_Dot<L>(l, l);
+        Single spot = L::SplatSingle(1.0f);
+        if (light.type == kSY_LightSpot) {
+            active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
+            if (L::None(active)) return;
+            Real axis[3] = {L::Splat(light.direction[0]), L::Splat(light.direction[1]),
+                            L::Splat(light.direction[2])};
+            Real c = SY_Dot<L>(l, axis) / L::Sqrt(distanceSquared);
+            active = L::AndNot(L::Less(c, L::Splat(light.cosOuter)), active);
+            if (L::None(active)) return;
+            spot = SY_SpotEdge<L>(light, c);
+        }
+        Single w = L::ToSingle(L::ToReal(spot) * L::Splat(light.shadowDarkness) *
+                               L::ToReal(SY_Falloff<L>(light, distanceSquared)));
+        active = L::AndNot(L::LessEqualSingle(w, L::SplatSingle(0.0f)), active);
+        if (L::None(active)) return;
+        Single t[3], a[3];
+        SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId, p,
+                                 active, t);
+        SY_ShadowAttenuation<L>(t, w, L::EqualSingle(w, L::SplatSingle(1.0f)), a);
+        for (int c = 0; c < 3; ++c)
+            diffuse[c] = L::SelectSingle(active, diffuse[c] * a[c], diffuse[c]);
+    }
+
+    void Run() {
+        if (shader.acceptsLights) {
+            Lit();
+        } else {
+            ShadowOnly();
+        }
+    }
+};
+
+template <class L>
+void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
+           SY_Lighting* const out[L::kCount]) {
+    PixelLighting<L> lighting{shader, {}, {}, {}, {}};
+    for (int k = 0; k < 3; ++k) {
+        // Without the need the span routine does not work out the points.
+        lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);
+        lighting.n[k] = L::Splat(n[k]);
+    }
+    lighting.Run();
+    lighting.Store(out);
 }
 
 }  // namespace
 
 void SY_LayerShader::LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const {
-    if (!acceptsLights) {
-        // Only shadows change what shows; without shadow maps every light passes whole.
-        for (int c = 0; c < 3; ++c)
-            out->diffuse[c] = 1.0f, out->specular[c] = 0.0f;
-        return;
-    }
-    for (int c = 0; c < 3; ++c)
-        out->diffuse[c] = out->specular[c] = 0.0f;
-    double v[3] = {};
-    if (needsPoint) {
-        for (int k = 0; k < 3; ++k)
-            v[k] = eye[k] - p[k];
-        double lengthSquared = Dot(v, v);
-        if (lengthSquared < 1e-48) SY_ThrowZeroLengthVector();
-        double inverse = 1.0 / std::sqrt(lengthSquared);
-        for (double& component : v)
-            component *= inverse;
-    }
-    for (const SY_LightState* light : lights) {
-        const double* color = light->color + 1;
-        if (light->type == kSY_LightAmbient) {
-            for (int c = 0; c < 3; ++c)
-                out->diffuse[c] += static_cast<float>(color[c] * ambient);
-            continue;
-        }
-        double l[3];
-        if (light->type == kSY_LightParallel) {
-            for (int k = 0; k < 3; ++k)
-                l[k] = light->direction[k];
-        } else {
-            for (int k = 0; k < 3; ++k)
-                l[k] = light->position[k] - p[k];
-            double lengthSquared = Dot(l, l);
-            if (lengthSquared < 1e-12) continue;
-            double inverse = 1.0 / std::sqrt(lengthSquared);
-            for (double& component : l)
-                component *= inverse;
-        }
-        double facing = Dot(n, l);
-        bool backLit = facing <= 0.0;
-        if (backLit) {
-            if (lightTransmission == 0.0) continue;
-            facing = -facing;
-        }
-        float spot = 1.0f;
-        if (light->type == kSY_LightSpot) {
-            spot = SpotFactor(*light, Dot(l, light->direction));
-            if (spot < 0.0f) continue;
-        }
-        float k = spot * Falloff(*light, DistanceSquared(*light, p));
-        if (backLit) k *= static_cast<float>(lightTransmission);
-        if (diffuse != 0.0) {
-            auto amount = static_cast<float>(k * diffuse * facing);
-            for (int c = 0; c < 3; ++c)
-                out->diffuse[c] += static_cast<float>(color[c]) * amount;
-        }
-        if (specular == 0.0) continue;
-        double q;
-        if (backLit) {
-            q = Dot(l, v) * Dot(l, v);
-        } else {
-            double h[3] = {l[0] + v[0], l[1] + v[1], l[2] + v[2]};
-            double nh = Dot(n, h);
-            if (nh <= 0.0) continue;
-            q = nh * nh / Dot(h, h);
-        }
-        auto sigma = static_cast<float>(k * specular) *
-                     specularTable->values[static_cast<int32_t>(q * SY_SpecularTable::kSteps)];
-        if (facing < 0.01) sigma *= static_cast<float>(100.0 * facing);
-        auto toDiffuse = static_cast<float>(metal), toSpecular = 1.0f - toDiffuse;
-        for (int c = 0; c < 3; ++c) {
-            float highlight = static_cast<float>(color[c]) * sigma;
-            out->diffuse[c] += toDiffuse * highlight;
-            out->specular[c] += toSpecular * highlight;
-        }
-    }
+    const double* const points[1] = {p};
+    SY_Lighting* const outs[1] = {out};
+    Light<SY_OneLane>(*this, points, n, outs);
 }
 
 void SY_LayerShader::LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                                     SY_Lighting* out1, SY_Lighting* out2) const {
-    LightOnePixel(p1, n, out1);
-    LightOnePixel(p2, n, out2);
+    const double* const points[2] = {p1, p2};
+    SY_Lighting* const outs[2] = {out1, out2};
+    Light<SY_TwoLanes>(*this, points, n, outs);
 }

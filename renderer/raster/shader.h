@@ -35,9 +35,13 @@ class SY_LayerShader : public SY_Shader {
 public:
     bool NeedsSurfacePoint() const override { return needsPoint != 0; }
 
-    // Lights the surface point p with the unit normal n (both in world space).
+    // Lights the surface point p with the unit normal n (both in world space; n turned toward
+    // the camera, so a layer seen from behind is lit like its front). p is read only when
+    // needsPoint is set. Throws the math library's zero-length code, after reporting it, when
+    // the eye lies on the surface.
     void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
-    // Lights two points of the layer at once; the same results as two calls of LightOnePixel.
+    // Lights two points of the layer at once in vector registers, bit for bit as two calls of
+    // LightOnePixel. Span routines pair pixels through it when U_G_CPU_DataP()->hasVectorUnits.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2) const;
 
@@ -53,14 +57,15 @@ public:
     SY_OwnedArray<const SY_LightState*> lights;
     double eye[3] = {};     // camera position, in world space like the surface points
     float depthOffset = 0;  // added to every depth key; layers later in render order lie behind
-    uint8_t acceptsShadows = 0;  // 2: the texel's colour is replaced by white, only shadows show
-    uint8_t acceptsLights = 0;   // 0 takes the shadow-only path
-    uint8_t softShadowLookup = 0;
-    uint8_t shaded = 0;  // 0: pixels pass unlit
-    uint8_t needsPoint = 0;
+    uint8_t acceptsShadows = 0;    // 2: the texel's colour is replaced by white, only shadows show
+    uint8_t acceptsLights = 0;     // 0 takes the shadow-only path
+    uint8_t softShadowLookup = 0;  // filtered shadow-map lookups, for best-quality layers
+    uint8_t shaded = 0;            // 0: pixels pass unlit
+    uint8_t needsPoint = 0;        // the lighting reads the surface point
 };
 
 // The shader of a renderable drawn into the frame: its material, its lights, and which work
-// its pixels need. Layers without lights, or a frame without lights, pass their pixels unlit.
+// its pixels need. A layer lit by no light, or one that takes no light and catches no shadow,
+// passes its pixels unlit.
 std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
                                                    const SY_TRLayer& renderable);

@@ -2,8 +2,13 @@
 
 #include <cmath>
 
+double SY_SpecularExponent(double shininess) {
+    constexpr double kDoublings = 9;  // 2⁹ = 512 at full shininess
+    return std::exp2(kDoublings * shininess / 100.0);
+}
+
 const SY_SpecularTable& SY_SpecularTables::ForShininess(double shininess) {
-    auto exponent = static_cast<float>(shininess * 0.5);
+    auto exponent = static_cast<float>(SY_SpecularExponent(shininess) * 0.5);
     for (const auto& table : tables_) {
         if (table->exponent == exponent) return *table;
     }
