@@ -6,9 +6,6 @@
 
 namespace {
 
-// Layers later in render order lie this much farther behind per index, as in their geometry.
-constexpr double kDepthStepPerIndex = 1e-7;
-
 // The lit path reads the surface point for the light's direction and distance, for the view
 // vector of highlights, and for shadow lookups.
 bool LitReadsPoint(const SY_LayerShader& shader, const SY_LightState& light) {
@@ -32,7 +29,7 @@ std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
     shader->lightTransmission = material.lightTransmission;
     shader->metal = material.metal;
     std::copy(context->cameraPosition, context->cameraPosition + 3, shader->eye);
-    shader->depthOffset = static_cast<float>(-material.depthIndex * kDepthStepPerIndex);
+    shader->depthOffset = static_cast<float>(-material.depthIndex * kSY_DepthStepPerIndex);
     shader->acceptsShadows = material.acceptsShadows;
     shader->acceptsLights = material.acceptsLights;
     shader->softShadowLookup = material.acceptsShadows != 0 && material.bestQuality;

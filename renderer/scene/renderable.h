@@ -29,6 +29,10 @@ struct SY_Vertex {
 
 using SY_Polygon = SY_AccountedVector<SY_Vertex>;
 
+// Separates the layers of a coplanar stack in depth, per position in the render order: later
+// layers lie this much farther behind, in their geometry and in their fragments' depth keys.
+inline constexpr double kSY_DepthStepPerIndex = 1e-7;
+
 // Below this the plane's depth coefficient is taken as zero: the layer is seen edge-on.
 inline constexpr double kSY_PlaneDepthEpsilon = 1e-12;
 

@@ -5,9 +5,6 @@
 
 namespace {
 
-// Separates the layers of a coplanar stack in screen depth, per render position.
-constexpr double kDepthStep = 1e-7;
-
 const SY_LightState* FindLight(int32_t id, const SY_LightState* lightStates, int32_t count) {
     for (int32_t i = 0; i < count; ++i) {
         if (lightStates[i].id == id) return &lightStates[i];
@@ -43,7 +40,7 @@ void SY_BuildRenderables(const SY_RenderableSources& sources, SY_Renderables* re
         const SY_LayerDesc& layer = sources.layers[i];
         if (layer.opacity == 0 || !(layer.renders || layer.wireframe)) continue;
         SY_TRLayer renderable(layer);
-        options.depthOffset = layer.depthIndex * kDepthStep;
+        options.depthOffset = layer.depthIndex * kSY_DepthStepPerIndex;
         const SY_CameraView& camera = layer.motionBlur ? sources.motionCamera : sources.frameCamera;
         if (!SY_SetUpRenderable(layer, camera, options, &renderable)) continue;
         AssignLights(layer, sources.lightStates, sources.lightCount, &renderable);
