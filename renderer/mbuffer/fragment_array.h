@@ -1,0 +1,137 @@
+// Per-pixel fragment lists over a rectangle of the output: a flat head table, one record pool
+// per render thread, and the insertion that keeps each list in depth order.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "m_matrix.h"
+#include "pf_pixel.h"
+#include "renderer/mbuffer/channel_math.h"
+#include "renderer/mbuffer/fragment_pool.h"
+#include "renderer/mbuffer/records.h"
+
+// What every array owns, whatever its records: the pools and the head table. Building throws
+// 4 when memory runs out, with everything taken so far released.
+class SY_FragmentStorage {
+public:
+    // One pool per thread of SY_ThreadCount(), blocks under the shared allocation lock; a head
+    // table of (right − left) × (bottom − top) null heads of headBytes each.
+    SY_FragmentStorage(const M_LRect& bounds, size_t headBytes);
+    ~SY_FragmentStorage();
+    SY_FragmentStorage(const SY_FragmentStorage&) = delete;
+    SY_FragmentStorage& operator=(const SY_FragmentStorage&) = delete;
+
+    const M_LRect& Bounds() const { return bounds; }
+    int32_t PoolCount() const { return poolCount; }
+    const SY_FragmentPool& Pool(int32_t i) const { return *pools[i]; }
+
+protected:
+    M_LRect bounds;
+    int32_t width;  // row stride of the head table, in heads
+    SY_FragmentPool** pools = nullptr;
+    void* heads = nullptr;
+    int32_t poolCount = 0;
+
+private:
+    void Release() noexcept;
+    size_t poolArrayBytes = 0;
+    size_t headTableBytes = 0;
+};
+
+// Puts `record` into the list at `head` after the last record that stays ahead of it
+// (staysAhead(existing, record)), so records that tie keep the order they came in.
+template <class F, class StaysAhead>
+inline void SY_InsertInOrder(F** head, F* record, StaysAhead staysAhead) {
+    F* at = *head;
+    if (!at || !staysAhead(*at, *record)) {
+        record->next = at;
+        *head = record;
+        return;
+    }
+    while (at->next && staysAhead(*at->next, *record))
+        at = at->next;
+    record->next = at->next;
+    at->next = record;
+}
+
+// The lists of records F. Pixel (x, y) in output coordinates inside the bounds has its head at
+// HeadAt(x, y); the heads of a row are consecutive.
+template <class F>
+class SY_FragmentLists : public SY_FragmentStorage {
+public:
+    using Record = F;
+
+    explicit SY_FragmentLists(const M_LRect& rect)
+        : SY_FragmentStorage(rect, sizeof(F*)),
+          origin(static_cast<F**>(heads) - rect.left - static_cast<ptrdiff_t>(rect.top) * width) {}
+
+    F** HeadAt(int32_t x, int32_t y) const {
+        return origin + static_cast<ptrdiff_t>(y) * width + x;
+    }
+
+protected:
+    F* Carve(int32_t poolIndex) { return pools[poolIndex]->template Carve<F>(); }
+
+    F** origin;  // heads − left − top × width
+};
+
+// Lists of object fragments, farthest first. AddFragment is called by the span routines for
+// every covered pixel; each thread passes its own pool index and only pixels of its own rows.
+template <class F>
+class SY_FragmentArray : public SY_FragmentLists<F> {
+public:
+    using Pixel = typename F::Pixel;
+    using Coverage = SY_Coverage<Pixel>;
+
+    explicit SY_FragmentArray(const M_LRect& rect) : SY_FragmentLists<F>(rect) {}
+
+    // Draft records. A source of zero alpha is dropped whatever the coverage; otherwise the
+    // coverage is folded into the stored alpha.
+    void AddFragment(const Pixel* color, Coverage coverage, int32_t mode, float depth, F** head,
+                     int32_t poolIndex) requires(F::kGradients == 0) {
+        if (color->alpha == 0) return;
+        Insert(head, Fill(color, coverage, mode, depth, poolIndex));
+    }
+
+    // Anti-aliased records: depth is the plane's minimum over the pixel.
+    void AddFragment(const Pixel* color, Coverage coverage, int32_t mode, float depth, float dzdx,
+                     float dzdy, F** head, int32_t poolIndex) requires(F::kGradients == 2) {
+        if (color->alpha == 0) return;
+        F* record = Fill(color, coverage, mode, depth, poolIndex);
+        record->dzdx = dzdx;
+        record->dzdy = dzdy;
+        Insert(head, record);
+    }
+
+    // Motion-blur records: depth is the minimum over the pixel and the shutter interval.
+    void AddFragment(const Pixel* color, Coverage coverage, int32_t mode, float depth, float dzdx,
+                     float dzdy, float dzdt, F** head,
+                     int32_t poolIndex) requires(F::kGradients == 3) {
+        if (color->alpha == 0) return;
+        F* record = Fill(color, coverage, mode, depth, poolIndex);
+        record->dzdx = dzdx;
+        record->dzdy = dzdy;
+        record->dzdt = dzdt;
+        Insert(head, record);
+    }
+
+private:
+    F* Fill(const Pixel* color, Coverage coverage, int32_t mode, float depth, int32_t poolIndex) {
+        F* record = this->Carve(poolIndex);
+        record->color = *color;
+        record->color.alpha = SY_ChannelMath<Pixel>::ScaleByCoverage(color->alpha, coverage);
+        record->mode = static_cast<uint8_t>(mode);
+        record->opaque = mode == 2 && record->color.alpha == PF_PixelTraits<Pixel>::kMax;
+        record->scratchIndex = 0;
+        record->depth = depth;
+        return record;
+    }
+
+    // Ascending depth; an equal depth goes behind the records already there.
+    static void Insert(F** head, F* record) {
+        SY_InsertInOrder(head, record, [](const F& existing, const F& added) {
+            return !(existing.depth > added.depth);
+        });
+    }
+};

@@ -1,0 +1,87 @@
+#include "renderer/mbuffer/mbuffer.h"
+
+#include <new>
+
+#include "renderer/mbuffer/record_apply.h"
+#include "u_memory.h"
+
+namespace {
+
+template <class P>
+SY_MBuffer* NewDraftStandingInForBestQuality(const M_LRect& bounds) {
+    return new SY_MBufferDraftX<P>(bounds);
+}
+
+template <class P>
+SY_MBuffer* NewOfQuality(SY_MBufferQuality quality, const M_LRect& bounds) {
+    switch (quality) {
+        case SY_MBufferQuality::kDraft:
+            return new SY_MBufferDraftX<P>(bounds);
+        case SY_MBufferQuality::kAntialiased:
+        case SY_MBufferQuality::kMotionBlur:
+            return NewDraftStandingInForBestQuality<P>(bounds);
+    }
+    __builtin_unreachable();
+}
+
+}  // namespace
+
+SY_MBufferKind SY_MBufferKindFor(int16_t bitDepth, bool antialias, bool motionBlur) {
+    const int16_t depth = bitDepth == 16 || bitDepth == 32 ? bitDepth : int16_t{8};
+    if (motionBlur) return {SY_MBufferQuality::kMotionBlur, depth};
+    if (antialias) return {SY_MBufferQuality::kAntialiased, depth};
+    return {SY_MBufferQuality::kDraft, depth};
+}
+
+std::unique_ptr<SY_MBuffer> SY_MBuffer::New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
+                                            bool motionBlur) {
+    const SY_MBufferKind kind = SY_MBufferKindFor(bitDepth, antialias, motionBlur);
+    try {
+        switch (kind.bitDepth) {
+            case 16:
+                return std::unique_ptr<SY_MBuffer>(NewOfQuality<PF_Pixel16>(kind.quality, bounds));
+            case 32:
+                return std::unique_ptr<SY_MBuffer>(
+                    NewOfQuality<PF_PixelFloat>(kind.quality, bounds));
+            default:
+                return std::unique_ptr<SY_MBuffer>(NewOfQuality<PF_Pixel8>(kind.quality, bounds));
+        }
+    } catch (const std::bad_alloc&) {
+        throw kU_ErrOutOfMemory;  // the object itself could not be had
+    }
+}
+
+template <class P>
+void SY_MBufferDraftX<P>::Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables*,
+                                  PF_World& destination) {
+    SY_RecordApplier<P> applier(nullptr);
+    const int32_t left = this->bounds.left;
+    const int32_t count = this->width;
+    SY_WalkRows(this->bounds, kSY_DraftProgressCadence, progress, [&](int32_t y) {
+        Record* const* rowHeads = this->HeadAt(left, y);
+        P* pixels = destination.PixelAt<P>(left, y);
+        int32_t i = 0;
+        // Neighbouring lists are independent chains of loads: walking two at once keeps twice
+        // as many records on their way from memory.
+        for (; i + 1 < count; i += 2) {
+            const Record* a = rowHeads[i];
+            const Record* b = rowHeads[i + 1];
+            for (; a && b; a = a->next, b = b->next) {
+                applier.Apply(*a, &pixels[i]);
+                applier.Apply(*b, &pixels[i + 1]);
+            }
+            for (; a; a = a->next)
+                applier.Apply(*a, &pixels[i]);
+            for (; b; b = b->next)
+                applier.Apply(*b, &pixels[i + 1]);
+        }
+        if (i < count) {
+            for (const Record* record = rowHeads[i]; record; record = record->next)
+                applier.Apply(*record, &pixels[i]);
+        }
+    });
+}
+
+template class SY_MBufferDraftX<PF_Pixel8>;
+template class SY_MBufferDraftX<PF_Pixel16>;
+template class SY_MBufferDraftX<PF_PixelFloat>;

@@ -1,0 +1,87 @@
+// Fragment buffers: the per-pixel fragment lists a group of layers that overlap in depth is
+// drawn into, then resolved into the output world.
+//
+// Per group the frame driver makes a buffer with SY_MBuffer::New for the group's rectangle
+// (clipped to the output world), hands the SY_MBuffer pointer itself to the spans as the
+// target object of kind 2, draws every member, calls Resolve once and lets the owner go (also
+// when a member's drawing throws).
+//
+// A span routine (and a span from an image) asks the target's IsAntialiased, HasMotionBlur and
+// GetBitDepth once per span, casts the SY_MBuffer pointer to the concrete class with
+// static_cast (SY_MBufferDraftX<P> for a draft buffer of P's depth), takes the head of its
+// first pixel with HeadAt(x, y), and calls AddFragment for every covered pixel with
+// consecutive heads along the row and the worker's thread index as pool index.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+
+#include "m_matrix.h"
+#include "pf_pixel.h"
+#include "pf_world.h"
+#include "pf_xfer.h"
+#include "renderer/mbuffer/fragment_array.h"
+#include "renderer/mbuffer/records.h"
+#include "renderer/scene/fetchers.h"
+
+class SY_MBuffer {
+public:
+    // A buffer for the pixels of bounds, of the depth bitDepth (16 and 32 as such, anything
+    // else as 8) and the class the flags ask for; motion blur implies anti-aliasing. Throws 4
+    // when memory runs out, with nothing left allocated; never gives null.
+    static std::unique_ptr<SY_MBuffer> New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
+                                           bool motionBlur);
+
+    virtual ~SY_MBuffer() = default;
+    virtual bool IsAntialiased() const = 0;
+    virtual bool HasMotionBlur() const = 0;
+    // Composites every pixel's list onto pixel (x, y) of destination, a world of the buffer's
+    // depth, farthest record first. Reports rows to progress when it is not null. blendTables
+    // (null: none) are the frame's colour settings, for the classes that mix in linear light.
+    virtual void Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables* blendTables,
+                         PF_World& destination) = 0;
+    // 8, 16 or 32: the pixel type the concrete class works in.
+    virtual int16_t GetBitDepth() const = 0;
+};
+
+enum class SY_MBufferQuality : uint8_t { kDraft, kAntialiased, kMotionBlur };
+
+struct SY_MBufferKind {
+    SY_MBufferQuality quality;
+    int16_t bitDepth;  // 8, 16 or 32
+};
+
+// The class New chooses for a request.
+SY_MBufferKind SY_MBufferKindFor(int16_t bitDepth, bool antialias, bool motionBlur);
+
+template <class P>
+class SY_MBufferDraftX;
+
+// Draft buffers blend each list in order, farthest first, without splitting intersections.
+class SY_MBufferDraft
+    : public SY_MBuffer,
+      public PF_PixelContainer<SY_MBufferDraftX<PF_Pixel8>, SY_MBufferDraftX<PF_Pixel16>,
+                               SY_MBufferDraftX<PF_PixelFloat>> {
+public:
+    bool IsAntialiased() const final { return false; }
+    bool HasMotionBlur() const final { return false; }
+};
+
+template <class P>
+class SY_MBufferDraftX final : public SY_MBufferDraft,
+                               public SY_FragmentArray<SY_FragmentDraftX<P>> {
+public:
+    using Record = SY_FragmentDraftX<P>;
+
+    // Throws 4 when memory runs out.
+    explicit SY_MBufferDraftX(const M_LRect& rect) : SY_FragmentArray<Record>(rect) {}
+
+    // Blends with the host's transfer functions and no blending tables, whatever is passed.
+    void Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables* blendTables,
+                 PF_World& destination) override;
+    int16_t GetBitDepth() const override { return PF_PixelTraits<P>::kBitDepth; }
+};
+
+extern template class SY_MBufferDraftX<PF_Pixel8>;
+extern template class SY_MBufferDraftX<PF_Pixel16>;
+extern template class SY_MBufferDraftX<PF_PixelFloat>;
