@@ -17,13 +17,18 @@ namespace sy_sampling {
 inline constexpr double kFarTexels = 32000.0;
 inline constexpr double kMaxRadius = 100.0;  // texels; larger footprints are capped
 
-// Rounds halves away from zero into 16.16 fixed point.
+// Rounds halves away from zero; v must lie well inside the int32 range.
+inline int32_t RoundAway(double v) {
+    return static_cast<int32_t>(v + (v < 0 ? -0.5 : 0.5));
+}
+
+// 16.16 fixed point, rounded halves away from zero.
 inline int32_t ToFixed(double texels) {
-    return static_cast<int32_t>(std::lround(std::clamp(texels, -kFarTexels, kFarTexels) * 65536.0));
+    return RoundAway(std::clamp(texels, -kFarTexels, kFarTexels) * 65536.0);
 }
 
 inline int32_t RadiusToFixed(double radius) {
-    return radius >= kMaxRadius ? 6553600 : static_cast<int32_t>(std::lround(radius * 65536.0));
+    return radius >= kMaxRadius ? 6553600 : RoundAway(radius * 65536.0);
 }
 
 // The sample point and the footprint's half-size along u and v in texels.
@@ -55,17 +60,20 @@ inline bool InFront(const SY_SpanMapping& m, bool perspective) {
 // The pixel library's filter at (u, v) with the half-sizes (ru, rv): interpolation while the
 // footprint stays within half a texel, the box average beyond.
 template <class P>
-inline void Filter(SY_SpanTexture& texture, double u, double v, double ru, double rv, P* out) {
+[[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, double u, double v, double ru,
+                                          double rv, P* out) {
+    // A radius rounds to at most 32768 (half a texel) in fixed point below this many texels.
+    constexpr double kSubpixelBelow = 32768.5 / 65536.0;
     int32_t x = ToFixed(u), y = ToFixed(v);
     PF_SampPB& pb = texture.sampling;
-    pb.xRadius = RadiusToFixed(ru);
-    pb.yRadius = RadiusToFixed(rv);
-    if (pb.xRadius <= 32768 && pb.yRadius <= 32768) {
+    if (ru < kSubpixelBelow && rv < kSubpixelBelow) {
         if (texture.quality == 2)
             PF_SubpixelBicubic(x, y, pb, out);
         else
             PF_SubpixelBilinear(x, y, pb, out);
     } else {
+        pb.xRadius = RadiusToFixed(ru);
+        pb.yRadius = RadiusToFixed(rv);
         PF_AreaSample(x, y, pb, out);
     }
 }

@@ -9,22 +9,38 @@ namespace {
 
 constexpr int32_t kErrUnexpectedBitDepth = 3;
 
-// Kind 1: blended into the row of the world with the layer's transfer mode.
+// Kind 1: blended into the row of the world with the layer's transfer mode. Normal mode
+// without linear blending replaces the destination by an opaque pixel at full coverage, so
+// such pixels (most of an opaque layer) are stored without a call.
 template <class P>
 struct CompositeDelivery {
-    P* row;
-    PF_Xfer1OpacityFunc<P> blend;
-    const PF_LinearBlendingTables* tables;
+    static constexpr bool kUsesDepth = false;
+    static constexpr auto kFull = static_cast<SY_Coverage<P>>(PF_PixelTraits<P>::kMax);
+
+    CompositeDelivery(P* destinationRow, uint8_t mode, const PF_LinearBlendingTables* blending)
+        : row(destinationRow),
+          blend(PF_Get_Xfer1_Opacity<P>(mode)),
+          tables(blending),
+          opaqueReplaces((mode & 127) == kPF_XferNormal && !blending) {}
 
     void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth&,
                  int32_t) {
-        blend(&pixel, tables, coverage, row + x);
+        if (opaqueReplaces && coverage == kFull && pixel.alpha == kFull)
+            row[x] = pixel;
+        else
+            blend(&pixel, tables, coverage, row + x);
     }
+
+    P* row;
+    PF_Xfer1OpacityFunc<P> blend;
+    const PF_LinearBlendingTables* tables;
+    bool opaqueReplaces;
 };
 
 // Kind 3: written over the image's pixel; the image's owner applies the coverage later.
 template <class P>
 struct StoreDelivery {
+    static constexpr bool kUsesDepth = false;
     P* row;  // the image's row, moved so that frame x indexes it
 
     void Deliver(int32_t x, const P& pixel, SY_Coverage<P>, const SY_FragmentDepth&, int32_t) {
@@ -58,8 +74,7 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     switch (target.mode) {
         case kSY_TargetDestination: {
             auto* world = static_cast<PF_World*>(target.object);
-            CompositeDelivery<P> delivery{world->Row<P>(y), PF_Get_Xfer1_Opacity<P>(shader.mode),
-                                          tables};
+            CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }

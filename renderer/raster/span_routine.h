@@ -92,9 +92,9 @@ template <class P>
 struct Pixel {
     P texel;
     SY_Coverage<P> coverage;
-    bool skipped;     // the matte hides it
-    double point[3];  // surface point, when lighting needs it
-    SY_FragmentDepth depth;
+    bool skipped;            // the matte hides it
+    double point[3];         // surface point, when lighting needs it
+    SY_FragmentDepth depth;  // set only for deliveries that use it
 };
 
 // The per-span constants of the loop.
@@ -109,9 +109,10 @@ struct SpanSetup {
     bool pairLighting;
 };
 
-template <class P, class State>
-void Fetch(const SpanSetup<P>& setup, State& state, const SY_SpanRayState& ray, const P* matte,
-           Pixel<P>* out) {
+template <bool kDepth, class P, class State>
+[[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
+                                         const SY_SpanRayState& ray, const P* matte,
+                                         Pixel<P>* out) {
     using Traits = PF_PixelTraits<P>;
     using C = typename Traits::Channel;
     const SY_SpanMapping& first = FirstMapping(state);
@@ -133,16 +134,18 @@ void Fetch(const SpanSetup<P>& setup, State& state, const SY_SpanRayState& ray, 
         out->texel.red = out->texel.green = out->texel.blue = kMax;
     }
     out->coverage = matte ? MatteCoverage<P>(matte->alpha, setup.coverage0) : setup.coverage0;
-    double travel = ShutterTravel(state);
-    out->depth.depth =
-        static_cast<float>(first.w + first.low + std::min(0.0, travel) + setup.offset0);
-    out->depth.dzdx = first.dwdx;
-    out->depth.dzdy = first.dwdy;
-    out->depth.dzdt = static_cast<float>(travel);
+    if constexpr (kDepth) {
+        double travel = ShutterTravel(state);
+        out->depth.depth =
+            static_cast<float>(first.w + first.low + std::min(0.0, travel) + setup.offset0);
+        out->depth.dzdx = first.dwdx;
+        out->depth.dzdy = first.dwdy;
+        out->depth.dzdt = static_cast<float>(travel);
+    }
 }
 
 template <class State>
-void Advance(bool needsPoint, State& state, SY_SpanRayState& ray) {
+[[gnu::always_inline]] inline void Advance(bool needsPoint, State& state, SY_SpanRayState& ray) {
     state.Step();
     if (needsPoint) {
         for (int k = 0; k < 3; ++k)
@@ -155,7 +158,8 @@ void Advance(bool needsPoint, State& state, SY_SpanRayState& ray) {
 // Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
 // matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs so
 // that lighting can work on two at once; a pair the matte hides wholly is only stepped over.
-// The delivery receives (x, pixel, coverage, depth, thread) for every pixel the matte shows.
+// The delivery receives (x, pixel, coverage, depth, thread) for every pixel the matte shows;
+// the depth is worked out only for deliveries whose kUsesDepth is true.
 template <class P, class State, class Delivery>
 void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
                  SY_SpanRayState& ray, const P* matte, int32_t x, int32_t count, Delivery& delivery,
@@ -180,7 +184,8 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
             continue;
         }
         for (int k = 0; k < 2; ++k) {
-            Fetch(setup, state, ray, matte ? matte + i + k : nullptr, &pixels[k]);
+            Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
+                                        &pixels[k]);
             Advance(setup.needsPoint, state, ray);
         }
         if (setup.shaded) {
@@ -202,7 +207,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
         }
     }
     if (i < count) {
-        Fetch(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
+        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
         if (pixels[0].skipped) return;
         if (setup.shaded) {
             SY_Lighting light;
