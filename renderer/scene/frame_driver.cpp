@@ -1,5 +1,9 @@
 #include "renderer/scene/frame_driver.h"
 
+#include <memory>
+
+#include "pf_draw.h"
+#include "renderer/raster/shader.h"
 #include "renderer/scene/depth_grouping.h"
 #include "renderer/scene/motion_thinning.h"
 #include "renderer/scene/render_context.h"
@@ -33,12 +37,36 @@ void BuildRenderables(SY_RenderContext* context) {
     context->renderablesDone = 0;
 }
 
+// Edges along the output's border are left out: they would outline the frame, not the layer.
+bool OnBorder(const SY_Vertex& a, const SY_Vertex& b, double width, double height) {
+    constexpr double kEdge = 1e-11;
+    return (a.x == 0 && b.x == 0) || (a.y == 0 && b.y == 0) ||
+           (a.x >= width - kEdge && b.x >= width - kEdge) ||
+           (a.y >= height - kEdge && b.y >= height - kEdge);
+}
+
+// The outline of the layer's first drawn subsample, in opaque white over the destination.
+void DrawOutline(const PF_World& destination, const SY_TRLayer& renderable) {
+    const SY_Polygon& polygon = renderable.subsamples[renderable.firstValid].vertices;
+    if (polygon.empty()) return;
+    const PF_PixelFloat white{1, 1, 1, 1};
+    const SY_Vertex* previous = &polygon.back();
+    for (const SY_Vertex& vertex : polygon) {
+        if (!OnBorder(*previous, vertex, destination.width, destination.height))
+            PF_DrawLine(destination, previous->x, previous->y, vertex.x, vertex.y, white);
+        previous = &vertex;
+    }
+}
+
 void DrawRenderable(SY_RenderContext* context, SY_TRLayer* renderable,
                     const SY_RenderTarget& target) {
-    if (!renderable->material.renders) return;
-    SY_CameraView camera =
-        renderable->material.motionBlur ? MotionCamera(*context) : FrameCamera(*context);
-    renderable->Render(context, camera, nullptr, context->scene->fieldMode, target);
+    if (renderable->material.renders) {
+        std::unique_ptr<SY_LayerShader> shader = SY_MakeLayerShader(context, *renderable);
+        SY_CameraView camera =
+            renderable->material.motionBlur ? MotionCamera(*context) : FrameCamera(*context);
+        renderable->Render(context, camera, shader.get(), context->scene->fieldMode, target);
+    }
+    if (renderable->material.wireframe) DrawOutline(*context->destination, *renderable);
 }
 
 // A group of one is drawn straight into the destination. Larger groups need the fragment

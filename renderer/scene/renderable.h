@@ -99,9 +99,11 @@ public:
     SY_TRLayer(SY_TRLayer&&) noexcept = default;
     SY_TRLayer& operator=(SY_TRLayer&&) noexcept = default;
 
-    // Drawing arrives with the span renderer.
-    void Render(SY_RenderContext*, const SY_CameraView&, SY_Shader*, int32_t,
-                const SY_RenderTarget&) override {}
+    // Draws the layer into the target row by row, counts it as done and reports progress.
+    // Modes 1 and 3 need a layer shader. Throws what the texture fetch, the geometry and the
+    // row work throw, with the texture and the track matte handed back.
+    void Render(SY_RenderContext* context, const SY_CameraView& camera, SY_Shader* shader,
+                int32_t fieldMode, const SY_RenderTarget& target) override;
 
     // The screen box is empty when it has no area.
     bool HasEmptyBounds() const { return !(bounds[0] < bounds[2]) || !(bounds[1] < bounds[3]); }

@@ -1,8 +1,10 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <new>
 
 #include "frame_test_support.h"
+#include "memory_texture_fetcher.h"
 #include "pf_world.h"
 #include "renderer/scene/frame_driver.h"
 #include "renderer/scene/render_context.h"
@@ -148,13 +150,20 @@ TEST(FrameDriver, AnInjectedAllocationFailureFreesEverything) {
             scene.layers[i].lightIds = {0, 7};
         }
         PF_WorldX<PF_Pixel8> destination(64, 64);
+        PF_WorldX<PF_Pixel8> texture(32, 32);
+        ostrel_test::MemoryTextureFetcher fetcher;
+        for (int32_t i = 0; i < 3; ++i)
+            fetcher.Add(i, &texture);
+        RecordingProgress progress;
         int64_t before = U_AccountedBytes();
         try {
             scene_test::FailingAllocation failing(n);
-            SY_RenderFrame(scene, nullptr, nullptr, nullptr, false, &destination, nullptr);
+            SY_RenderFrame(scene, &fetcher, &progress, nullptr, false, &destination, nullptr);
             completed = true;
         } catch (int32_t code) {
             EXPECT_EQ(code, 4) << "allocation " << n;
+        } catch (const std::bad_alloc&) {
+            // Tracked objects (the layer shaders) report exhausted memory the standard way.
         }
         EXPECT_EQ(U_AccountedBytes(), before) << "allocation " << n;
     }

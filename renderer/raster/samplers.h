@@ -1,0 +1,207 @@
+// Texture samplers of the span routines: the texel of the current span position, nearest or
+// filtered by the pixel library, for one geometry sample or averaged over motion subsamples.
+#pragma once
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+
+#include "pf_pixel.h"
+#include "pf_sampling.h"
+#include "renderer/raster/span_state.h"
+
+namespace sy_sampling {
+
+// Texture positions beyond this many texels from the origin are outside every texture, and
+// stay inside 16.16 fixed point.
+inline constexpr double kFarTexels = 32000.0;
+inline constexpr double kMaxRadius = 100.0;  // texels; larger footprints are capped
+
+// Rounds halves away from zero; v must lie well inside the int32 range.
+inline int32_t RoundAway(double v) {
+    return static_cast<int32_t>(v + (v < 0 ? -0.5 : 0.5));
+}
+
+// 16.16 fixed point, rounded halves away from zero.
+inline int32_t ToFixed(double texels) {
+    return RoundAway(std::clamp(texels, -kFarTexels, kFarTexels) * 65536.0);
+}
+
+inline int32_t RadiusToFixed(double radius) {
+    return radius >= kMaxRadius ? 6553600 : RoundAway(radius * 65536.0);
+}
+
+// The sample point and the footprint's half-size along u and v in texels.
+struct Footprint {
+    double u, v, ru, rv;
+};
+
+inline Footprint FootprintOf(const SY_SpanMapping& m, bool perspective) {
+    Footprint f;
+    f.u = m.u * m.invW;
+    f.v = m.v * m.invW;
+    double dudx = m.dudx, dudy = m.dudy, dvdx = m.dvdx, dvdy = m.dvdy;
+    if (perspective) {
+        dudx = (dudx - f.u * m.dwdx) * m.invW;
+        dudy = (dudy - f.u * m.dwdy) * m.invW;
+        dvdx = (dvdx - f.v * m.dwdx) * m.invW;
+        dvdy = (dvdy - f.v * m.dwdy) * m.invW;
+    }
+    f.ru = 0.5 * std::max(std::fabs(dudx), std::fabs(dudy));
+    f.rv = 0.5 * std::max(std::fabs(dvdx), std::fabs(dvdy));
+    return f;
+}
+
+// Under perspective a pixel whose W range reaches the eye plane has no sensible footprint.
+inline bool InFront(const SY_SpanMapping& m, bool perspective) {
+    return !perspective || m.w + m.low > 0;
+}
+
+// The pixel library's filter at (u, v) with the half-sizes (ru, rv): interpolation while the
+// footprint stays within half a texel, the box average beyond.
+template <class P>
+[[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, double u, double v, double ru,
+                                          double rv, P* out) {
+    // A radius rounds to at most 32768 (half a texel) in fixed point below this many texels.
+    constexpr double kSubpixelBelow = 32768.5 / 65536.0;
+    int32_t x = ToFixed(u), y = ToFixed(v);
+    PF_SampPB& pb = texture.sampling;
+    if (ru < kSubpixelBelow && rv < kSubpixelBelow) {
+        if (texture.quality == 2)
+            PF_SubpixelBicubic(x, y, pb, out);
+        else
+            PF_SubpixelBilinear(x, y, pb, out);
+    } else {
+        pb.xRadius = RadiusToFixed(ru);
+        pb.yRadius = RadiusToFixed(rv);
+        PF_AreaSample(x, y, pb, out);
+    }
+}
+
+// The integer texel under (u, v), or false outside the texture.
+inline bool TexelAt(const PF_World& world, double u, double v, int32_t* column, int32_t* row) {
+    double fu = std::floor(u), fv = std::floor(v);
+    if (!(fu >= 0 && fv >= 0 && fu < world.width && fv < world.height)) return false;
+    *column = static_cast<int32_t>(fu);
+    *row = static_cast<int32_t>(fv);
+    return true;
+}
+
+// Straight colour weighted by alpha, summed over subsamples.
+struct Accumulator {
+    double a = 0, r = 0, g = 0, b = 0;
+
+    template <class P>
+    void Add(const P& p) {
+        double alpha = p.alpha;
+        a += alpha;
+        r += p.red * alpha;
+        g += p.green * alpha;
+        b += p.blue * alpha;
+    }
+
+    // Alpha falls with the share of subsamples (absent ones included) that add nothing; the
+    // colour is the alpha-weighted mean of those that do.
+    template <class P>
+    void Resolve(int32_t count, P* out) const {
+        using C = typename PF_PixelTraits<P>::Channel;
+        if (a == 0) {
+            *out = P{};
+            return;
+        }
+        double round = PF_PixelTraits<P>::kIsFloat ? 0.0 : 0.5;
+        out->alpha = static_cast<C>(a / count + round);
+        out->red = static_cast<C>(r / a + round);
+        out->green = static_cast<C>(g / a + round);
+        out->blue = static_cast<C>(b / a + round);
+    }
+};
+
+}  // namespace sy_sampling
+
+// Nearest texel, one sample. U·invW is used under both cameras: invW is 1 without perspective.
+template <class P>
+inline void SY_SampleNearest(SY_SpanSampleState<P>& state, P* out) {
+    const SY_SpanMapping& m = state.mapping;
+    int32_t column, row;
+    if (!(m.invW > 0) ||
+        !sy_sampling::TexelAt(*state.texture.world, m.u * m.invW, m.v * m.invW, &column, &row)) {
+        *out = P{};
+        return;
+    }
+    if (column != state.lastColumn || row != state.lastRow) {
+        state.lastColumn = column;
+        state.lastRow = row;
+        state.lastTexel = *state.texture.world->template PixelAt<P>(column, row);
+    }
+    *out = state.lastTexel;
+}
+
+// Filtered texel, one sample, at the texture's quality (1 bilinear, 2 bicubic).
+template <class P>
+inline void SY_SampleFiltered(SY_SpanSampleState<P>& state, P* out) {
+    const SY_SpanMapping& m = state.mapping;
+    if (!sy_sampling::InFront(m, state.texture.perspective)) {
+        *out = P{};
+        return;
+    }
+    sy_sampling::Footprint f = sy_sampling::FootprintOf(m, state.texture.perspective);
+    sy_sampling::Filter(state.texture, f.u, f.v, f.ru, f.rv, out);
+}
+
+// Nearest texel averaged over the present subsamples.
+template <class P>
+inline void SY_SampleNearest(SY_SpanSubsampleState<P>& state, P* out) {
+    const PF_World& world = *state.texture.world;
+    sy_sampling::Accumulator sum;
+    int32_t lastColumn = -1, lastRow = -1;
+    P texel{};
+    for (int32_t i = state.first; i <= state.last; ++i) {
+        const SY_SpanMapping& m = state.mappings[i];
+        if (!(m.invW > 0)) continue;
+        int32_t column, row;
+        if (!sy_sampling::TexelAt(world, m.u * m.invW, m.v * m.invW, &column, &row)) continue;
+        if (column != lastColumn || row != lastRow) {
+            lastColumn = column;
+            lastRow = row;
+            texel = *world.template PixelAt<P>(column, row);
+        }
+        sum.Add(texel);
+    }
+    sum.Resolve(state.count, out);
+}
+
+// Filtered texel averaged over the present subsamples. The footprint of the first present
+// subsample serves them all; the filter runs again only when the sample point has moved by
+// more than a quarter of the footprint since it last ran.
+template <class P>
+inline void SY_SampleFiltered(SY_SpanSubsampleState<P>& state, P* out) {
+    bool perspective = state.texture.perspective;
+    int32_t i = state.first;
+    while (i <= state.last && !(state.mappings[i].invW > 0))
+        ++i;
+    if (i > state.last) {
+        *out = P{};
+        return;
+    }
+    sy_sampling::Footprint f = sy_sampling::FootprintOf(state.mappings[i], perspective);
+    f.ru = std::min(f.ru, sy_sampling::kMaxRadius);
+    f.rv = std::min(f.rv, sy_sampling::kMaxRadius);
+    double lastU = 0, lastV = 0;
+    bool sampled = false;
+    P texel{};
+    sy_sampling::Accumulator sum;
+    for (; i <= state.last; ++i) {
+        const SY_SpanMapping& m = state.mappings[i];
+        if (!(m.invW > 0) || !sy_sampling::InFront(m, perspective)) continue;
+        double u = m.u * m.invW, v = m.v * m.invW;
+        if (!sampled || std::fabs(u - lastU) > 0.25 * f.ru || std::fabs(v - lastV) > 0.25 * f.rv) {
+            sy_sampling::Filter(state.texture, u, v, f.ru, f.rv, &texel);
+            lastU = u;
+            lastV = v;
+            sampled = true;
+        }
+        sum.Add(texel);
+    }
+    sum.Resolve(state.count, out);
+}

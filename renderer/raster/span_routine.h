@@ -1,0 +1,219 @@
+// The span loop, written once for every pixel type, both sample-state forms and every kind of
+// delivery: it steps the state across the row, samples, colours, lights and hands each pixel
+// with its coverage and depth to the delivery.
+#pragma once
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+
+#include "pf_pixel.h"
+#include "pf_xfer.h"
+#include "renderer/raster/samplers.h"
+#include "renderer/raster/shader.h"
+#include "renderer/raster/span_state.h"
+
+// What a fragment buffer needs of a pixel's depth: the key (the smallest value the layer's
+// plane takes over the pixel square and the shutter, larger is nearer), its steps per pixel in
+// x and y, and its travel over the shutter. Deliveries into images ignore it.
+struct SY_FragmentDepth {
+    float depth;
+    float dzdx;
+    float dzdy;
+    float dzdt;
+};
+
+template <class P>
+using SY_Coverage = PF_XferOpacity<P>;
+
+namespace sy_span {
+
+template <class P>
+const SY_SpanMapping& FirstMapping(const SY_SpanSampleState<P>& s) {
+    return s.mapping;
+}
+template <class P>
+const SY_SpanMapping& FirstMapping(const SY_SpanSubsampleState<P>& s) {
+    return s.mappings[s.first];
+}
+template <class P>
+double ShutterTravel(const SY_SpanSampleState<P>&) {
+    return 0.0;
+}
+template <class P>
+double ShutterTravel(const SY_SpanSubsampleState<P>& s) {
+    return s.mappings[s.last].w - s.mappings[s.first].w;
+}
+
+// The layer's opacity in the channel range.
+template <class P>
+SY_Coverage<P> LayerCoverage(double opacity) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat)
+        return static_cast<float>(opacity);
+    else if constexpr (Traits::kBitDepth == 16)
+        return static_cast<uint16_t>(std::lround(32768.0 * opacity) & 0xFFFF);
+    else
+        return static_cast<uint8_t>(std::lround(255.0 * opacity));
+}
+
+// The layer's coverage scaled by the matte's alpha.
+template <class P>
+SY_Coverage<P> MatteCoverage(typename PF_PixelTraits<P>::Channel matte, SY_Coverage<P> layer) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat)
+        return matte * layer;
+    else if constexpr (Traits::kBitDepth == 16)
+        return static_cast<uint16_t>(PF_Mul16(matte, layer));
+    else
+        return static_cast<uint8_t>((uint32_t{matte} * layer + 127) / 255);
+}
+
+// texel × diffuse + specular, with specular in units of the channel maximum; integer channels
+// round and clamp, float channels keep their range.
+template <class P>
+void ApplyLighting(const SY_Lighting& light, P* texel) {
+    using Traits = PF_PixelTraits<P>;
+    using C = typename Traits::Channel;
+    C* channels[3] = {&texel->red, &texel->green, &texel->blue};
+    for (int k = 0; k < 3; ++k) {
+        float c = static_cast<float>(*channels[k]) * light.diffuse[k];
+        if constexpr (Traits::kIsFloat) {
+            *channels[k] = c + light.specular[k];
+        } else {
+            c += 0.5f + light.specular[k] * Traits::kMax;
+            *channels[k] = static_cast<C>(std::clamp(c, 0.0f, Traits::kMax));
+        }
+    }
+}
+
+// One pixel on its way from the sampler to the delivery.
+template <class P>
+struct Pixel {
+    P texel;
+    SY_Coverage<P> coverage;
+    bool skipped;            // the matte hides it
+    double point[3];         // surface point, when lighting needs it
+    SY_FragmentDepth depth;  // set only for deliveries that use it
+};
+
+// The per-span constants of the loop.
+template <class P>
+struct SpanSetup {
+    SY_Coverage<P> coverage0;
+    float offset0;  // moves the depth key from the pixel centre to its top-left corner
+    bool filtered;
+    bool colourOnly;  // shadows only: the texel's colour is replaced by the channel maximum
+    bool shaded;
+    bool needsPoint;
+    bool pairLighting;
+};
+
+template <bool kDepth, class P, class State>
+[[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
+                                         const SY_SpanRayState& ray, const P* matte,
+                                         Pixel<P>* out) {
+    using Traits = PF_PixelTraits<P>;
+    using C = typename Traits::Channel;
+    const SY_SpanMapping& first = FirstMapping(state);
+    if (setup.shaded) {
+        for (int k = 0; k < 3; ++k)
+            out->point[k] = ray.d[k] * first.invW;
+    }
+    out->skipped = matte && matte->alpha == 0;
+    if (out->skipped) {
+        out->texel = P{};
+        return;
+    }
+    if (setup.filtered)
+        SY_SampleFiltered(state, &out->texel);
+    else
+        SY_SampleNearest(state, &out->texel);
+    if (setup.colourOnly) {
+        constexpr C kMax = static_cast<C>(Traits::kMax);
+        out->texel.red = out->texel.green = out->texel.blue = kMax;
+    }
+    out->coverage = matte ? MatteCoverage<P>(matte->alpha, setup.coverage0) : setup.coverage0;
+    if constexpr (kDepth) {
+        double travel = ShutterTravel(state);
+        out->depth.depth =
+            static_cast<float>(first.w + first.low + std::min(0.0, travel) + setup.offset0);
+        out->depth.dzdx = first.dwdx;
+        out->depth.dzdy = first.dwdy;
+        out->depth.dzdt = static_cast<float>(travel);
+    }
+}
+
+template <class State>
+[[gnu::always_inline]] inline void Advance(bool needsPoint, State& state, SY_SpanRayState& ray) {
+    state.Step();
+    if (needsPoint) {
+        for (int k = 0; k < 3; ++k)
+            ray.d[k] += ray.sx[k];
+    }
+}
+
+}  // namespace sy_span
+
+// Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
+// matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs so
+// that lighting can work on two at once; a pair the matte hides wholly is only stepped over.
+// The delivery receives (x, pixel, coverage, depth, thread) for every pixel the matte shows;
+// the depth is worked out only for deliveries whose kUsesDepth is true.
+template <class P, class State, class Delivery>
+void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
+                 SY_SpanRayState& ray, const P* matte, int32_t x, int32_t count, Delivery& delivery,
+                 int32_t thread) {
+    using namespace sy_span;
+    const SY_SpanMapping& first = FirstMapping(state);
+    SpanSetup<P> setup;
+    setup.coverage0 = LayerCoverage<P>(shader.opacity);
+    setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
+    setup.filtered = state.texture.quality != 0;
+    setup.colourOnly = shader.acceptsShadows == 2;
+    setup.shaded = shader.shaded != 0;
+    setup.needsPoint = shader.NeedsSurfacePoint();
+    setup.pairLighting = pairLighting;
+
+    Pixel<P> pixels[2];
+    int32_t i = 0;
+    for (; i + 1 < count; i += 2) {
+        if (matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0) {
+            Advance(setup.needsPoint, state, ray);
+            Advance(setup.needsPoint, state, ray);
+            continue;
+        }
+        for (int k = 0; k < 2; ++k) {
+            Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
+                                        &pixels[k]);
+            Advance(setup.needsPoint, state, ray);
+        }
+        if (setup.shaded) {
+            SY_Lighting light[2];
+            if (setup.pairLighting) {
+                shader.LightTwoPixels(pixels[0].point, pixels[1].point, ray.normal, &light[0],
+                                      &light[1]);
+            } else {
+                shader.LightOnePixel(pixels[0].point, ray.normal, &light[0]);
+                shader.LightOnePixel(pixels[1].point, ray.normal, &light[1]);
+            }
+            ApplyLighting(light[0], &pixels[0].texel);
+            ApplyLighting(light[1], &pixels[1].texel);
+        }
+        for (int k = 0; k < 2; ++k) {
+            if (!pixels[k].skipped)
+                delivery.Deliver(x + i + k, pixels[k].texel, pixels[k].coverage, pixels[k].depth,
+                                 thread);
+        }
+    }
+    if (i < count) {
+        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
+        if (pixels[0].skipped) return;
+        if (setup.shaded) {
+            SY_Lighting light;
+            shader.LightOnePixel(pixels[0].point, ray.normal, &light);
+            ApplyLighting(light, &pixels[0].texel);
+        }
+        delivery.Deliver(x + i, pixels[0].texel, pixels[0].coverage, pixels[0].depth, thread);
+    }
+}

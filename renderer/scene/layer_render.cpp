@@ -1,0 +1,111 @@
+// The render operation of a layer renderable: screen geometry, track matte, span table, and
+// one row work item per covered row.
+#include <cmath>
+
+#include "renderer/raster/shader.h"
+#include "renderer/raster/span_render.h"
+#include "renderer/scene/render_context.h"
+#include "renderer/scene/render_target.h"
+#include "renderer/scene/renderable.h"
+#include "renderer/scene/row_work.h"
+#include "renderer/scene/screen_geometry.h"
+#include "renderer/scene/span_table.h"
+
+namespace {
+
+// Holds a fetched track matte and hands it back on every way out.
+class MatteHold {
+public:
+    MatteHold() = default;
+    ~MatteHold() {
+        if (fetcher_) fetcher_->Release();
+    }
+    MatteHold(const MatteHold&) = delete;
+    MatteHold& operator=(const MatteHold&) = delete;
+
+    PF_World* Fetch(SY_TImageFetcher* fetcher) {
+        PF_World* world = fetcher->Fetch();
+        fetcher_ = fetcher;
+        return world;
+    }
+
+private:
+    SY_TImageFetcher* fetcher_ = nullptr;
+};
+
+struct RowClosure {
+    const SY_ScreenGeometry* geometry;
+    const SY_Shader* shader;
+    const PF_World* matte;
+    const SY_SpanTable* table;
+    const SY_RenderTarget* target;
+};
+
+void DrawRow(const void* closure, int32_t row, int32_t item, int32_t thread) {
+    const auto& c = *static_cast<const RowClosure*>(closure);
+    const SY_Span& span = c.table->rows[item];
+    SY_RenderLayerSpan_SwitchDepth(*c.geometry, c.shader, c.matte, span.start,
+                                   span.end - span.start, row, nullptr, *c.target, thread);
+}
+
+void CountDone(SY_RenderContext* context) {
+    ++context->renderablesDone;
+    context->progress->ReportRenderables(context->renderablesDone, context->renderableCount);
+}
+
+void DrawGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
+                     const RowClosure& closure, SY_SpanTable* table, int32_t fieldMode) {
+    SY_AccountedVector<M_Point2> polygon;
+    SY_CoveredPolygon(renderable, &polygon);
+    if (polygon.empty()) return;
+    SY_BuildSpanTable(polygon.data(), static_cast<int32_t>(polygon.size()), table);
+    if (table->rows.empty()) return;
+    SY_RowWork work;
+    work.iterate = context->iterate;
+    work.progress = context->progress;
+    work.firstRow = table->firstRow;
+    work.itemCount = static_cast<int32_t>(table->rows.size());
+    work.fieldMode = fieldMode;
+    work.draw = &DrawRow;
+    work.closure = &closure;
+    SY_RunRowWork(work);
+}
+
+void DrawUnboundedLayerThroughGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
+                                          const RowClosure& closure, SY_SpanTable* table,
+                                          int32_t fieldMode) {
+    DrawGeneralPath(context, renderable, closure, table, fieldMode);
+}
+
+}  // namespace
+
+void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, SY_Shader* shader,
+                        int32_t fieldMode, const SY_RenderTarget& target) {
+    bool simplePath = unbounded && (!shader || shader->IsFrameShader());
+    SY_GeometryFlags flags;
+    flags.perspective = camera.perspective;
+    flags.screenSizedTexture = collapsed && !simplePath;
+    flags.needsSurfacePoint = shader && shader->NeedsSurfacePoint();
+    flags.blurred = shader && shader->ShadowBlurRadius() != 0;
+    flags.wholeLayer = simplePath;
+    flags.quality = material.bestQuality ? material.engineFlag : 0;
+
+    SY_ScreenGeometry geometry;
+    geometry.Build(*context, *this, camera.worldToScreen, camera.count, flags);
+    if (!geometry.Empty()) {
+        MatteHold matteHold;
+        PF_World* matte = nullptr;
+        bool matteApplies = target.mode != kSY_TargetDepthOfField &&
+                            target.mode != kSY_TargetShadowArray && trackMatte;
+        if (matteApplies) matte = matteHold.Fetch(trackMatte);
+        if (!matteApplies || matte || !trackMatte->OutsideIsClear()) {
+            SY_SpanTable table;
+            RowClosure closure{&geometry, shader, matte, &table, &target};
+            if (simplePath)
+                DrawUnboundedLayerThroughGeneralPath(context, *this, closure, &table, fieldMode);
+            else
+                DrawGeneralPath(context, *this, closure, &table, fieldMode);
+        }
+    }
+    CountDone(context);
+}

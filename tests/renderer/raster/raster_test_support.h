@@ -1,0 +1,106 @@
+// Frames of textured layers for the span renderer's tests: a texture pattern whose texels a
+// reader can recompute, layers placed in front of the default camera, and a frame runner.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+#include "../scene/frame_test_support.h"
+#include "../scene/memory_texture_fetcher.h"
+#include "../scene/scene_fixtures.h"
+#include "pf_world.h"
+#include "pf_xfer.h"
+#include "renderer/scene/frame_driver.h"
+
+namespace raster_test {
+
+// A channel value given as an 8-bit code, in the range of P.
+template <class P>
+typename PF_PixelTraits<P>::Channel Code(uint32_t code) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat)
+        return static_cast<float>(code) / 255.0f;
+    else if constexpr (Traits::kBitDepth == 16)
+        return PF_8To16(code);
+    else
+        return static_cast<uint8_t>(code);
+}
+
+template <class P>
+P Opaque(uint32_t r, uint32_t g, uint32_t b) {
+    return {Code<P>(255), Code<P>(r), Code<P>(g), Code<P>(b)};
+}
+
+// Opaque texel (i, j) of the test pattern: neighbours differ in every channel.
+template <class P>
+P PatternTexel(int32_t i, int32_t j) {
+    return Opaque<P>((i * 37 + j * 11) % 251, (i * 5 + j * 29) % 241, (i * 13 + j * 7) % 239);
+}
+
+template <class P>
+std::unique_ptr<PF_WorldX<P>> PatternTexture(int32_t width, int32_t height) {
+    auto world = std::make_unique<PF_WorldX<P>>(width, height);
+    for (int32_t j = 0; j < height; ++j) {
+        for (int32_t i = 0; i < width; ++i)
+            world->At(i, j) = PatternTexel<P>(i, j);
+    }
+    return world;
+}
+
+template <class P>
+std::unique_ptr<PF_WorldX<P>> FilledWorld(int32_t width, int32_t height, const P& pixel) {
+    auto world = std::make_unique<PF_WorldX<P>>(width, height);
+    for (int32_t j = 0; j < height; ++j) {
+        for (int32_t i = 0; i < width; ++i)
+            world->At(i, j) = pixel;
+    }
+    return world;
+}
+
+template <class P>
+bool Equal(const P& a, const P& b) {
+    return a.alpha == b.alpha && a.red == b.red && a.green == b.green && a.blue == b.blue;
+}
+
+template <class P>
+bool IsClear(const P& p) {
+    return Equal(p, P{});
+}
+
+// Distance camera–layer plane of the default camera: the plane z = 0 maps 1:1.
+inline constexpr double kDistance = 400;
+
+// A frame of layers in front of the default camera, all drawn into one destination.
+struct Frame {
+    Frame(int32_t w, int32_t h, int32_t layerCount) : width(w), height(h) {
+        ostrel_test::SetDefaultCamera(&scene, w, h, kDistance);
+        scene.layers.Allocate(layerCount);
+        for (int32_t i = 0; i < layerCount; ++i) {
+            scene.layers[i].renderIndex = i;
+            scene.layers[i].depthIndex = i;
+        }
+    }
+
+    // Layer i shows texture (width × height texels) with its top-left corner at placement's
+    // image of layer point (0, 0).
+    SY_LayerDesc& Layer(int32_t i, PF_World* texture, const M_Matrix4& placement) {
+        SY_LayerDesc& layer = scene.layers[i];
+        scene_test::SetPlacements(&layer, {placement});
+        scene_test::SetRect(&layer, 0, 0, texture->width, texture->height);
+        fetcher.Add(i, texture);
+        return layer;
+    }
+
+    void Render(PF_World* destination, const QNGP_IterateSuite1* iterate = nullptr) {
+        SY_RenderFrame(scene, &fetcher, &progress, iterate, iterate != nullptr, destination,
+                       nullptr);
+    }
+
+    int32_t width, height;
+    SY_SceneDesc scene;
+    ostrel_test::MemoryTextureFetcher fetcher;
+    ostrel_test::RecordingProgress progress;
+};
+
+}  // namespace raster_test
