@@ -1,5 +1,6 @@
 #include "renderer/raster/span_render.h"
 
+#include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/span_routine.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_cpu.h"
@@ -48,6 +49,25 @@ struct StoreDelivery {
     }
 };
 
+// Kind 2: a fragment in the pixel's list of a draft buffer; the resolve blends the lists later.
+template <class P>
+struct DraftFragmentDelivery {
+    static constexpr bool kUsesDepth = true;
+
+    DraftFragmentDelivery(SY_MBufferDraftX<P>* target, int32_t x, int32_t y, uint8_t layerMode)
+        : buffer(target), heads(target->HeadAt(x, y)), firstX(x), mode(layerMode) {}
+
+    void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth& d,
+                 int32_t thread) {
+        buffer->AddFragment(&pixel, coverage, mode, d.depth, heads + (x - firstX), thread);
+    }
+
+    SY_MBufferDraftX<P>* buffer;
+    SY_FragmentDraftX<P>** heads;  // the heads of the span's row, from its first pixel on
+    int32_t firstX;
+    uint8_t mode;
+};
+
 SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
     SY_SpanRayState ray;
     const auto& e = geometry.eyeRay.mat;
@@ -75,6 +95,14 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
         case kSY_TargetDestination: {
             auto* world = static_cast<PF_World*>(target.object);
             CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
+            SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
+            break;
+        }
+        case kSY_TargetFragmentBuffer: {
+            auto* buffer = static_cast<SY_MBuffer*>(target.object);
+            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) break;
+            DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
+                                              shader.mode);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
@@ -123,6 +151,8 @@ void RenderAtDepth(const SY_ScreenGeometry& geometry, const SY_LayerShader& shad
 int16_t TargetBitDepth(const SY_RenderTarget& target) {
     if (target.mode == kSY_TargetDestination)
         return static_cast<const PF_World*>(target.object)->GetBitDepth();
+    if (target.mode == kSY_TargetFragmentBuffer)
+        return static_cast<const SY_MBuffer*>(target.object)->GetBitDepth();
     return static_cast<const SY_SpanImageRecord*>(target.object)->image->GetBitDepth();
 }
 
@@ -133,7 +163,10 @@ void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_
                                     const PF_LinearBlendingTables* tables,
                                     const SY_RenderTarget& target, int32_t thread) {
     if (count <= 0) return;
-    if (target.mode != kSY_TargetDestination && target.mode != kSY_TargetDepthOfField) return;
+    if (target.mode != kSY_TargetDestination && target.mode != kSY_TargetFragmentBuffer &&
+        target.mode != kSY_TargetDepthOfField) {
+        return;
+    }
     int16_t depth = TargetBitDepth(target);
     if (geometry.texture->GetBitDepth() != depth) depth = 0;
     const auto& layerShader = static_cast<const SY_LayerShader&>(*shader);

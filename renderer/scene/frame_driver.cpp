@@ -1,8 +1,12 @@
 #include "renderer/scene/frame_driver.h"
 
+#include <algorithm>
+#include <climits>
+#include <cmath>
 #include <memory>
 
 #include "pf_draw.h"
+#include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/depth_grouping.h"
 #include "renderer/scene/motion_thinning.h"
@@ -69,12 +73,48 @@ void DrawRenderable(SY_RenderContext* context, SY_TRLayer* renderable,
     if (renderable->material.wireframe) DrawOutline(*context->destination, *renderable);
 }
 
-// A group of one is drawn straight into the destination. Larger groups need the fragment
-// buffer; until it takes them their members are drawn one by one in group order.
-void DrawGroup(SY_RenderContext* context, const SY_RenderableGroup& group) {
-    SY_RenderTarget target{kSY_TargetDestination, context->destination};
+// The pixels the members may touch: the union of their pixel rectangles, within the output.
+M_LRect GroupRect(const SY_RenderableGroup& group, const PF_World& destination) {
+    M_LRect rect{INT32_MAX, INT32_MAX, INT32_MIN, INT32_MIN};
+    for (const SY_TRLayer* renderable : group) {
+        if (renderable->HasEmptyBounds()) continue;
+        rect.left = std::min(rect.left, static_cast<int32_t>(std::floor(renderable->bounds[0])));
+        rect.top = std::min(rect.top, static_cast<int32_t>(std::floor(renderable->bounds[1])));
+        rect.right = std::max(rect.right, static_cast<int32_t>(std::ceil(renderable->bounds[2])));
+        rect.bottom = std::max(rect.bottom, static_cast<int32_t>(std::ceil(renderable->bounds[3])));
+    }
+    rect.left = std::clamp(rect.left, 0, destination.width);
+    rect.top = std::clamp(rect.top, 0, destination.height);
+    rect.right = std::clamp(rect.right, rect.left, destination.width);
+    rect.bottom = std::clamp(rect.bottom, rect.top, destination.height);
+    return rect;
+}
+
+// Layers that cross or occlude each other in a cycle go through a fragment buffer, whose
+// resolve blends each pixel's fragments farthest first.
+void DrawThroughFragmentBuffer(SY_RenderContext* context, const SY_RenderableGroup& group) {
+    bool anyBest = false, anyMotion = false;
+    for (const SY_TRLayer* renderable : group) {
+        anyBest = anyBest || renderable->material.bestQuality;
+        anyMotion = anyMotion || renderable->multiSample;
+    }
+    std::unique_ptr<SY_MBuffer> buffer =
+        SY_MBuffer::New(GroupRect(group, *context->destination),
+                        context->destination->GetBitDepth(), anyBest, anyMotion);
+    SY_RenderTarget target{kSY_TargetFragmentBuffer, buffer.get()};
     for (SY_TRLayer* renderable : group)
         DrawRenderable(context, renderable, target);
+    buffer->Resolve(context->progress,
+                    reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
+                    *context->destination);
+}
+
+void DrawGroup(SY_RenderContext* context, const SY_RenderableGroup& group) {
+    if (group.size() > 1) {
+        DrawThroughFragmentBuffer(context, group);
+        return;
+    }
+    DrawRenderable(context, group.front(), {kSY_TargetDestination, context->destination});
 }
 
 }  // namespace

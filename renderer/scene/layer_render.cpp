@@ -39,13 +39,14 @@ struct RowClosure {
     const PF_World* matte;
     const SY_SpanTable* table;
     const SY_RenderTarget* target;
+    const PF_LinearBlendingTables* blending;  // the frame's colour settings: linear light, or null
 };
 
 void DrawRow(const void* closure, int32_t row, int32_t item, int32_t thread) {
     const auto& c = *static_cast<const RowClosure*>(closure);
     const SY_Span& span = c.table->rows[item];
     SY_RenderLayerSpan_SwitchDepth(*c.geometry, c.shader, c.matte, span.start,
-                                   span.end - span.start, row, nullptr, *c.target, thread);
+                                   span.end - span.start, row, c.blending, *c.target, thread);
 }
 
 void CountDone(SY_RenderContext* context) {
@@ -100,7 +101,13 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
         if (matteApplies) matte = matteHold.Fetch(trackMatte);
         if (!matteApplies || matte || !trackMatte->OutsideIsClear()) {
             SY_SpanTable table;
-            RowClosure closure{&geometry, shader, matte, &table, &target};
+            RowClosure closure{
+                &geometry,
+                shader,
+                matte,
+                &table,
+                &target,
+                reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings)};
             if (simplePath)
                 DrawUnboundedLayerThroughGeneralPath(context, *this, closure, &table, fieldMode);
             else

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "raster_test_support.h"
+#include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
 #include "renderer/scene/screen_geometry.h"
@@ -87,9 +88,31 @@ TYPED_TEST(SpanDispatch, StoreTargetWritesAtTheImageOrigin) {
 TYPED_TEST(SpanDispatch, TargetsWithoutASpanRoutineDrawNothing) {
     using P = TypeParam;
     PF_WorldX<P> destination(16, 8);
-    for (int32_t mode : {0, 2, 4, 5})
+    for (int32_t mode : {0, 4, 5})
         this->Draw(&destination, 0, 16, 1, mode);
     ExpectOnly(destination, 0, 0, 1);
+}
+
+// Fragments of a span resolve to what compositing the span straight gives.
+TYPED_TEST(SpanDispatch, FragmentsResolveToTheDirectComposite) {
+    using P = TypeParam;
+    int64_t start = U_AccountedBytes();
+    {
+        PF_WorldX<P> direct(16, 8), resolved(16, 8);
+        this->Draw(&direct, 2, 9, 3);
+        std::unique_ptr<SY_MBuffer> buffer =
+            SY_MBuffer::New({0, 0, 16, 8}, PF_PixelTraits<P>::kBitDepth, false, false);
+        SY_RenderTarget target{kSY_TargetFragmentBuffer, buffer.get()};
+        SY_RenderLayerSpan_SwitchDepth(this->geometry_, &this->shader_, nullptr, 2, 9, 3, nullptr,
+                                       target, 0);
+        ostrel_test::RecordingProgress progress;
+        buffer->Resolve(&progress, nullptr, resolved);
+        for (int32_t y = 0; y < 8; ++y) {
+            for (int32_t x = 0; x < 16; ++x)
+                EXPECT_TRUE(Equal(direct.At(x, y), resolved.At(x, y))) << x << "," << y;
+        }
+    }
+    EXPECT_EQ(U_AccountedBytes(), start);
 }
 
 // Ambient light of half strength halves every colour channel: c·½ + ½, truncated for integer
