@@ -132,6 +132,28 @@ struct Scene {
         }
     }
 
+    // One ambient, one point and one spot light over the cards, all reaching every card.
+    void Light() {
+        scene.lights.Allocate(3);
+        const int32_t types[] = {kSY_LightAmbient, kSY_LightPoint, kSY_LightSpot};
+        for (int32_t i = 0; i < 3; ++i) {
+            SY_LightDesc& light = scene.lights[i];
+            light.type = types[i];
+            light.id = i;
+            light.color[1] = light.color[2] = light.color[3] = i == 0 ? 0.2 : 0.8;
+            if (light.type == kSY_LightAmbient) continue;
+            light.placements.Allocate(1);
+            light.placements[0] = Identity();
+            M_TranslateMatrix4(kWidth * (0.25 + 0.5 * (i - 1)), kHeight * 0.3, -800,
+                               &light.placements[0]);
+        }
+        scene.lights[2].coneHalfAngle = 40 * 0.008726646259971648;
+        scene.lights[2].coneFeather = 0.5;
+        scene.lightsEnabled = true;
+        for (SY_LayerDesc& layer : scene.layers)
+            layer.lightIds = {0, 1, 2};
+    }
+
     void Render(PF_World* destination, bool threaded) {
         SY_RenderFrame(scene, &fetcher, &progress, threaded ? AllThreads::Suite() : nullptr,
                        threaded, destination, nullptr);
@@ -173,6 +195,7 @@ template <class P>
 void BM_Cards(benchmark::State& state) {
     bool best = state.range(0) != 0, threaded = state.range(1) != 0;
     Scene<P> scene(best);
+    if (state.range(2) != 0) scene.Light();
     PF_WorldX<P> frame(kWidth, kHeight);
     CoveredPixels();
     for (auto _ : state) {
@@ -291,13 +314,14 @@ void BM_OpenCV(benchmark::State& state) {
 
 // One thread is timed by processor time, which other work on the machine disturbs least; all
 // threads by the wall clock, the only time that shows what they share.
+// The lit frame (lit = 1) shows what lighting adds to the same best-quality frame.
 void OneThread(benchmark::internal::Benchmark* b) {
-    b->ArgNames({"best", "threads"})->Args({1, 0})->Args({0, 0});
+    b->ArgNames({"best", "threads", "lit"})->Args({1, 0, 0})->Args({0, 0, 0})->Args({1, 0, 1});
     b->Unit(benchmark::kMillisecond)->Iterations(3);
 }
 
 void EveryThread(benchmark::internal::Benchmark* b) {
-    b->ArgNames({"best", "threads"})->Args({1, 1})->Args({0, 1});
+    b->ArgNames({"best", "threads", "lit"})->Args({1, 1, 0})->Args({0, 1, 0})->Args({1, 1, 1});
     b->Unit(benchmark::kMillisecond)->Iterations(3)->UseRealTime();
 }
 
