@@ -31,31 +31,31 @@ std::unique_ptr<OIIO::ImageInput> Open(const std::filesystem::path& file) {
 
 ImageInfo ProbeImage(const std::filesystem::path& file) {
     auto input = Open(file);
-    const OIIO::ImageSpec& spec = input->spec();
-    return {spec.width, spec.height};
+    const OIIO::ImageSpec& layout = input->spec();
+    return {layout.width, layout.height};
 }
 
 DecodedImage DecodeImage(const std::filesystem::path& file) {
     auto input = Open(file);
-    const OIIO::ImageSpec spec = input->spec();
-    int channels = spec.nchannels;
+    const OIIO::ImageSpec layout = input->spec();
+    int channels = layout.nchannels;
     if (channels < 1) Fail(file, "the image has no channels");
-    size_t count = static_cast<size_t>(spec.width) * static_cast<size_t>(spec.height);
+    size_t count = static_cast<size_t>(layout.width) * static_cast<size_t>(layout.height);
     std::vector<float> stored(count * static_cast<size_t>(channels));
     if (!input->read_image(0, 0, 0, channels, OIIO::TypeDesc::FLOAT, stored.data())) {
         Fail(file, input->geterror());
     }
 
     // Grey, grey and alpha, colour, or colour and alpha; further channels are ignored.
-    int alphaChannel = spec.alpha_channel >= 0 ? spec.alpha_channel : (channels == 2 ? 1 : -1);
+    int alphaChannel = layout.alpha_channel >= 0 ? layout.alpha_channel : (channels == 2 ? 1 : -1);
     if (channels >= 4 && alphaChannel < 0) alphaChannel = 3;
     int colorChannels = channels >= 3 ? 3 : 1;
-    bool associated = alphaChannel >= 0 && spec.get_int_attribute("oiio:UnassociatedAlpha", 0) == 0;
+    bool associated = alphaChannel >= 0 && layout.get_int_attribute("oiio:UnassociatedAlpha", 0) == 0;
 
     DecodedImage image;
-    image.width = spec.width;
-    image.height = spec.height;
-    image.eightBit = spec.format == OIIO::TypeDesc::UINT8;
+    image.width = layout.width;
+    image.height = layout.height;
+    image.eightBit = layout.format == OIIO::TypeDesc::UINT8;
     image.pixels.resize(count * 4);
     for (size_t i = 0; i < count; ++i) {
         const float* in = &stored[i * static_cast<size_t>(channels)];
