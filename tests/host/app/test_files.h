@@ -46,12 +46,12 @@ public:
         auto type = std::is_same_v<T, uint8_t>    ? OIIO::TypeDesc::UINT8
                     : std::is_same_v<T, uint16_t> ? OIIO::TypeDesc::UINT16
                                                   : OIIO::TypeDesc::FLOAT;
-        OIIO::ImageSpec spec(width, height, channels, type);
-        if (channels == 4) spec.alpha_channel = 3;
+        OIIO::ImageSpec layout(width, height, channels, type);
+        if (channels == 4) layout.alpha_channel = 3;
         // Without this the writer would take the pixels for premultiplied and divide them.
-        spec.attribute("oiio:UnassociatedAlpha", 1);
+        layout.attribute("oiio:UnassociatedAlpha", 1);
         auto out = OIIO::ImageOutput::create(file.string());
-        if (!out || !out->open(file.string(), spec) || !out->write_image(type, pixels.data()) ||
+        if (!out || !out->open(file.string(), layout) || !out->write_image(type, pixels.data()) ||
             !out->close()) {
             throw std::runtime_error("cannot write test image " + file.string());
         }
