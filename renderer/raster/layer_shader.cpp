@@ -29,7 +29,7 @@ std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
     shader->lightTransmission = material.lightTransmission;
     shader->metal = material.metal;
     std::copy(context->cameraPosition, context->cameraPosition + 3, shader->eye);
-    shader->depthOffset = static_cast<float>(-material.depthIndex * kSY_DepthStepPerIndex);
+    shader->depthOffset = SY_DepthOffset(material);
     shader->acceptsShadows = material.acceptsShadows;
     shader->acceptsLights = material.acceptsLights;
     shader->softShadowLookup = material.acceptsShadows != 0 && material.bestQuality;

@@ -1,6 +1,7 @@
 #include "renderer/raster/span_render.h"
 
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_routine.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_cpu.h"
@@ -9,64 +10,6 @@
 namespace {
 
 constexpr int32_t kErrUnexpectedBitDepth = 3;
-
-// Kind 1: blended into the row of the world with the layer's transfer mode. Normal mode
-// without linear blending replaces the destination by an opaque pixel at full coverage, so
-// such pixels (most of an opaque layer) are stored without a call.
-template <class P>
-struct CompositeDelivery {
-    static constexpr bool kUsesDepth = false;
-    static constexpr auto kFull = static_cast<SY_Coverage<P>>(PF_PixelTraits<P>::kMax);
-
-    CompositeDelivery(P* destinationRow, uint8_t mode, const PF_LinearBlendingTables* blending)
-        : row(destinationRow),
-          blend(PF_Get_Xfer1_Opacity<P>(mode)),
-          tables(blending),
-          opaqueReplaces((mode & 127) == kPF_XferNormal && !blending) {}
-
-    void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth&,
-                 int32_t) {
-        if (opaqueReplaces && coverage == kFull && pixel.alpha == kFull)
-            row[x] = pixel;
-        else
-            blend(&pixel, tables, coverage, row + x);
-    }
-
-    P* row;
-    PF_Xfer1OpacityFunc<P> blend;
-    const PF_LinearBlendingTables* tables;
-    bool opaqueReplaces;
-};
-
-// Kind 3: written over the image's pixel; the image's owner applies the coverage later.
-template <class P>
-struct StoreDelivery {
-    static constexpr bool kUsesDepth = false;
-    P* row;  // the image's row, moved so that frame x indexes it
-
-    void Deliver(int32_t x, const P& pixel, SY_Coverage<P>, const SY_FragmentDepth&, int32_t) {
-        row[x] = pixel;
-    }
-};
-
-// Kind 2: a fragment in the pixel's list of a draft buffer; the resolve blends the lists later.
-template <class P>
-struct DraftFragmentDelivery {
-    static constexpr bool kUsesDepth = true;
-
-    DraftFragmentDelivery(SY_MBufferDraftX<P>* target, int32_t x, int32_t y, uint8_t layerMode)
-        : buffer(target), heads(target->HeadAt(x, y)), firstX(x), mode(layerMode) {}
-
-    void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth& d,
-                 int32_t thread) {
-        buffer->AddFragment(&pixel, coverage, mode, d.depth, heads + (x - firstX), thread);
-    }
-
-    SY_MBufferDraftX<P>* buffer;
-    SY_FragmentDraftX<P>** heads;  // the heads of the span's row, from its first pixel on
-    int32_t firstX;
-    uint8_t mode;
-};
 
 SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
     SY_SpanRayState ray;
@@ -94,21 +37,21 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     switch (target.mode) {
         case kSY_TargetDestination: {
             auto* world = static_cast<PF_World*>(target.object);
-            CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
+            SY_CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
         case kSY_TargetFragmentBuffer: {
             auto* buffer = static_cast<SY_MBuffer*>(target.object);
             if (buffer->IsAntialiased() || buffer->HasMotionBlur()) break;
-            DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                              shader.mode);
+            SY_DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
+                                                 shader.mode);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
         case kSY_TargetDepthOfField: {
             auto* record = static_cast<SY_SpanImageRecord*>(target.object);
-            StoreDelivery<P> delivery{record->image->Row<P>(y - record->y0) - record->x0};
+            SY_StoreDelivery<P> delivery{record->image->Row<P>(y - record->y0) - record->x0};
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
@@ -148,14 +91,6 @@ void RenderAtDepth(const SY_ScreenGeometry& geometry, const SY_LayerShader& shad
     Deliver(shader, state, ray, matte, x, count, y, tables, target, thread);
 }
 
-int16_t TargetBitDepth(const SY_RenderTarget& target) {
-    if (target.mode == kSY_TargetDestination)
-        return static_cast<const PF_World*>(target.object)->GetBitDepth();
-    if (target.mode == kSY_TargetFragmentBuffer)
-        return static_cast<const SY_MBuffer*>(target.object)->GetBitDepth();
-    return static_cast<const SY_SpanImageRecord*>(target.object)->image->GetBitDepth();
-}
-
 }  // namespace
 
 void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_Shader* shader,
@@ -167,7 +102,7 @@ void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_
         target.mode != kSY_TargetDepthOfField) {
         return;
     }
-    int16_t depth = TargetBitDepth(target);
+    int16_t depth = SY_TargetBitDepth(target);
     if (geometry.texture->GetBitDepth() != depth) depth = 0;
     const auto& layerShader = static_cast<const SY_LayerShader&>(*shader);
     switch (depth) {

@@ -2,6 +2,7 @@
 // one row work item per covered row.
 #include <cmath>
 
+#include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
 #include "renderer/scene/render_context.h"
@@ -40,6 +41,8 @@ struct RowClosure {
     const SY_SpanTable* table;
     const SY_RenderTarget* target;
     const PF_LinearBlendingTables* blending;  // the frame's colour settings: linear light, or null
+    SY_SpanBlend blend;                       // the simple path's mode, opacity and depth offset
+    int32_t width;                            // the simple path's row length: the destination's
 };
 
 void DrawRow(const void* closure, int32_t row, int32_t item, int32_t thread) {
@@ -49,11 +52,31 @@ void DrawRow(const void* closure, int32_t row, int32_t item, int32_t thread) {
                                    span.end - span.start, row, c.blending, *c.target, thread);
 }
 
+void DrawImageRow(const void* closure, int32_t row, int32_t, int32_t thread) {
+    const auto& c = *static_cast<const RowClosure*>(closure);
+    SY_RenderLayerSpanFromImage_SwitchDepth(c.blend, *c.geometry, c.matte, 0, c.width, row,
+                                            c.blending, *c.target, thread);
+}
+
 void CountDone(SY_RenderContext* context) {
     ++context->renderablesDone;
     context->progress->ReportRenderables(context->renderablesDone, context->renderableCount);
 }
 
+void RunRows(SY_RenderContext* context, int32_t firstRow, int32_t rows, int32_t fieldMode,
+             SY_RowDrawer draw, const RowClosure& closure) {
+    SY_RowWork work;
+    work.iterate = context->iterate;
+    work.progress = context->progress;
+    work.firstRow = firstRow;
+    work.itemCount = rows;
+    work.fieldMode = fieldMode;
+    work.draw = draw;
+    work.closure = &closure;
+    SY_RunRowWork(work);
+}
+
+// The rows the layer's covered polygon touches, each drawn through the projection.
 void DrawGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
                      const RowClosure& closure, SY_SpanTable* table, int32_t fieldMode) {
     SY_AccountedVector<M_Point2> polygon;
@@ -61,21 +84,18 @@ void DrawGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
     if (polygon.empty()) return;
     SY_BuildSpanTable(polygon.data(), static_cast<int32_t>(polygon.size()), table);
     if (table->rows.empty()) return;
-    SY_RowWork work;
-    work.iterate = context->iterate;
-    work.progress = context->progress;
-    work.firstRow = table->firstRow;
-    work.itemCount = static_cast<int32_t>(table->rows.size());
-    work.fieldMode = fieldMode;
-    work.draw = &DrawRow;
-    work.closure = &closure;
-    SY_RunRowWork(work);
+    RunRows(context, table->firstRow, static_cast<int32_t>(table->rows.size()), fieldMode, &DrawRow,
+            closure);
 }
 
-void DrawUnboundedLayerThroughGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
-                                          const RowClosure& closure, SY_SpanTable* table,
-                                          int32_t fieldMode) {
-    DrawGeneralPath(context, renderable, closure, table, fieldMode);
+// Every row of the destination, drawn whole from the layer's image in output coordinates.
+void DrawSimplePath(SY_RenderContext* context, const RowClosure& closure, int32_t fieldMode) {
+    RunRows(context, 0, context->destination->height, fieldMode, &DrawImageRow, closure);
+}
+
+// The simple path's blend record, from the material as the layer's shader takes it.
+SY_SpanBlend ImageBlend(const SY_Material& material) {
+    return {material.mode, material.opacity, SY_DepthOffset(material)};
 }
 
 }  // namespace
@@ -107,9 +127,11 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
                 matte,
                 &table,
                 &target,
-                reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings)};
+                reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
+                ImageBlend(material),
+                context->destination->width};
             if (simplePath)
-                DrawUnboundedLayerThroughGeneralPath(context, *this, closure, &table, fieldMode);
+                DrawSimplePath(context, closure, fieldMode);
             else
                 DrawGeneralPath(context, *this, closure, &table, fieldMode);
         }

@@ -78,6 +78,11 @@ struct SY_Material {
 
 SY_Material SY_MaterialOf(const SY_LayerDesc& layer);
 
+// What the layer's position in the render order adds to its fragments' depth keys.
+inline float SY_DepthOffset(const SY_Material& material) {
+    return static_cast<float>(-material.depthIndex * kSY_DepthStepPerIndex);
+}
+
 class SY_TRenderable {
 public:
     virtual ~SY_TRenderable() = default;

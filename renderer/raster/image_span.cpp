@@ -1,0 +1,101 @@
+#include "renderer/raster/image_span.h"
+
+#include <algorithm>
+
+#include "renderer/raster/span_deliveries.h"
+#include "renderer/raster/span_state.h"
+#include "renderer/scene/screen_geometry.h"
+#include "u_report.h"
+
+namespace {
+
+constexpr int32_t kErrUnexpectedBitDepth = 3;
+
+// The span's pixels, clipped to the image, and the plane's depth at the first of them.
+struct ImageSpan {
+    int32_t x;
+    int32_t count;
+    SY_SpanMapping depth;
+    bool perspective;
+};
+
+// Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
+// key is the smallest value W takes over the pixel square, from its top-left corner, as for
+// the layer's textured spans.
+template <class P, class Delivery>
+void DrawFromImage(const SY_SpanBlend& blend, const PF_World& image, const ImageSpan& span,
+                   const P* matte, int32_t y, Delivery& delivery, int32_t thread) {
+    using namespace sy_span;
+    const P* source = image.PixelAt<P>(span.x, y);
+    const SY_SpanMapping& m = span.depth;
+    const double offset = m.low - 0.5 * (m.dwdx + m.dwdy) + blend.depthOffset;
+    const SY_Coverage<P> layerCoverage = LayerCoverage<P>(blend.opacity);
+    SY_FragmentDepth depth{0, m.dwdx, m.dwdy, 0};
+    for (int32_t i = 0; i < span.count; ++i) {
+        if (matte && matte[i].alpha == 0) continue;
+        double w = m.w + i * static_cast<double>(m.dwdx);
+        if (span.perspective && w <= 0) continue;
+        if constexpr (Delivery::kUsesDepth) depth.depth = static_cast<float>(w + offset);
+        SY_Coverage<P> coverage =
+            matte ? MatteCoverage<P>(matte[i].alpha, layerCoverage) : layerCoverage;
+        delivery.Deliver(span.x + i, source[i], coverage, depth, thread);
+    }
+}
+
+template <class P>
+void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
+                 const PF_World* matteWorld, const ImageSpan& span, int32_t y,
+                 const PF_LinearBlendingTables* tables, const SY_RenderTarget& target,
+                 int32_t thread) {
+    const P* matte = matteWorld ? matteWorld->PixelAt<P>(span.x, y) : nullptr;
+    if (target.mode == kSY_TargetDestination) {
+        auto* world = static_cast<PF_World*>(target.object);
+        SY_CompositeDelivery<P> delivery(world->Row<P>(y), blend.mode, tables);
+        DrawFromImage(blend, *layer.texture, span, matte, y, delivery, thread);
+        return;
+    }
+    auto* buffer = static_cast<SY_MBuffer*>(target.object);
+    if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
+    SY_DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
+                                         blend.mode);
+    DrawFromImage(blend, *layer.texture, span, matte, y, delivery, thread);
+}
+
+}  // namespace
+
+void SY_RenderLayerSpanFromImage_SwitchDepth(const SY_SpanBlend& blend,
+                                             const SY_ScreenGeometry& layer, const PF_World* matte,
+                                             int32_t x, int32_t count, int32_t y,
+                                             const PF_LinearBlendingTables* tables,
+                                             const SY_RenderTarget& target, int32_t thread) {
+    if (count <= 0) return;
+    if (target.mode != kSY_TargetDestination && target.mode != kSY_TargetFragmentBuffer) return;
+    int16_t depth = SY_TargetBitDepth(target);
+    if (layer.texture->GetBitDepth() != depth) depth = 0;
+    if (depth != 8 && depth != 16 && depth != 32) {
+        U_ReportFailedVerification(
+            0, __LINE__, 0, "Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()");
+        throw kErrUnexpectedBitDepth;
+    }
+
+    const PF_World& image = *layer.texture;
+    if (y < 0 || y >= image.height) return;
+    ImageSpan span;
+    span.x = std::max(x, 0);
+    span.count = std::min(x + count, image.width) - span.x;
+    if (span.count <= 0) return;
+    span.perspective = layer.perspective;
+    span.depth.Start(layer.screenToTexture[layer.firstValid], span.x + 0.5, y + 0.5,
+                     layer.perspective, 1.0f);
+    switch (depth) {
+        case 8:
+            DrawAtDepth<PF_Pixel8>(blend, layer, matte, span, y, tables, target, thread);
+            break;
+        case 16:
+            DrawAtDepth<PF_Pixel16>(blend, layer, matte, span, y, tables, target, thread);
+            break;
+        default:
+            DrawAtDepth<PF_PixelFloat>(blend, layer, matte, span, y, tables, target, thread);
+            break;
+    }
+}

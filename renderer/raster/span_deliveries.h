@@ -1,0 +1,87 @@
+// Where the span routines hand their pixels: composited into a world, stored into an image, or
+// added to a draft fragment buffer. Each delivery takes (x, pixel, coverage, depth, thread).
+#pragma once
+
+#include <cstdint>
+
+#include "pf_pixel.h"
+#include "pf_xfer.h"
+#include "renderer/mbuffer/mbuffer.h"
+#include "renderer/raster/span_render.h"
+#include "renderer/raster/span_routine.h"
+
+// Kind 1: blended into the row of the world with the layer's transfer mode; with bit 7 of the
+// mode byte the destination keeps its alpha. Normal mode without linear blending replaces the
+// destination by an opaque pixel at full coverage, so such pixels (most of an opaque layer)
+// are stored without a call.
+template <class P>
+struct SY_CompositeDelivery {
+    static constexpr bool kUsesDepth = false;
+    static constexpr auto kFull = static_cast<SY_Coverage<P>>(PF_PixelTraits<P>::kMax);
+
+    SY_CompositeDelivery(P* destinationRow, uint8_t mode, const PF_LinearBlendingTables* blending)
+        : row(destinationRow),
+          blend(PF_Get_Xfer1_Opacity<P>(mode & 127)),
+          tables(blending),
+          keepAlpha((mode & 128) != 0),
+          opaqueReplaces((mode & 127) == kPF_XferNormal && !blending && !keepAlpha) {}
+
+    void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth&,
+                 int32_t) {
+        P* destination = row + x;
+        if (opaqueReplaces && coverage == kFull && pixel.alpha == kFull) {
+            *destination = pixel;
+        } else if (keepAlpha) {
+            auto alpha = destination->alpha;
+            blend(&pixel, tables, coverage, destination);
+            destination->alpha = alpha;
+        } else {
+            blend(&pixel, tables, coverage, destination);
+        }
+    }
+
+    P* row;
+    PF_Xfer1OpacityFunc<P> blend;
+    const PF_LinearBlendingTables* tables;
+    bool keepAlpha;
+    bool opaqueReplaces;
+};
+
+// Kind 3: written over the image's pixel; the image's owner applies the coverage later.
+template <class P>
+struct SY_StoreDelivery {
+    static constexpr bool kUsesDepth = false;
+    P* row;  // the image's row, moved so that frame x indexes it
+
+    void Deliver(int32_t x, const P& pixel, SY_Coverage<P>, const SY_FragmentDepth&, int32_t) {
+        row[x] = pixel;
+    }
+};
+
+// Kind 2: a fragment in the pixel's list of a draft buffer; the resolve blends the lists later.
+template <class P>
+struct SY_DraftFragmentDelivery {
+    static constexpr bool kUsesDepth = true;
+
+    SY_DraftFragmentDelivery(SY_MBufferDraftX<P>* target, int32_t x, int32_t y, uint8_t layerMode)
+        : buffer(target), heads(target->HeadAt(x, y)), firstX(x), mode(layerMode) {}
+
+    void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth& d,
+                 int32_t thread) {
+        buffer->AddFragment(&pixel, coverage, mode, d.depth, heads + (x - firstX), thread);
+    }
+
+    SY_MBufferDraftX<P>* buffer;
+    SY_FragmentDraftX<P>** heads;  // the heads of the span's row, from its first pixel on
+    int32_t firstX;
+    uint8_t mode;
+};
+
+// The pixel depth of a target of kind 1, 2 or 3.
+inline int16_t SY_TargetBitDepth(const SY_RenderTarget& target) {
+    if (target.mode == kSY_TargetDestination)
+        return static_cast<const PF_World*>(target.object)->GetBitDepth();
+    if (target.mode == kSY_TargetFragmentBuffer)
+        return static_cast<const SY_MBuffer*>(target.object)->GetBitDepth();
+    return static_cast<const SY_SpanImageRecord*>(target.object)->image->GetBitDepth();
+}
