@@ -185,27 +185,4 @@ TYPED_TEST(ImageSpan, ImageLayersSortAgainstTexturedLayersByDepth) {
     }
 }
 
-TEST(ImageSpanDepth, ImageOfAnotherDepthIsReportedAndThrowsThree) {
-    ostrel_test::MemoryTextureFetcher fetcher;
-    auto image = PatternTexture<PF_Pixel16>(kWidth, kHeight);
-    SY_ScreenGeometry geometry;
-    geometry.textureFetcher = &fetcher;
-    geometry.texture = image.get();
-    SetPlane(&geometry, 1, 0, false);
-    PF_WorldX<PF_Pixel8> destination(kWidth, kHeight);
-    SY_RenderTarget target{kSY_TargetDestination, &destination};
-    ostrel_test::ReportCapture capture;
-    int32_t thrown = 0;
-    try {
-        SY_RenderLayerSpanFromImage_SwitchDepth({}, geometry, nullptr, 0, 4, 0, nullptr, target, 0);
-    } catch (int32_t code) {
-        thrown = code;
-    }
-    EXPECT_EQ(thrown, 3);
-    ASSERT_EQ(ostrel_test::ReportCapture::reports().size(), 1u);
-    EXPECT_EQ(ostrel_test::ReportCapture::reports()[0].text,
-              "Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()");
-    EXPECT_TRUE(IsClear(destination.At(0, 0)));
-}
-
 }  // namespace

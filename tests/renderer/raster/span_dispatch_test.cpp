@@ -1,7 +1,10 @@
 #include <gtest/gtest.h>
 
+#include <functional>
+
 #include "raster_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
 #include "renderer/scene/screen_geometry.h"
@@ -148,6 +151,7 @@ TYPED_TEST(SpanDispatch, ShadingScalesTexelsByTheLightingTerms) {
     }
 }
 
+// Both span dispatchers refuse a texture whose depth differs from the target's.
 TEST(SpanDispatchDepth, TextureOfAnotherDepthIsReportedAndThrowsThree) {
     ostrel_test::MemoryTextureFetcher fetcher;
     PF_WorldX<PF_Pixel8> texture(4, 4);
@@ -158,17 +162,34 @@ TEST(SpanDispatchDepth, TextureOfAnotherDepthIsReportedAndThrowsThree) {
     SY_LayerShader shader;
     PF_WorldX<PF_Pixel16> destination(4, 4);
     SY_RenderTarget target{kSY_TargetDestination, &destination};
-    ostrel_test::ReportCapture capture;
-    int32_t thrown = 0;
-    try {
-        SY_RenderLayerSpan_SwitchDepth(geometry, &shader, nullptr, 0, 4, 0, nullptr, target, 0);
-    } catch (int32_t code) {
-        thrown = code;
+    struct Case {
+        const char* message;
+        std::function<void()> draw;
+    };
+    const Case cases[] = {
+        {"Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()",
+         [&] {
+             SY_RenderLayerSpan_SwitchDepth(geometry, &shader, nullptr, 0, 4, 0, nullptr, target,
+                                            0);
+         }},
+        {"Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()",
+         [&] {
+             SY_RenderLayerSpanFromImage_SwitchDepth({}, geometry, nullptr, 0, 4, 0, nullptr,
+                                                     target, 0);
+         }},
+    };
+    for (const Case& c : cases) {
+        ostrel_test::ReportCapture capture;
+        int32_t thrown = 0;
+        try {
+            c.draw();
+        } catch (int32_t code) {
+            thrown = code;
+        }
+        EXPECT_EQ(thrown, 3) << c.message;
+        ASSERT_EQ(ostrel_test::ReportCapture::reports().size(), 1u) << c.message;
+        EXPECT_EQ(ostrel_test::ReportCapture::reports()[0].text, c.message);
     }
-    EXPECT_EQ(thrown, 3);
-    ASSERT_EQ(ostrel_test::ReportCapture::reports().size(), 1u);
-    EXPECT_EQ(ostrel_test::ReportCapture::reports()[0].text,
-              "Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()");
 }
 
 }  // namespace
