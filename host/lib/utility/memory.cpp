@@ -1,7 +1,8 @@
 #include "u_memory.h"
 
+#include "block_cache.h"
+
 #include <atomic>
-#include <cstdlib>
 #include <cstring>
 #include <new>
 
@@ -32,7 +33,7 @@ void* HeaderOf(void* block) {
 
 void* U_AllocatePtr(uint32_t, const char*, size_t bytes) {
     if (SimulatedFailure() || bytes > SIZE_MAX - sizeof(BlockHeader)) return nullptr;
-    auto* header = static_cast<BlockHeader*>(std::malloc(sizeof(BlockHeader) + bytes));
+    auto* header = static_cast<BlockHeader*>(u_memory::TakeRawBlock(sizeof(BlockHeader) + bytes));
     if (!header) return nullptr;
     header->bytes = bytes;
     return header + 1;
@@ -52,7 +53,9 @@ int32_t U_ResizePtr(uint32_t tag, size_t bytes, const char* name, void** address
 }
 
 void U_FreePtr(void* block) {
-    if (block) std::free(HeaderOf(block));
+    if (!block) return;
+    auto* header = static_cast<BlockHeader*>(HeaderOf(block));
+    u_memory::GiveBackRawBlock(header, sizeof(BlockHeader) + header->bytes);
 }
 
 int32_t U_PurgeLoop(size_t bytes, U_ElementConstructor constructor, U_PurgeRecord* record,

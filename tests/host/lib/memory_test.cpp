@@ -77,6 +77,22 @@ TEST(Memory, PurgeLoopReportsExhaustionInTheRecord) {
     U_SetPurgeHandler(nullptr);
 }
 
+// A frame asks for the blocks the frame before it freed: large ones come back as they were
+// left, small ones and other sizes do not.
+TEST(Memory, LargeBlocksFreedByOneFrameServeTheNext) {
+    constexpr size_t kLarge = 3 << 20;
+    void* first = U_AllocatePtr(0, "frame", kLarge);
+    ASSERT_NE(first, nullptr);
+    static_cast<char*>(first)[kLarge - 1] = 1;
+    U_FreePtr(first);
+    void* other = U_AllocatePtr(0, "frame", kLarge + 16);
+    void* again = U_AllocatePtr(0, "frame", kLarge);
+    EXPECT_NE(other, first);
+    EXPECT_EQ(again, first);
+    U_FreePtr(other);
+    U_FreePtr(again);
+}
+
 struct Tracked : U_MemTrackedObject {
     double payload[8];
 };
