@@ -10,7 +10,7 @@
 #include "cli/progress_display.h"
 #include "composition/composition_loader.h"
 #include "host_error.h"
-#include "output/image_writer.h"
+#include "output/frame_writer.h"
 #include "session/frame_suites.h"
 #include "suites/iterate_suite.h"
 #include "suites/persistent_data_suite.h"
@@ -127,6 +127,8 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     CatchInterrupts();
     FrameTimes all;
     std::string firstFile, lastFile;
+    // Frame n is written while frame n + 1 renders.
+    FrameWriter writer;
     for (int32_t frame = range.first; frame <= range.last; ++frame) {
         if (Interrupted()) {
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
@@ -150,7 +152,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         Clock::time_point output = Clock::now();
         std::filesystem::path file = ExpandFramePattern(pattern, frame);
         MakeOutputFolder(file);
-        WriteWorld(session.Destination(), file);
+        writer.Write(PrepareImage(session.Destination(), file));
         times.output = Seconds(Clock::now() - output);
         times.total = Seconds(Clock::now() - frameStart);
         all += times;
@@ -162,6 +164,9 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             out << "frame " << frame << " split: " << Split(times) << '\n';
         }
     }
+    Clock::time_point lastWrite = Clock::now();
+    writer.Finish();
+    all.output += Seconds(Clock::now() - lastWrite);
     progress.Clear();
     if (options.terminal) {
         // The bar is gone: one line says what became of the run.

@@ -87,29 +87,37 @@ Pixels Convert(const PF_World& world, const std::string& format) {
 
 }  // namespace
 
-void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
+PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path) {
     std::string name = path.string();
     auto out = OIIO::ImageOutput::create(name);
     if (!out)
         throw HostError(name + ": cannot write images of this kind (" + OIIO::geterror() + ")");
-    std::string format = out->format_name();
-    Pixels pixels = Convert(world, format);
+    Pixels pixels = Convert(world, out->format_name());
+    return {path, world.width, world.height, pixels.type.basetype, std::move(pixels.bytes)};
+}
 
-    OIIO::ImageSpec layout(world.width, world.height, 4, pixels.type);
+void WritePrepared(const PreparedImage& image) {
+    std::string name = image.path.string();
+    auto out = OIIO::ImageOutput::create(name);
+    if (!out)
+        throw HostError(name + ": cannot write images of this kind (" + OIIO::geterror() + ")");
+    std::string format = out->format_name();
+    OIIO::TypeDesc type(static_cast<OIIO::TypeDesc::BASETYPE>(image.channelType));
+    OIIO::ImageSpec layout(image.width, image.height, 4, type);
     if (format != "openexr") layout.attribute("oiio:UnassociatedAlpha", 1);
     // Frames are written by the hundred: the fastest deflate level without row filters costs
     // some size and saves most of the time a frame spends in the PNG writer.
     layout.attribute("png:compressionLevel", 1);
     layout.attribute("png:filter", kPngFilterNone);
     // The temporary keeps the extension so that the same writer handles it.
-    std::filesystem::path partial = path;
+    std::filesystem::path partial = image.path;
     std::string partialName = ".";
-    partialName += path.stem().string();
+    partialName += image.path.stem().string();
     partialName += ".partial-" + std::to_string(::getpid());
-    partialName += path.extension().string();
+    partialName += image.path.extension().string();
     partial.replace_filename(partialName);
     bool written =
-        out->open(partial.string(), layout) && out->write_image(pixels.type, pixels.bytes.data());
+        out->open(partial.string(), layout) && out->write_image(type, image.bytes.data());
     written = out->close() && written;
     std::error_code ignored;
     if (!written) {
@@ -119,11 +127,15 @@ void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
             name + ": cannot write the image: " + (problem.empty() ? "unknown error" : problem));
     }
     std::error_code renamed;
-    std::filesystem::rename(partial, path, renamed);
+    std::filesystem::rename(partial, image.path, renamed);
     if (renamed) {
         std::filesystem::remove(partial, ignored);
         throw HostError(name + ": cannot write the image: " + renamed.message());
     }
+}
+
+void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
+    WritePrepared(PrepareImage(world, path));
 }
 
 std::string ExpandFramePattern(const std::string& pattern, int frame) {

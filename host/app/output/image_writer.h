@@ -1,12 +1,30 @@
 // Writing rendered frames to image files through OpenImageIO.
 #pragma once
 
+#include <cstdint>
 #include <filesystem>
 #include <string>
+#include <vector>
 
 #include "pf_world.h"
 
 namespace ostrel {
+
+// A frame converted for its file, which any thread may then write.
+struct PreparedImage {
+    std::filesystem::path path;
+    int32_t width = 0;
+    int32_t height = 0;
+    int channelType = 0;         // the file's channel type, as OpenImageIO names it
+    std::vector<uint8_t> bytes;  // interleaved red, green, blue, alpha
+};
+
+// Converts the world for the file at path (see WriteWorld). Throws HostError naming the file
+// when no writer handles its kind.
+PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path);
+
+// Writes a prepared frame whole or not at all. Throws HostError naming the file.
+void WritePrepared(const PreparedImage& image);
 
 // Writes the world to path, the format chosen by the extension (.png, .tif/.tiff, .exr, .jpg,
 // and whatever else OpenImageIO writes). 8-bit worlds are written as 8 bits, 16-bit worlds as

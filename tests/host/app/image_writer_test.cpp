@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host_error.h"
+#include "output/frame_writer.h"
 #include "output/image_writer.h"
 
 namespace {
@@ -97,6 +98,29 @@ TEST(ImageWriter, AFailedWriteLeavesNoFile) {
         }
     }
     EXPECT_EQ(folder.FileCount(), 0u);
+}
+
+// Frames written behind the render: a failed write comes back from the next call, naming
+// its file, and the frames around it are written whole.
+TEST(ImageWriter, FrameWriterReportsAFailureOnTheNextCall) {
+    TempFolder folder;
+    PF_WorldX<PF_Pixel8> world(4, 4);
+    ostrel::FrameWriter writer;
+    writer.Write(ostrel::PrepareImage(world, folder / "0.png"));
+    writer.Write(ostrel::PrepareImage(world, folder / "missing-folder" / "1.png"));
+    try {
+        writer.Write(ostrel::PrepareImage(world, folder / "2.png"));
+        ADD_FAILURE() << "the failed write went unreported";
+    } catch (const ostrel::HostError& e) {
+        EXPECT_NE(std::string(e.what()).find("1.png: cannot write the image"), std::string::npos)
+            << e.what();
+    }
+    writer.Write(ostrel::PrepareImage(world, folder / "3.png"));
+    writer.Finish();
+    EXPECT_TRUE(fs::exists(folder / "0.png"));
+    EXPECT_FALSE(fs::exists(folder / "2.png"));
+    EXPECT_TRUE(fs::exists(folder / "3.png"));
+    EXPECT_EQ(folder.FileCount(), 2u);
 }
 
 TEST(ImageWriter, FramePatterns) {
