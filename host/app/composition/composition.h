@@ -112,6 +112,9 @@ struct Source {
     Color solidColor{};
     int32_t width = 0;
     int32_t height = 0;
+    // A solid plane without edges: frames show it wherever its plane is seen. Its size is
+    // still the comp's, which places its default anchor point and is its source rectangle.
+    bool unbounded = false;
 };
 
 struct Layer {

@@ -288,6 +288,12 @@ void Loader::ReadSource(ObjectReader& r, Layer& layer) {
     solid.Require("color");
     layer.source.solidColor = ReadVec<3>(c_, *solid.Find("color"), solid.PlaceOf("color"), {},
                                          Range::Between(0, 1), true);
+    layer.source.unbounded = solid.Bool("unbounded", false);
+    if (layer.source.unbounded) {
+        for (std::string_view key : {"width", "height"}) {
+            if (solid.Has(key)) solid.Fail(key, "an unbounded solid has no size");
+        }
+    }
     layer.source.width = solid.Integer("width", comp_.width, 1, kMaxSide);
     layer.source.height = solid.Integer("height", comp_.height, 1, kMaxSide);
     solid.Finish();

@@ -73,13 +73,10 @@ std::unique_ptr<PF_World> FromImage(const DecodedImage& image, int32_t dx, int32
 }
 
 template <class P>
-std::unique_ptr<PF_World> FromSolid(const Source& source, int32_t dx, int32_t dy) {
-    int32_t width = (source.width + dx - 1) / dx;
-    int32_t height = (source.height + dy - 1) / dy;
+std::unique_ptr<PF_World> FromSolid(const Color& color, int32_t width, int32_t height) {
     auto world = std::make_unique<PF_WorldX<P>>(width, height);
-    const float argb[4] = {1.0f, static_cast<float>(source.solidColor[0]),
-                           static_cast<float>(source.solidColor[1]),
-                           static_cast<float>(source.solidColor[2])};
+    const float argb[4] = {1.0f, static_cast<float>(color[0]), static_cast<float>(color[1]),
+                           static_cast<float>(color[2])};
     const P pixel = ToPixel<P>(argb, false);
     for (int32_t y = 0; y < height; ++y)
         std::fill_n(world->Row(y), width, pixel);
@@ -88,7 +85,11 @@ std::unique_ptr<PF_World> FromSolid(const Source& source, int32_t dx, int32_t dy
 
 template <class P>
 std::unique_ptr<PF_World> Deliver(ImageCache& cache, const Layer& layer, int32_t dx, int32_t dy) {
-    if (layer.kind == LayerKind::kSolid) return FromSolid<P>(layer.source, dx, dy);
+    if (layer.kind == LayerKind::kSolid) {
+        const Source& source = layer.source;
+        return FromSolid<P>(source.solidColor, (source.width + dx - 1) / dx,
+                            (source.height + dy - 1) / dy);
+    }
     return FromImage<P>(*cache.Get(layer.source.image), dx, dy);
 }
 
@@ -122,6 +123,20 @@ std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int
             return Deliver<PF_Pixel16>(cache, layer, downsampleX, downsampleY);
         case 32:
             return Deliver<PF_PixelFloat>(cache, layer, downsampleX, downsampleY);
+        default:
+            throw std::invalid_argument("bit depth " + std::to_string(bitDepth));
+    }
+}
+
+std::unique_ptr<PF_World> SolidPixels(const Color& color, int16_t bitDepth, int32_t width,
+                                      int32_t height) {
+    switch (bitDepth) {
+        case 8:
+            return FromSolid<PF_Pixel8>(color, width, height);
+        case 16:
+            return FromSolid<PF_Pixel16>(color, width, height);
+        case 32:
+            return FromSolid<PF_PixelFloat>(color, width, height);
         default:
             throw std::invalid_argument("bit depth " + std::to_string(bitDepth));
     }

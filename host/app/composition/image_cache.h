@@ -35,4 +35,10 @@ private:
 std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int16_t bitDepth,
                                       int32_t downsampleX, int32_t downsampleY);
 
+// width × height pixels of the opaque straight colour at bitDepth (8, 16 or 32), converted as
+// solid sources are. Throws std::invalid_argument for another depth and std::bad_alloc when the
+// world cannot be had.
+std::unique_ptr<PF_World> SolidPixels(const Color& color, int16_t bitDepth, int32_t width,
+                                      int32_t height);
+
 }  // namespace ostrel

@@ -15,7 +15,9 @@ namespace ostrel {
 std::vector<int32_t> RenderOrder(const Composition& comp, double seconds);
 
 // The layer's source rectangle in its own pixels (left, top, right, bottom; right and bottom
-// exclusive): the image or solid size, empty for layers without pixels.
+// exclusive): the image or solid size, empty for layers without pixels. An unbounded solid has
+// the comp's size here: frames draw it over the whole output, but a texture the host delivers
+// for it covers this rectangle only.
 M_LRect SourceBounds(const Layer& layer);
 
 }  // namespace ostrel

@@ -132,21 +132,27 @@ int32_t GetRenderOpacity(QNGP_RenderContextH context, QNGP_LayerContextH layerCo
     });
 }
 
-// Every layer with pixels has a finite source: images and solids both have a size.
+// Only a solid that says so is unbounded; images always have their size.
 int32_t IsLayerUnbounded(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                          bool* unbounded) {
     return Serve(context, [&](FrameSession& session) {
         if (!unbounded) return kErrBadArgument;
         if (!Owns(session, layerContext)) return kErrBadHandle;
-        *unbounded = false;
+        *unbounded = session.LayerAt(layerContext->layer->index).source.unbounded;
         return 0;
     });
 }
 
-// The layer's pixels at the frame's depth and downsample, timed as host work.
-std::unique_ptr<PF_World> DeliverPixels(FrameSession& session, int32_t layerIndex) {
+// Where delivered pixels lie: in the layer's own pixels at the downsample, or in output pixels.
+enum class Placement { kLayer, kOutput };
+
+// The layer's pixels at the frame's depth, timed as host work.
+std::unique_ptr<PF_World> DeliverPixels(FrameSession& session, int32_t layerIndex,
+                                        Placement placement) {
     auto start = std::chrono::steady_clock::now();
-    std::unique_ptr<PF_World> world = session.LayerPixels(layerIndex);
+    std::unique_ptr<PF_World> world = placement == Placement::kOutput
+                                          ? session.OutputPixels(layerIndex)
+                                          : session.LayerPixels(layerIndex);
     session.AddPixelDeliveryNanoseconds(std::chrono::duration_cast<std::chrono::nanoseconds>(
                                             std::chrono::steady_clock::now() - start)
                                             .count());
@@ -154,17 +160,20 @@ std::unique_ptr<PF_World> DeliverPixels(FrameSession& session, int32_t layerInde
 }
 
 // A matte (mode 0) becomes the caller's to delete; a whole layer (mode 2) is handed back
-// through DisposeTexture like a texture.
+// through DisposeTexture like a texture. An unbounded layer has no size of its own to deliver:
+// both come in output coordinates, which is also where the renderer reads a matte.
 int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerContextH layerContext,
                     int32_t mode, PF_World** world) {
     return Serve(context, [&](FrameSession& session) {
         if (!world) return kErrBadArgument;
         *world = nullptr;
         if (!Owns(session, layerContext) || layer != layerContext->layer) return kErrBadHandle;
+        Placement placement =
+            session.LayerAt(layer->index).source.unbounded ? Placement::kOutput : Placement::kLayer;
         if (mode == kQNGP_RenderMatte) {
-            *world = DeliverPixels(session, layer->index).release();
+            *world = DeliverPixels(session, layer->index, placement).release();
         } else if (mode == kQNGP_RenderWholeLayer) {
-            *world = session.HandOut(DeliverPixels(session, layer->index));
+            *world = session.HandOut(DeliverPixels(session, layer->index, placement));
         } else {
             return kErrBadArgument;
         }
@@ -173,7 +182,9 @@ int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerCo
 }
 
 // Textures are whole layers at the downsample whatever the hints ask: the source matrix stays
-// identity and the plug-in scales texture pixels up by the downsample factors.
+// identity and the plug-in scales texture pixels up by the downsample factors. An unbounded
+// solid's texture is its source rectangle, the comp's size; frames draw such a layer from the
+// whole layer instead.
 int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerContext, int32_t,
                       const double*, const M_LRect*, M_Matrix3* sourceMatrix, PF_World** world) {
     return Serve(context, [&](FrameSession& session) {
@@ -181,7 +192,8 @@ int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerConte
         *world = nullptr;
         if (!Owns(session, layerContext)) return kErrBadHandle;
         M_SetIdentityMatrix(sourceMatrix);
-        *world = session.HandOut(DeliverPixels(session, layerContext->layer->index));
+        *world =
+            session.HandOut(DeliverPixels(session, layerContext->layer->index, Placement::kLayer));
         return 0;
     });
 }

@@ -129,6 +129,11 @@ std::unique_ptr<PF_World> FrameSession::LayerPixels(int32_t layerIndex) {
                        settings_.downsampleY);
 }
 
+std::unique_ptr<PF_World> FrameSession::OutputPixels(int32_t layerIndex) {
+    return SolidPixels(LayerAt(layerIndex).source.solidColor, bitDepth_, destination_->width,
+                       destination_->height);
+}
+
 PF_World* FrameSession::HandOut(std::unique_ptr<PF_World> world) {
     std::lock_guard lock(mutex_);
     handedOut_.insert(world.get());

@@ -109,6 +109,10 @@ public:
     // The layer's pixels at the frame's depth and downsample, in a world the caller owns.
     // Throws CompositionError for an image that can no longer be read.
     std::unique_ptr<PF_World> LayerPixels(int32_t layerIndex);
+    // An unbounded solid in output coordinates, in a world the caller owns: the destination's
+    // size and depth, every pixel the solid's colour, so that output pixel (x, y) reads pixel
+    // (x, y) whatever the region and downsample.
+    std::unique_ptr<PF_World> OutputPixels(int32_t layerIndex);
     // Keeps a world handed to the artisan until TakeBack; safe from any thread.
     PF_World* HandOut(std::unique_ptr<PF_World> world);
     // Deletes a world handed out; false when it is not one of them.

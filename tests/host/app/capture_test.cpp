@@ -15,6 +15,7 @@
 #include "suites/suite_errors.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
+#include "world_pixels.h"
 
 namespace ostrel {
 namespace {
@@ -362,6 +363,56 @@ TEST_F(Capture, TrackMatteFetchedFromTheMatteLayer) {
         scene.layers[0].trackMatte->Release();
     }
     EXPECT_EQ(U_AccountedBytes(), startBytes);
+}
+
+// The default camera of a 360-pixel comp is 500 pixels in front of it, so a card half way
+// there is seen at twice its size: the 40 × 20 card covers x 140 to 220 and y 70 to 110 of the
+// frame. The unbounded wall lies in the comp's plane behind it and faces the camera.
+TEST_F(Capture, AnUnboundedWallFillsEveryPixelTheCardLeaves) {
+    const std::string comp = R"({"width": 360, "height": 180, "duration": 1, "layers": [
+      {"name": "card", "kind": "solid", "threeD": true, "quality": "draft",
+       "source": {"color": "#ff0000", "width": 40, "height": 20},
+       "transform": {"position": [180, 90, -250]}},
+      {"name": "wall", "kind": "solid", "threeD": true,
+       "source": {"color": "#336699", "unbounded": true}}]})";
+    struct Case {
+        int16_t bitDepth;
+        Channels card, wall;
+    };
+    const Case kCases[] = {
+        {8, {255, 255, 0, 0}, {255, 51, 102, 153}},
+        {16, {32768, 32768, 0, 0}, {32768, 6554, 13107, 19661}},
+        {32, {1, 1, 0, 0}, {1, 0.2f, 0.4f, 0.6f}},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.bitDepth);
+        int64_t startBytes = U_AccountedBytes();
+        {
+            RenderSettings settings;
+            settings.bitDepth = c.bitDepth;
+            ServedFrame frame(comp, 0, settings);
+            SY_SceneDesc scene;
+            Assemble(frame, &scene);
+            ASSERT_EQ(scene.layers.Count(), 2);
+            EXPECT_FALSE(scene.layers[0].unbounded);
+            EXPECT_TRUE(scene.layers[1].unbounded);
+
+            Options options(0);
+            ASSERT_EQ(ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
+                                 nullptr),
+                      0);
+            const PF_World& out = frame.Session().Destination();
+            int64_t wrong = 0;
+            for (int32_t y = 0; y < out.height; ++y) {
+                for (int32_t x = 0; x < out.width; ++x) {
+                    bool onCard = x >= 140 && x < 220 && y >= 70 && y < 110;
+                    wrong += ChannelsAt(out, x, y) != (onCard ? c.card : c.wall);
+                }
+            }
+            EXPECT_EQ(wrong, 0);
+        }
+        EXPECT_EQ(U_AccountedBytes(), startBytes);
+    }
 }
 
 TEST_F(Capture, AFailedFrameLeaksNothing) {

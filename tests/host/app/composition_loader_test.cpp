@@ -231,6 +231,39 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
     }
 }
 
+TEST(CompositionLoader, UnboundedSolidsTakeTheCompsSizeAndNoOwn) {
+    struct Case {
+        const char* source;
+        bool unbounded;
+        int32_t width;
+        const char* message;  // "" when the file loads
+    };
+    const Case kCases[] = {
+        {R"({"color": "#336699", "unbounded": true})", true, 100, ""},
+        {R"({"color": "#336699", "unbounded": false, "width": 20})", false, 20, ""},
+        {R"({"color": "#336699", "unbounded": true, "width": 20})", true, 0,
+         "bad.json: layers[0].source.width: an unbounded solid has no size"},
+        {R"({"color": "#336699", "height": 20, "unbounded": true})", true, 0,
+         "bad.json: layers[0].source.height: an unbounded solid has no size"},
+        {R"({"color": "#336699", "unbounded": 1})", false, 0,
+         "bad.json: layers[0].source.unbounded: expected true or false, got a number"},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.source);
+        std::string text =
+            WithLayers(std::string(R"({"kind": "solid", "source": )") + c.source + "}");
+        EXPECT_EQ(ErrorOf(text), c.message);
+        if (*c.message) continue;
+        Composition comp = ParseComposition(text, "good.json");
+        const Layer& layer = comp.layers[0];
+        EXPECT_EQ(layer.source.unbounded, c.unbounded);
+        EXPECT_EQ(layer.source.width, c.width);
+        // The anchor point defaults to the centre of the source, the comp's for an unbounded
+        // solid, so that its layer pixels line up with the comp's where it faces the camera.
+        EXPECT_EQ(layer.transform.anchorPoint.At(0.0), (Vec<3>{c.width * 0.5, 50, 0}));
+    }
+}
+
 TEST(CompositionLoader, ImagesAreFoundBesideTheFileAndMustBeReadable) {
     TempFolder folder;
     std::filesystem::create_directories(folder.Path() / "images");

@@ -36,8 +36,9 @@ TEST(Examples, EveryExampleLoadsAndHandsTheRendererItsLayers) {
         const char* file;
         size_t layers;  // rendered at the first frame
     };
-    for (const Case& c : {Case{"cards/cards.json", 3}, Case{"intersecting/intersecting.json", 3},
-                          Case{"camera-move/camera-move.json", 3}}) {
+    for (const Case& c :
+         {Case{"cards/cards.json", 3}, Case{"intersecting/intersecting.json", 3},
+          Case{"camera-move/camera-move.json", 3}, Case{"backdrop/backdrop.json", 3}}) {
         SCOPED_TRACE(c.file);
         Composition comp = LoadComposition(kExamples / c.file);
         EXPECT_EQ(RenderOrder(comp, 0.0).size(), c.layers);

@@ -1,11 +1,13 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <optional>
 
 #include "served_frame.h"
 #include "suites/suite_errors.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
+#include "world_pixels.h"
 
 namespace ostrel {
 namespace {
@@ -187,6 +189,130 @@ TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
         ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
     }
     EXPECT_EQ(U_AccountedBytes(), startBytes);
+}
+
+// Top to bottom: an unbounded white veil that serves as the card's matte, the card, and an
+// unbounded wall behind it.
+const std::string kBackdrop = R"(
+  {"name": "veil", "kind": "solid", "threeD": true,
+   "source": {"color": "#ffffff", "unbounded": true}},
+  {"name": "card", "kind": "solid", "threeD": true, "trackMatte": "alpha",
+   "source": {"color": "#ff0000", "width": 64, "height": 32}},
+  {"name": "wall", "kind": "solid", "threeD": true,
+   "source": {"color": "#336699", "unbounded": true}}
+)";
+
+TEST(CanvasSuite, OnlyUnboundedSolidsSayTheyAreUnbounded) {
+    ServedFrame frame(CompJson("", kBackdrop));
+    const QNGP_CanvasSuite13& canvas = *CanvasSuite();
+    QNGP_RenderContextH render = frame.Render();
+    struct Case {
+        int32_t renderIndex;
+        bool unbounded;
+        int16_t right, bottom;  // of the source rectangle
+    };
+    // The wall's source rectangle is the comp's.
+    for (const Case& c : {Case{0, false, 64, 32}, Case{1, true, 960, 540}}) {
+        SCOPED_TRACE(c.renderIndex);
+        QNGP_LayerContextH context = nullptr;
+        ASSERT_EQ(canvas.GetNthLayerContext(render, c.renderIndex, &context), 0);
+        bool unbounded = !c.unbounded;
+        ASSERT_EQ(canvas.IsLayerUnbounded(render, context, &unbounded), 0);
+        EXPECT_EQ(unbounded, c.unbounded);
+        T_Time now{0, 1};
+        QNGP_ShortRect bounds{};
+        ASSERT_EQ(canvas.GetRenderLayerBounds(render, context, &now, &bounds), 0);
+        EXPECT_EQ(bounds.right, c.right);
+        EXPECT_EQ(bounds.bottom, c.bottom);
+    }
+    bool unbounded = false;
+    EXPECT_EQ(canvas.IsLayerUnbounded(render, nullptr, &unbounded), kErrBadHandle);
+}
+
+TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
+    struct Case {
+        const char* name;
+        int16_t bitDepth;
+        int16_t dx, dy;
+        std::optional<M_LRect> region;
+        int32_t width, height;                // the output
+        int32_t textureWidth, textureHeight;  // the comp at the downsample
+        Channels wall;                        // #336699, opaque
+    };
+    const Case kCases[] = {
+        {"8 bits", 8, 1, 1, std::nullopt, 960, 540, 960, 540, {255, 51, 102, 153}},
+        // trunc(c × 32768 + 0.5) of 0.2, 0.4 and 0.6.
+        {"16 bits at a downsample of 2 × 3",
+         16,
+         2,
+         3,
+         std::nullopt,
+         480,
+         180,
+         480,
+         180,
+         {32768, 6554, 13107, 19661}},
+        // The 301 × 200 region at half size: ceil(301 / 2) × 100.
+        {"float, a region at a downsample of 2 × 2",
+         32,
+         2,
+         2,
+         M_LRect{100, 50, 401, 250},
+         151,
+         100,
+         480,
+         270,
+         {1, 0.2f, 0.4f, 0.6f}},
+    };
+    const QNGP_CanvasSuite13& canvas = *CanvasSuite();
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.name);
+        int64_t startBytes = U_AccountedBytes();
+        {
+            RenderSettings settings;
+            settings.bitDepth = c.bitDepth;
+            settings.downsampleX = c.dx;
+            settings.downsampleY = c.dy;
+            settings.region = c.region;
+            ServedFrame frame(CompJson("", kBackdrop), 0, settings);
+            QNGP_RenderContextH render = frame.Render();
+            ASSERT_EQ(frame.Session().Destination().width, c.width);
+            ASSERT_EQ(frame.Session().Destination().height, c.height);
+
+            QNGP_LayerContextH wall = nullptr;
+            ASSERT_EQ(canvas.GetNthLayerContext(render, 1, &wall), 0);
+            PF_World* world = nullptr;
+            ASSERT_EQ(
+                canvas.RenderLayer(render, frame.Layer(2), wall, kQNGP_RenderWholeLayer, &world),
+                0);
+            EXPECT_EQ(world->width, c.width);
+            EXPECT_EQ(world->height, c.height);
+            EXPECT_EQ(world->bitDepth, c.bitDepth);
+            EXPECT_EQ(PixelsOtherThan(*world, c.wall), 0);
+            EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
+
+            // Textures (which frames do not ask for) cover the source rectangle.
+            M_Matrix3 source{};
+            ASSERT_EQ(canvas.RenderTexture(render, wall, 1, nullptr, nullptr, &source, &world), 0);
+            EXPECT_EQ(world->width, c.textureWidth);
+            EXPECT_EQ(world->height, c.textureHeight);
+            EXPECT_EQ(PixelsOtherThan(*world, c.wall), 0);
+            EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
+
+            // The veil as the card's matte: output-sized, white and opaque everywhere.
+            QNGP_LayerContextH card = nullptr, veil = nullptr;
+            ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &card), 0);
+            ASSERT_EQ(canvas.GetTrackMatteContext(render, card, &veil), 0);
+            ASSERT_EQ(canvas.RenderLayer(render, frame.Layer(0), veil, kQNGP_RenderMatte, &world),
+                      0);
+            std::unique_ptr<PF_World> matte(world);
+            EXPECT_EQ(matte->width, c.width);
+            EXPECT_EQ(matte->height, c.height);
+            double max = c.wall[0];
+            EXPECT_EQ(PixelsOtherThan(*matte, {max, max, max, max}), 0);
+        }
+        EXPECT_EQ(U_AccountedBytes(), startBytes);
+    }
 }
 
 TEST(CanvasSuite, RegionDownsampleAndFieldsShapeTheFrame) {

@@ -1,0 +1,42 @@
+// Reading a world's pixels in tests whatever its depth.
+#pragma once
+
+#include <array>
+#include <cstdint>
+
+#include "pf_world.h"
+
+namespace ostrel {
+
+// Alpha, red, green, blue, in the world's own units (up to 255, 32768 or 1.0).
+using Channels = std::array<double, 4>;
+
+template <class P>
+Channels ChannelsAtX(const PF_World& world, int32_t x, int32_t y) {
+    const P& p = *world.PixelAt<P>(x, y);
+    return {static_cast<double>(p.alpha), static_cast<double>(p.red), static_cast<double>(p.green),
+            static_cast<double>(p.blue)};
+}
+
+inline Channels ChannelsAt(const PF_World& world, int32_t x, int32_t y) {
+    switch (world.bitDepth) {
+        case 8:
+            return ChannelsAtX<PF_Pixel8>(world, x, y);
+        case 16:
+            return ChannelsAtX<PF_Pixel16>(world, x, y);
+        default:
+            return ChannelsAtX<PF_PixelFloat>(world, x, y);
+    }
+}
+
+// How many pixels of the world are not exactly the colour.
+inline int64_t PixelsOtherThan(const PF_World& world, const Channels& colour) {
+    int64_t count = 0;
+    for (int32_t y = 0; y < world.height; ++y) {
+        for (int32_t x = 0; x < world.width; ++x)
+            count += ChannelsAt(world, x, y) != colour;
+    }
+    return count;
+}
+
+}  // namespace ostrel
