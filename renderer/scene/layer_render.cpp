@@ -1,5 +1,6 @@
 // The render operation of a layer renderable: screen geometry, track matte, span table, and
 // one row work item per covered row.
+#include <algorithm>
 #include <cmath>
 
 #include "renderer/raster/image_span.h"
@@ -38,6 +39,7 @@ struct RowClosure {
     const SY_ScreenGeometry* geometry;
     const SY_Shader* shader;
     const PF_World* matte;
+    bool matteOutsideClear;  // beyond the matte's pixels the layer is hidden
     const SY_SpanTable* table;
     const SY_RenderTarget* target;
     const PF_LinearBlendingTables* blending;  // the frame's colour settings: linear light, or null
@@ -45,17 +47,37 @@ struct RowClosure {
     int32_t width;                            // the simple path's row length: the destination's
 };
 
+// The host may deliver a matte that does not cover the whole output. The span is cut where the
+// matte ends, so that nothing reads past it; beyond it the layer is hidden when the matte's
+// outside is clear and drawn unmatted otherwise.
+template <class DrawSpan>
+void DrawMatted(const RowClosure& c, int32_t x, int32_t count, int32_t row, DrawSpan draw) {
+    if (!c.matte) {
+        draw(x, count, nullptr);
+        return;
+    }
+    int32_t end = x + count;
+    int32_t covered = row < c.matte->height ? std::clamp(c.matte->width, x, end) : x;
+    if (covered > x) draw(x, covered - x, c.matte);
+    if (!c.matteOutsideClear && covered < end) draw(covered, end - covered, nullptr);
+}
+
 void DrawRow(const void* closure, int32_t row, int32_t item, int32_t thread) {
     const auto& c = *static_cast<const RowClosure*>(closure);
     const SY_Span& span = c.table->rows[item];
-    SY_RenderLayerSpan_SwitchDepth(*c.geometry, c.shader, c.matte, span.start,
-                                   span.end - span.start, row, c.blending, *c.target, thread);
+    DrawMatted(c, span.start, span.end - span.start, row,
+               [&](int32_t x, int32_t count, const PF_World* matte) {
+                   SY_RenderLayerSpan_SwitchDepth(*c.geometry, c.shader, matte, x, count, row,
+                                                  c.blending, *c.target, thread);
+               });
 }
 
 void DrawImageRow(const void* closure, int32_t row, int32_t, int32_t thread) {
     const auto& c = *static_cast<const RowClosure*>(closure);
-    SY_RenderLayerSpanFromImage_SwitchDepth(c.blend, *c.geometry, c.matte, 0, c.width, row,
-                                            c.blending, *c.target, thread);
+    DrawMatted(c, 0, c.width, row, [&](int32_t x, int32_t count, const PF_World* matte) {
+        SY_RenderLayerSpanFromImage_SwitchDepth(c.blend, *c.geometry, matte, x, count, row,
+                                                c.blending, *c.target, thread);
+    });
 }
 
 void CountDone(SY_RenderContext* context) {
@@ -125,6 +147,7 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
                 &geometry,
                 shader,
                 matte,
+                matte && trackMatte->OutsideIsClear(),
                 &table,
                 &target,
                 reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),

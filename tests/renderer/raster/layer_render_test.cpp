@@ -160,25 +160,28 @@ TYPED_TEST(LayerRender, HalfOpacityHalvesCoverage) {
     EXPECT_EQ(got.red, Code<P>(255));
 }
 
-// Alpha only on the right half of the output: pixels left of it are untouched, and pixels
-// right of it show the texel they would show without a matte.
-class HalfMatte : public SY_TImageFetcher {
+// A matte the test holds; outside it the layer is hidden unless the matte is an inverted one.
+class WorldMatte : public SY_TImageFetcher {
 public:
-    explicit HalfMatte(PF_World* world) : world_(world) {}
+    explicit WorldMatte(PF_World* world, bool outsideIsClear = true)
+        : world_(world), outsideIsClear_(outsideIsClear) {}
     PF_World* Fetch() override {
         ++fetches;
         return world_;
     }
     void Release() override { ++releases; }
-    bool OutsideIsClear() const override { return true; }
+    bool OutsideIsClear() const override { return outsideIsClear_; }
 
     int32_t fetches = 0;
     int32_t releases = 0;
 
 private:
     PF_World* world_;
+    bool outsideIsClear_;
 };
 
+// Alpha only on the right half of the output: pixels left of it are untouched, and pixels
+// right of it show the texel they would show without a matte.
 TYPED_TEST(LayerRender, ZeroMatteAlphaDrawsNothingAndKeepsTheRowInStep) {
     using P = TypeParam;
     auto texture = PatternTexture<P>(kTexW, kTexH);
@@ -190,8 +193,8 @@ TYPED_TEST(LayerRender, ZeroMatteAlphaDrawsNothingAndKeepsTheRowInStep) {
     }
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0));
-    auto owned = std::make_unique<HalfMatte>(&matte);
-    HalfMatte* fetcher = owned.get();
+    auto owned = std::make_unique<WorldMatte>(&matte);
+    WorldMatte* fetcher = owned.get();
     layer.trackMatte = std::move(owned);
     PF_WorldX<P> destination(kWidth, kHeight);
     frame.Render(&destination);
@@ -206,6 +209,35 @@ TYPED_TEST(LayerRender, ZeroMatteAlphaDrawsNothingAndKeepsTheRowInStep) {
     }
     EXPECT_EQ(fetcher->fetches, 1);
     EXPECT_EQ(fetcher->releases, 1);
+}
+
+// A matte smaller than the output is read only where it has pixels: beyond it a plain matte
+// hides the layer and an inverted one shows it, whether the layer is drawn through its
+// projection or from its image.
+TYPED_TEST(LayerRender, MatteSmallerThanTheOutputIsNeverReadPastItsEnd) {
+    using P = TypeParam;
+    constexpr int32_t kMatteW = 21, kMatteH = 13;
+    auto texture = PatternTexture<P>(kWidth, kHeight);
+    auto matte = raster_test::FilledWorld<P>(kMatteW, kMatteH, Opaque<P>(0, 0, 0));
+    for (bool unbounded : {false, true}) {
+        for (bool outsideIsClear : {true, false}) {
+            Frame frame(kWidth, kHeight, 1);
+            SY_LayerDesc& layer = frame.Layer(0, texture.get(), scene_test::Identity());
+            layer.unbounded = unbounded;
+            layer.trackMatte = std::make_unique<WorldMatte>(matte.get(), outsideIsClear);
+            PF_WorldX<P> destination(kWidth, kHeight);
+            frame.Render(&destination);
+            for (int32_t y = 0; y < kHeight; ++y) {
+                for (int32_t x = 0; x < kWidth; ++x) {
+                    bool shown = (x < kMatteW && y < kMatteH) || !outsideIsClear;
+                    const P& got = destination.At(x, y);
+                    ASSERT_TRUE(shown ? Equal(got, PatternTexel<P>(x, y)) : IsClear(got))
+                        << x << "," << y << " unbounded " << unbounded << " clear outside "
+                        << outsideIsClear;
+                }
+            }
+        }
+    }
 }
 
 TYPED_TEST(LayerRender, UnboundedLayerCoversTheOutput) {
