@@ -128,6 +128,20 @@ std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int
     }
 }
 
+std::shared_ptr<PF_World> ImageCache::SharedSource(const Layer& layer, int16_t bitDepth,
+                                                   int32_t downsampleX, int32_t downsampleY) {
+    SourceKey key{&layer, bitDepth, downsampleX, downsampleY};
+    {
+        std::lock_guard lock(mutex_);
+        if (auto found = sources_.find(key); found != sources_.end()) return found->second;
+    }
+    // Made outside the lock, which decoding the image takes; a thread that lost the race to
+    // make it uses the one that won.
+    std::shared_ptr<PF_World> made = LayerSource(*this, layer, bitDepth, downsampleX, downsampleY);
+    std::lock_guard lock(mutex_);
+    return sources_.emplace(key, std::move(made)).first->second;
+}
+
 std::unique_ptr<PF_World> SolidPixels(const Color& color, int16_t bitDepth, int32_t width,
                                       int32_t height) {
     switch (bitDepth) {

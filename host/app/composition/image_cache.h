@@ -3,9 +3,11 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <string>
+#include <tuple>
 #include <unordered_map>
 
 #include "composition/composition.h"
@@ -22,9 +24,19 @@ public:
     std::shared_ptr<const DecodedImage> Get(const std::filesystem::path& file);
     size_t Count() const;
 
+    // The layer's source pixels as LayerSource delivers them, made once per layer, depth and
+    // downsample and shared by every later frame: textures are read-only to the renderer, so
+    // those frames skip the conversion and keep what the renderer built on the world (its
+    // sampling tables). Throws as LayerSource does.
+    std::shared_ptr<PF_World> SharedSource(const Layer& layer, int16_t bitDepth,
+                                           int32_t downsampleX, int32_t downsampleY);
+
 private:
+    using SourceKey = std::tuple<const Layer*, int16_t, int32_t, int32_t>;
+
     mutable std::mutex mutex_;
     std::unordered_map<std::string, std::shared_ptr<const DecodedImage>> images_;
+    std::map<SourceKey, std::shared_ptr<PF_World>> sources_;
 };
 
 // The layer's source pixels at bitDepth (8, 16 or 32), straight colour, alpha first, reduced

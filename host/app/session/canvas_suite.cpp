@@ -146,17 +146,33 @@ int32_t IsLayerUnbounded(QNGP_RenderContextH context, QNGP_LayerContextH layerCo
 // Where delivered pixels lie: in the layer's own pixels at the downsample, or in output pixels.
 enum class Placement { kLayer, kOutput };
 
-// The layer's pixels at the frame's depth, timed as host work.
-std::unique_ptr<PF_World> DeliverPixels(FrameSession& session, int32_t layerIndex,
-                                        Placement placement) {
+// Host work that makes layer pixels, timed as such.
+template <class Make>
+auto Timed(FrameSession& session, Make make) {
     auto start = std::chrono::steady_clock::now();
-    std::unique_ptr<PF_World> world = placement == Placement::kOutput
-                                          ? session.OutputPixels(layerIndex)
-                                          : session.LayerPixels(layerIndex);
+    auto world = make();
     session.AddPixelDeliveryNanoseconds(std::chrono::duration_cast<std::chrono::nanoseconds>(
                                             std::chrono::steady_clock::now() - start)
                                             .count());
     return world;
+}
+
+// The layer's pixels at the frame's depth, in a world the caller owns.
+std::unique_ptr<PF_World> OwnedPixels(FrameSession& session, int32_t layerIndex,
+                                      Placement placement) {
+    return Timed(session, [&] {
+        return placement == Placement::kOutput ? session.OutputPixels(layerIndex)
+                                               : session.LayerPixels(layerIndex);
+    });
+}
+
+// The same, handed to the artisan until it disposes of it; layer pixels are shared across
+// frames.
+PF_World* HandedOutPixels(FrameSession& session, int32_t layerIndex, Placement placement) {
+    return session.HandOut(Timed(session, [&]() -> std::shared_ptr<PF_World> {
+        if (placement == Placement::kOutput) return session.OutputPixels(layerIndex);
+        return session.SharedLayerPixels(layerIndex);
+    }));
 }
 
 // A matte (mode 0) becomes the caller's to delete; a whole layer (mode 2) is handed back
@@ -171,9 +187,9 @@ int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerCo
         Placement placement =
             session.LayerAt(layer->index).source.unbounded ? Placement::kOutput : Placement::kLayer;
         if (mode == kQNGP_RenderMatte) {
-            *world = DeliverPixels(session, layer->index, placement).release();
+            *world = OwnedPixels(session, layer->index, placement).release();
         } else if (mode == kQNGP_RenderWholeLayer) {
-            *world = session.HandOut(DeliverPixels(session, layer->index, placement));
+            *world = HandedOutPixels(session, layer->index, placement);
         } else {
             return kErrBadArgument;
         }
@@ -192,8 +208,7 @@ int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerConte
         *world = nullptr;
         if (!Owns(session, layerContext)) return kErrBadHandle;
         M_SetIdentityMatrix(sourceMatrix);
-        *world =
-            session.HandOut(DeliverPixels(session, layerContext->layer->index, Placement::kLayer));
+        *world = HandedOutPixels(session, layerContext->layer->index, Placement::kLayer);
         return 0;
     });
 }

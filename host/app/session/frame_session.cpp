@@ -82,10 +82,7 @@ FrameSession::FrameSession(const Composition& comp, ImageCache& images,
     BeginPass(0);
 }
 
-FrameSession::~FrameSession() {
-    for (PF_World* world : handedOut_)
-        delete world;
-}
+FrameSession::~FrameSession() = default;
 
 int32_t FrameSession::PassCount() const {
     return settings_.fields == RenderSettings::Fields::kOff ? 1 : 2;
@@ -134,18 +131,25 @@ std::unique_ptr<PF_World> FrameSession::OutputPixels(int32_t layerIndex) {
                        destination_->height);
 }
 
-PF_World* FrameSession::HandOut(std::unique_ptr<PF_World> world) {
+std::shared_ptr<PF_World> FrameSession::SharedLayerPixels(int32_t layerIndex) {
+    return images_.SharedSource(LayerAt(layerIndex), bitDepth_, settings_.downsampleX,
+                                settings_.downsampleY);
+}
+
+PF_World* FrameSession::HandOut(std::shared_ptr<PF_World> world) {
+    PF_World* handle = world.get();
     std::lock_guard lock(mutex_);
-    handedOut_.insert(world.get());
-    return world.release();
+    handedOut_.emplace(handle, std::move(world));
+    return handle;
 }
 
 bool FrameSession::TakeBack(PF_World* world) {
-    {
-        std::lock_guard lock(mutex_);
-        if (!handedOut_.erase(world)) return false;
-    }
-    delete world;
+    std::shared_ptr<PF_World> last;  // let go outside the lock
+    std::lock_guard lock(mutex_);
+    auto found = handedOut_.find(world);
+    if (found == handedOut_.end()) return false;
+    last = std::move(found->second);
+    handedOut_.erase(found);
     return true;
 }
 

@@ -5,10 +5,10 @@
 
 #include <atomic>
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <optional>
-#include <set>
 #include <string>
 #include <vector>
 
@@ -113,9 +113,12 @@ public:
     // size and depth, every pixel the solid's colour, so that output pixel (x, y) reads pixel
     // (x, y) whatever the region and downsample.
     std::unique_ptr<PF_World> OutputPixels(int32_t layerIndex);
+    // The layer's pixels as LayerPixels gives them, shared with other frames of the run: for
+    // worlds the artisan only reads.
+    std::shared_ptr<PF_World> SharedLayerPixels(int32_t layerIndex);
     // Keeps a world handed to the artisan until TakeBack; safe from any thread.
-    PF_World* HandOut(std::unique_ptr<PF_World> world);
-    // Deletes a world handed out; false when it is not one of them.
+    PF_World* HandOut(std::shared_ptr<PF_World> world);
+    // Lets go of a world handed out; false when it is not one of them.
     bool TakeBack(PF_World* world);
 
     // The frame's colour settings as "PF Color Settings Suite" reports them.
@@ -154,7 +157,7 @@ private:
     std::unique_ptr<PF_LinearBlendingTables> blending_;
 
     mutable std::mutex mutex_;  // guards what the artisan's threads reach: textures, failure
-    std::set<PF_World*> handedOut_;
+    std::multimap<PF_World*, std::shared_ptr<PF_World>> handedOut_;
     std::string failure_;
     std::atomic<int64_t> pixelNanoseconds_{0};
     FrameProgress* progress_ = nullptr;

@@ -191,6 +191,32 @@ TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
     EXPECT_EQ(U_AccountedBytes(), startBytes);
 }
 
+// Frames of one run share each layer's texture, made once.
+TEST(CanvasSuite, TexturesAreSharedAcrossTheFramesOfARun) {
+    int64_t startBytes = U_AccountedBytes();
+    {
+        HostSuites suites;
+        Composition comp = ParseComposition(CompJson(kSettings, kLayers), "test.json");
+        ImageCache images;
+        const QNGP_CanvasSuite13& canvas = *CanvasSuite();
+        // Both frames hold the texture at once: without sharing they would hold two worlds.
+        FrameSession first(comp, images, {}, 0), second(comp, images, {}, 1);
+        PF_World* textures[2] = {};
+        FrameSession* sessions[2] = {&first, &second};
+        for (int32_t frame = 0; frame < 2; ++frame) {
+            QNGP_RenderContextH render = sessions[frame]->RenderContext();
+            QNGP_LayerContextH card = nullptr;
+            ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &card), 0);
+            M_Matrix3 source{};
+            ASSERT_EQ(
+                canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &textures[frame]),
+                0);
+        }
+        EXPECT_EQ(textures[1], textures[0]);
+    }
+    EXPECT_EQ(U_AccountedBytes(), startBytes);
+}
+
 // Top to bottom: an unbounded white veil that serves as the card's matte, the card, and an
 // unbounded wall behind it.
 const std::string kBackdrop = R"(
