@@ -27,7 +27,7 @@ P Sample(Filter filter, const PF_World& world, double x, double y, double radius
     pb.xRadius = pb.yRadius = static_cast<int32_t>(std::lround(radius * kOne));
     auto fx = static_cast<int32_t>(std::lround(x * kOne));
     auto fy = static_cast<int32_t>(std::lround(y * kOne));
-    P out;
+    P out{};
     switch (filter) {
         case Filter::kBilinear:
             PF_SubpixelBilinear(fx, fy, pb, &out);
