@@ -122,14 +122,26 @@ inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* ou
     P copy[4];
     const P* rows[2];
     TexelBlock<P, 2>(*pb.src, x >> 16, y >> 16, copy, rows);
-    PF_Float4 f = LinearWeights(x, y);
-    PF_Float4 weights =
-        __builtin_shufflevector(f, f, 0, 1, 0, 1) * __builtin_shufflevector(f, f, 2, 2, 3, 3);
-    PF_Planes t = PF_LoadPlanes(rows[0], rows[1]);
-    PF_Float4 wa = weights * t.alpha;
-    // The weights sum to 65536².
-    PF_StorePremultiplied(PF_SumLanes(wa, wa * t.red, wa * t.green, wa * t.blue), out,
-                          1.0f / 4294967296.0f);
+    if constexpr (PF_PixelTraits<P>::kIsFloat) {
+        // Float texels need no conversion, and interpolating them premultiplied one by one
+        // takes fewer shuffles than gathering them into planes.
+        PF_Float4 fx = PF_Float4{} + static_cast<float>(x & 0xFFFF) * kFixedToTexels;
+        PF_Float4 fy = PF_Float4{} + static_cast<float>(y & 0xFFFF) * kFixedToTexels;
+        PF_Float4 t00 = PF_LoadPremultiplied(rows[0][0]), t01 = PF_LoadPremultiplied(rows[0][1]);
+        PF_Float4 t10 = PF_LoadPremultiplied(rows[1][0]), t11 = PF_LoadPremultiplied(rows[1][1]);
+        PF_Float4 top = t00 + (t01 - t00) * fx;
+        PF_Float4 bottom = t10 + (t11 - t10) * fx;
+        PF_StorePremultiplied(top + (bottom - top) * fy, out);
+    } else {
+        PF_Float4 f = LinearWeights(x, y);
+        PF_Float4 weights =
+            __builtin_shufflevector(f, f, 0, 1, 0, 1) * __builtin_shufflevector(f, f, 2, 2, 3, 3);
+        PF_Planes t = PF_LoadPlanes(rows[0], rows[1]);
+        PF_Float4 wa = weights * t.alpha;
+        // The weights sum to 65536².
+        PF_StorePremultiplied(PF_SumLanes(wa, wa * t.red, wa * t.green, wa * t.blue), out,
+                              4294967296.0f);
+    }
 }
 
 // Bicubic (Catmull-Rom) sample at (x, y).
@@ -187,7 +199,7 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     }
     float area =
         4.0f * static_cast<float>(rx) * static_cast<float>(ry) * (kFixedToTexels * kFixedToTexels);
-    PF_StorePremultiplied(sum, out, 1.0f / area);
+    PF_StorePremultiplied(sum, out, area);
 }
 
 // The host's entry points, by the names the renderer calls. progress is not used (pass null).

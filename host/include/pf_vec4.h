@@ -30,6 +30,18 @@ inline PF_Float4 PF_LoadFloat4(const PF_PixelFloat& p) {
     return _mm_loadu_ps(&p.alpha);
 }
 
+// (1, v0, v0, v0): the factors that premultiply.
+inline PF_Float4 PF_AlphaFactors(PF_Float4 v) {
+    return _mm_move_ss(_mm_shuffle_ps(v, v, 0), _mm_set_ss(1.0f));
+}
+
+// A texel in premultiplied form: (alpha, alpha × colour) in channel units.
+template <class P>
+inline PF_Float4 PF_LoadPremultiplied(const P& p) {
+    PF_Float4 v = PF_LoadFloat4(p);
+    return v * PF_AlphaFactors(v);
+}
+
 // Four texels as channel planes: one vector per channel, one lane per texel, in the order
 // first[0], first[1], second[0], second[1]. Filters weight whole planes at once, which costs
 // fewer instructions than weighting texel by texel.
@@ -95,20 +107,19 @@ inline void PF_StoreChannels(PF_Float4 c, P* out) {
 }
 
 // Writes a premultiplied value (alpha, alpha × colour in channel units) as a straight pixel,
-// its alpha scaled by alphaScale (colour is a ratio: the scale does not change it). Integer
-// channels are rounded and kept in range; float alpha is kept in 0..1 and float colour keeps
-// its extended range. A pixel without alpha is transparent black.
+// its alpha divided by alphaDivisor (colour is a ratio: the divisor does not change it).
+// Integer channels are rounded and kept in range; float alpha is kept in 0..1 and float colour
+// keeps its extended range. A pixel without alpha is transparent black.
 template <class P>
-inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaScale = 1.0f) {
+inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaDivisor = 1.0f) {
     using Traits = PF_PixelTraits<P>;
-    float a = v[0] * alphaScale;
     constexpr float kMinAlpha = Traits::kIsFloat ? 0.0f : 0.5f;
-    if (!(a > kMinAlpha)) {
+    if (!(v[0] > kMinAlpha * alphaDivisor)) {
         *out = P{};
         return;
     }
-    // One division by (1/alphaScale, alpha, alpha, alpha) gives alpha and the colour.
-    PF_Float4 c = v / _mm_move_ss(_mm_shuffle_ps(v, v, 0), _mm_set_ss(1.0f / alphaScale));
-    if constexpr (Traits::kIsFloat) c[0] = a < 1.0f ? a : 1.0f;
+    // One division by (alphaDivisor, alpha, alpha, alpha) gives alpha and the colour.
+    PF_Float4 c = v / _mm_move_ss(_mm_shuffle_ps(v, v, 0), _mm_set_ss(alphaDivisor));
+    if constexpr (Traits::kIsFloat) c[0] = c[0] < 1.0f ? c[0] : 1.0f;
     PF_StoreChannels(c, out);
 }
