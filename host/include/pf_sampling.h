@@ -70,8 +70,9 @@ template <class P, int n>
 inline void TexelBlock(const PF_World& w, int32_t x, int32_t y, P (&copy)[n * n],
                        const P* (&rows)[n]) {
     if (x >= 0 && y >= 0 && x + n <= w.width && y + n <= w.height) {
+        const char* first = reinterpret_cast<const char*>(w.PixelAt<P>(x, y));
         for (int j = 0; j < n; ++j)
-            rows[j] = w.PixelAt<P>(x, y + j);
+            rows[j] = reinterpret_cast<const P*>(first + j * static_cast<ptrdiff_t>(w.rowBytes));
     } else {
         for (int j = 0; j < n; ++j) {
             for (int i = 0; i < n; ++i)
@@ -85,13 +86,12 @@ inline void TexelBlock(const PF_World& w, int32_t x, int32_t y, P (&copy)[n * n]
 // whole numbers, so that a texel centre gets the weight 65536 exactly. Worked out in integers,
 // which keeps the weights' latency below the texels'.
 inline PF_Float4 LinearWeights(int32_t x, int32_t y) {
-    __m128i xy = _mm_cvtsi64_si128(static_cast<int64_t>(static_cast<uint32_t>(x)) |
-                                   static_cast<int64_t>(static_cast<uint64_t>(y) << 32));
-    __m128i fractions =
-        _mm_and_si128(_mm_shuffle_epi32(xy, _MM_SHUFFLE(1, 1, 0, 0)), _mm_set1_epi32(0xFFFF));
-    // |65536 − f| and |0 − f|
+    __m128i xy = _mm_cvtsi64_si128(static_cast<int64_t>(static_cast<uint16_t>(x)) |
+                                   static_cast<int64_t>(static_cast<uint16_t>(y)) << 32);
+    __m128i fractions = _mm_shuffle_epi32(xy, _MM_SHUFFLE(1, 1, 0, 0));
+    // |f − 65536| and |f − 0|
     return _mm_cvtepi32_ps(
-        _mm_abs_epi32(_mm_sub_epi32(_mm_setr_epi32(65536, 0, 65536, 0), fractions)));
+        _mm_abs_epi32(_mm_sub_epi32(fractions, _mm_setr_epi32(65536, 0, 65536, 0))));
 }
 
 // Catmull-Rom weights of the four taps around a fraction t: interpolating, so a texel centre

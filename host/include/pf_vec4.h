@@ -97,7 +97,8 @@ inline void PF_StoreChannels(PF_Float4 c, P* out) {
         c = _mm_min_ps(_mm_set1_ps(Traits::kMax), c);
         __m128i lanes = _mm_cvttps_epi32(c + 0.5f);
         if constexpr (Traits::kBitDepth == 8) {
-            __m128i bytes = _mm_packus_epi16(_mm_packs_epi32(lanes, lanes), lanes);
+            __m128i shorts = _mm_packs_epi32(lanes, lanes);
+            __m128i bytes = _mm_packus_epi16(shorts, shorts);
             int32_t packed = _mm_cvtsi128_si32(bytes);
             std::memcpy(out, &packed, sizeof packed);
         } else {
@@ -119,7 +120,8 @@ inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaDivisor = 1.0f
         return;
     }
     // One division by (alphaDivisor, alpha, alpha, alpha) gives alpha and the colour.
-    PF_Float4 c = v / _mm_move_ss(_mm_shuffle_ps(v, v, 0), _mm_set_ss(alphaDivisor));
+    PF_Float4 alpha = _mm_castsi128_ps(_mm_shuffle_epi32(_mm_castps_si128(v), 0));
+    PF_Float4 c = v / _mm_move_ss(alpha, _mm_set_ss(alphaDivisor));
     if constexpr (Traits::kIsFloat) c[0] = c[0] < 1.0f ? c[0] : 1.0f;
     PF_StoreChannels(c, out);
 }
