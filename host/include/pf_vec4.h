@@ -114,8 +114,9 @@ inline void PF_StoreChannels(PF_Float4 c, P* out) {
 template <class P>
 inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaDivisor = 1.0f) {
     using Traits = PF_PixelTraits<P>;
-    constexpr float kMinAlpha = Traits::kIsFloat ? 0.0f : 0.5f;
-    if (!(v[0] > kMinAlpha * alphaDivisor)) {
+    // Integer alpha that rounds to 0 is clear too.
+    float minAlpha = Traits::kIsFloat ? 0.0f : 0.5f * alphaDivisor;
+    if (!(v[0] > minAlpha)) {
         *out = P{};
         return;
     }
