@@ -55,80 +55,116 @@ inline constexpr float kFixedToTexels = 1.0f / 65536.0f;
 // box that size stay exact.
 inline constexpr int32_t kMaxAreaRadius = 100 << 16;
 
+// The texel at (x, y), or transparent outside the texture.
 template <class P>
-inline const P& Texel(const PF_World& w, int32_t x, int32_t y) {
+inline P TexelOrClear(const PF_World& w, int32_t x, int32_t y) {
+    if (static_cast<uint32_t>(x) >= static_cast<uint32_t>(w.width) ||
+        static_cast<uint32_t>(y) >= static_cast<uint32_t>(w.height))
+        return P{};
     return *w.PixelAt<P>(x, y);
 }
 
-// Texel (x, y) premultiplied, or transparent outside the texture.
-template <class P>
-inline PF_Float4 TexelOrClear(const PF_World& w, int32_t x, int32_t y) {
-    if (static_cast<uint32_t>(x) >= static_cast<uint32_t>(w.width) ||
-        static_cast<uint32_t>(y) >= static_cast<uint32_t>(w.height))
-        return PF_Float4{0.0f, 0.0f, 0.0f, 0.0f};
-    return PF_LoadPremultiplied(Texel<P>(w, x, y));
+// The n × n texels from (x, y): rows[j] points at row j's texels, in the texture when the
+// block lies inside it, otherwise in copy, with transparent texels for those outside.
+template <class P, int n>
+inline void TexelBlock(const PF_World& w, int32_t x, int32_t y, P (&copy)[n * n],
+                       const P* (&rows)[n]) {
+    if (x >= 0 && y >= 0 && x + n <= w.width && y + n <= w.height) {
+        const char* first = reinterpret_cast<const char*>(w.PixelAt<P>(x, y));
+        for (int j = 0; j < n; ++j)
+            rows[j] = reinterpret_cast<const P*>(first + j * static_cast<ptrdiff_t>(w.rowBytes));
+    } else {
+        for (int j = 0; j < n; ++j) {
+            for (int i = 0; i < n; ++i)
+                copy[j * n + i] = TexelOrClear<P>(w, x + i, y + j);
+            rows[j] = copy + j * n;
+        }
+    }
+}
+
+// The weights (1 − f, f) of the fractions of x and y, as (65536 − fx, fx, 65536 − fy, fy):
+// whole numbers, so that a texel centre gets the weight 65536 exactly. Worked out in integers,
+// which keeps the weights' latency below the texels'.
+inline PF_Float4 LinearWeights(int32_t x, int32_t y) {
+    __m128i xy = _mm_cvtsi64_si128(static_cast<int64_t>(static_cast<uint16_t>(x)) |
+                                   static_cast<int64_t>(static_cast<uint16_t>(y)) << 32);
+    __m128i fractions = _mm_shuffle_epi32(xy, _MM_SHUFFLE(1, 1, 0, 0));
+    // |f − 65536| and |f − 0|
+    return _mm_cvtepi32_ps(
+        _mm_abs_epi32(_mm_sub_epi32(fractions, _mm_setr_epi32(65536, 0, 65536, 0))));
 }
 
 // Catmull-Rom weights of the four taps around a fraction t: interpolating, so a texel centre
-// returns the texel itself.
-inline void CubicWeights(float t, float w[4]) {
-    w[0] = ((-0.5f * t + 1.0f) * t - 0.5f) * t;
-    w[1] = (1.5f * t - 2.5f) * t * t + 1.0f;
-    w[2] = ((-1.5f * t + 2.0f) * t + 0.5f) * t;
-    w[3] = (0.5f * t - 0.5f) * t * t;
+// returns the texel itself. Lane i holds tap i's cubic, evaluated by Horner's rule.
+inline PF_Float4 CubicWeights(float t) {
+    PF_Float4 v = {t, t, t, t};
+    return ((PF_Float4{-0.5f, 1.5f, -1.5f, 0.5f} * v + PF_Float4{1.0f, -2.5f, 2.0f, -0.5f}) * v +
+            PF_Float4{-0.5f, 0.0f, 0.5f, 0.0f}) *
+               v +
+           PF_Float4{0.0f, 1.0f, 0.0f, 0.0f};
+}
+
+template <int i>
+inline PF_Float4 Broadcast(PF_Float4 v) {
+    return __builtin_shufflevector(v, v, i, i, i, i);
 }
 
 }  // namespace pf_sampling
+
+// Both filters weight each texel's premultiplied value: with w the filter weight and a the
+// texel's alpha, the sample's alpha is Σ w·a and its colour Σ w·a·c / Σ w·a. So the texels'
+// alphas are folded into the weights first, and colour planes are multiplied only once.
 
 // Bilinear sample at (x, y).
 template <class P>
 inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     using namespace pf_sampling;
-    const PF_World& w = *pb.src;
-    int32_t ix = x >> 16, iy = y >> 16;
-    float fx = static_cast<float>(x & 0xFFFF) * kFixedToTexels;
-    float fy = static_cast<float>(y & 0xFFFF) * kFixedToTexels;
-    PF_Float4 t0[2], t1[2];  // rows iy and iy + 1
-    if (ix >= 0 && iy >= 0 && ix + 1 < w.width && iy + 1 < w.height) {
-        PF_LoadPremultipliedRow<2>(w.PixelAt<P>(ix, iy), t0);
-        PF_LoadPremultipliedRow<2>(w.PixelAt<P>(ix, iy + 1), t1);
+    P copy[4];
+    const P* rows[2];
+    TexelBlock<P, 2>(*pb.src, x >> 16, y >> 16, copy, rows);
+    if constexpr (PF_PixelTraits<P>::kIsFloat) {
+        // Float texels need no conversion, and interpolating them premultiplied one by one
+        // takes fewer shuffles than gathering them into planes.
+        PF_Float4 fx = PF_Float4{} + static_cast<float>(x & 0xFFFF) * kFixedToTexels;
+        PF_Float4 fy = PF_Float4{} + static_cast<float>(y & 0xFFFF) * kFixedToTexels;
+        PF_Float4 t00 = PF_LoadPremultiplied(rows[0][0]), t01 = PF_LoadPremultiplied(rows[0][1]);
+        PF_Float4 t10 = PF_LoadPremultiplied(rows[1][0]), t11 = PF_LoadPremultiplied(rows[1][1]);
+        PF_Float4 top = t00 + (t01 - t00) * fx;
+        PF_Float4 bottom = t10 + (t11 - t10) * fx;
+        PF_StorePremultiplied(top + (bottom - top) * fy, out);
     } else {
-        for (int i = 0; i < 2; ++i) {
-            t0[i] = TexelOrClear<P>(w, ix + i, iy);
-            t1[i] = TexelOrClear<P>(w, ix + i, iy + 1);
-        }
+        PF_Float4 f = LinearWeights(x, y);
+        PF_Float4 weights =
+            __builtin_shufflevector(f, f, 0, 1, 0, 1) * __builtin_shufflevector(f, f, 2, 2, 3, 3);
+        PF_Planes t = PF_LoadPlanes(rows[0], rows[1]);
+        PF_Float4 wa = weights * t.alpha;
+        // The weights sum to 65536².
+        PF_StorePremultiplied(PF_SumLanes(wa, wa * t.red, wa * t.green, wa * t.blue), out,
+                              4294967296.0f);
     }
-    PF_Float4 top = t0[0] + (t0[1] - t0[0]) * fx;
-    PF_Float4 bottom = t1[0] + (t1[1] - t1[0]) * fx;
-    PF_StorePremultiplied(top + (bottom - top) * fy, out);
 }
 
 // Bicubic (Catmull-Rom) sample at (x, y).
 template <class P>
 inline void PF_SubpixelBicubic(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     using namespace pf_sampling;
-    const PF_World& w = *pb.src;
-    int32_t ix = (x >> 16) - 1, iy = (y >> 16) - 1;
-    float wx[4], wy[4];
-    CubicWeights(static_cast<float>(x & 0xFFFF) * kFixedToTexels, wx);
-    CubicWeights(static_cast<float>(y & 0xFFFF) * kFixedToTexels, wy);
-    // Sums are taken in pairs so that few additions wait on each other.
-    PF_Float4 rows[4];
-    if (ix >= 0 && iy >= 0 && ix + 3 < w.width && iy + 3 < w.height) {
-        for (int j = 0; j < 4; ++j) {
-            PF_Float4 t[4];
-            PF_LoadPremultipliedRow<4>(w.PixelAt<P>(ix, iy + j), t);
-            rows[j] = (t[0] * wx[0] + t[1] * wx[1]) + (t[2] * wx[2] + t[3] * wx[3]);
-        }
-    } else {
-        for (int j = 0; j < 4; ++j) {
-            rows[j] = PF_Float4{0.0f, 0.0f, 0.0f, 0.0f};
-            for (int i = 0; i < 4; ++i)
-                rows[j] += TexelOrClear<P>(w, ix + i, iy + j) * wx[i];
-        }
+    P copy[16];
+    const P* rows[4];
+    TexelBlock<P, 4>(*pb.src, (x >> 16) - 1, (y >> 16) - 1, copy, rows);
+    PF_Float4 wx = CubicWeights(static_cast<float>(x & 0xFFFF) * kFixedToTexels);
+    PF_Float4 wy = CubicWeights(static_cast<float>(y & 0xFFFF) * kFixedToTexels);
+    PF_Float4 rowWeights[4] = {wx * Broadcast<0>(wy), wx * Broadcast<1>(wy), wx * Broadcast<2>(wy),
+                               wx * Broadcast<3>(wy)};
+    PF_Float4 sums[4] = {};
+    for (int j = 0; j < 4; ++j) {
+        PF_Planes t = PF_LoadPlanes(rows[j], rows[j] + 2);
+        PF_Float4 wa = rowWeights[j] * t.alpha;
+        sums[0] += wa;
+        sums[1] += wa * t.red;
+        sums[2] += wa * t.green;
+        sums[3] += wa * t.blue;
     }
-    PF_StorePremultiplied((rows[0] * wy[0] + rows[1] * wy[1]) + (rows[2] * wy[2] + rows[3] * wy[3]),
-                          out);
+    PF_StorePremultiplied(PF_SumLanes(sums[0], sums[1], sums[2], sums[3]), out);
 }
 
 // Box average of the texels over [x − xRadius, x + xRadius] × [y − yRadius, y + yRadius], texel
@@ -163,7 +199,7 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     }
     float area =
         4.0f * static_cast<float>(rx) * static_cast<float>(ry) * (kFixedToTexels * kFixedToTexels);
-    PF_StorePremultiplied(sum, out, 1.0f / area);
+    PF_StorePremultiplied(sum, out, area);
 }
 
 // The host's entry points, by the names the renderer calls. progress is not used (pass null).
