@@ -2,6 +2,7 @@
 // shadow map sizes, transfer modes and quality.
 #include <gtest/gtest.h>
 
+#include <tuple>
 #include <vector>
 
 #include "camera_capture.h"
@@ -42,9 +43,8 @@ TEST(CameraPair, DefaultCameraLooksAtTheCompCentreFromItsDistance) {
     M_Matrix4 placement, projection;
     EXPECT_EQ(ORM_CameraPair(view, nullptr, 0, &placement, &projection), 200);
     // Eye at (aspect × width / 2, height / 2, −distance), axes as the world's.
-    EXPECT_EQ(placement.mat[3][0], 100);
-    EXPECT_EQ(placement.mat[3][1], 25);
-    EXPECT_EQ(placement.mat[3][2], -200);
+    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
+              std::tuple(100, 25, -200));
     EXPECT_EQ(placement.mat[0][0], 1);
     EXPECT_NE(projection.mat[2][3], 0);
     // On the image plane one eye unit across is half a (wide) pixel.
@@ -92,9 +92,8 @@ TEST(CameraPair, CameraLayerPlacesTheEyeAndItsZoomProjects) {
     EXPECT_EQ(ORM_CameraPair(view, &cameraToWorld, 400, &placement, &projection), 400);
     // The layer's transform, then stretched by the pixel aspect.
     EXPECT_EQ(placement.mat[0][0], 2);
-    EXPECT_EQ(placement.mat[3][0], 14);
-    EXPECT_EQ(placement.mat[3][1], 8);
-    EXPECT_EQ(placement.mat[3][2], -300);
+    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
+              std::tuple(14, 8, -300));
     ScreenPoint p = Screen(projection, 20, 10, 400);
     EXPECT_DOUBLE_EQ(p.x, 60);
     EXPECT_DOUBLE_EQ(p.y, 35);
