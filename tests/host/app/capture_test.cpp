@@ -287,29 +287,20 @@ TEST_F(Capture, QualityAndShadowSwitches) {
     SY_SceneDesc scene;
     Assemble(frame, &scene);
     ASSERT_EQ(scene.layers.Count(), 4);
-    struct Expected {
-        bool renders, wireframe, castsShadows;
-        uint8_t acceptsShadows;
-        bool acceptsLights, bestQuality;
-        uint8_t mode;
-    };
-    const Expected kExpected[] = {
+    // Renders, wireframe, casts shadows, accepts shadows, accepts lights, best quality, mode.
+    using Switches = std::tuple<bool, bool, bool, int, bool, bool, int>;
+    const Switches kExpected[] = {
         {false, true, false, 0, false, false, 2},        // wireframe: no light, no shadow
         {false, false, true, 1, true, true, 2},          // casts shadows only: not drawn
         {true, false, false, 2, false, true, 5},         // accepts shadows only: mode 5, no lights
         {true, false, false, 1, false, true, 2 | 0x80},  // keeps the alpha below
     };
     for (int32_t i = 0; i < 4; ++i) {
-        SCOPED_TRACE(i);
         const SY_LayerDesc& l = scene.layers[i];
-        const Expected& e = kExpected[i];
-        EXPECT_EQ(l.renders, e.renders);
-        EXPECT_EQ(l.wireframe, e.wireframe);
-        EXPECT_EQ(l.castsShadows, e.castsShadows);
-        EXPECT_EQ(l.acceptsShadows, e.acceptsShadows);
-        EXPECT_EQ(l.acceptsLights, e.acceptsLights);
-        EXPECT_EQ(l.bestQuality, e.bestQuality);
-        EXPECT_EQ(l.mode, e.mode);
+        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
+                           l.acceptsLights, l.bestQuality, l.mode),
+                  kExpected[i])
+            << "layer " << i;
     }
 }
 
