@@ -161,34 +161,29 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
 }
 
 TEST(LayerQuality, QualityAndShadowStreamsSetTheSwitches) {
+    // Renders, wireframe, casts shadows, accepts shadows, accepts lights, best quality, mode.
+    using Switches = std::tuple<bool, bool, bool, int, bool, bool, int>;
     struct Case {
         const char* name;
         int16_t quality;
         ORM_ShadowStreams streams;
-        bool renders, wireframe, castsShadows;
-        uint8_t acceptsShadows;
-        bool acceptsLights, bestQuality;
-        uint8_t mode;
+        Switches switches;
     };
     const Case kCases[] = {
-        {"wireframe ignores the streams", 0, {1, 1, 1}, false, true, false, 0, false, false, 2},
-        {"draft, casting and accepting", 1, {1, 1, 1}, true, false, true, 1, true, false, 2},
-        {"best, neither", 2, {0, 0, 0}, true, false, false, 0, false, true, 2},
-        {"casts shadows only", 1, {2, 0, 1}, false, false, true, 0, true, false, 2},
-        {"accepts shadows only", 2, {0, 2, 1}, true, false, false, 2, false, true, 5},
-        {"accepts shadows truncated", 1, {0, 1.7, 1}, true, false, false, 1, true, false, 2},
+        {"wireframe ignores the streams", 0, {1, 1, 1}, {false, true, false, 0, false, false, 2}},
+        {"draft, casting and accepting", 1, {1, 1, 1}, {true, false, true, 1, true, false, 2}},
+        {"best, neither", 2, {0, 0, 0}, {true, false, false, 0, false, true, 2}},
+        {"casts shadows only", 1, {2, 0, 1}, {false, false, true, 0, true, false, 2}},
+        {"accepts shadows only", 2, {0, 2, 1}, {true, false, false, 2, false, true, 5}},
+        {"accepts shadows truncated", 1, {0, 1.7, 1}, {true, false, false, 1, true, false, 2}},
     };
     for (const Case& c : kCases) {
-        SCOPED_TRACE(c.name);
-        SY_LayerDesc layer;
-        ORM_ApplyQuality(c.quality, c.streams, &layer);
-        EXPECT_EQ(layer.renders, c.renders);
-        EXPECT_EQ(layer.wireframe, c.wireframe);
-        EXPECT_EQ(layer.castsShadows, c.castsShadows);
-        EXPECT_EQ(layer.acceptsShadows, c.acceptsShadows);
-        EXPECT_EQ(layer.acceptsLights, c.acceptsLights);
-        EXPECT_EQ(layer.bestQuality, c.bestQuality);
-        EXPECT_EQ(layer.mode, c.mode);
+        SY_LayerDesc l;
+        ORM_ApplyQuality(c.quality, c.streams, &l);
+        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
+                           l.acceptsLights, l.bestQuality, l.mode),
+                  c.switches)
+            << c.name;
     }
 }
 
