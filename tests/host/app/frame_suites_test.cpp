@@ -63,9 +63,11 @@ TEST(HostSuites, UnknownNamesAndVersionsFail) {
         EXPECT_EQ(basic->AcquireSuite(c.name, c.version, &suite),
                   c.served ? 0 : kQNGP_ErrMissingSuite);
         EXPECT_EQ(suite != nullptr, c.served);
-        if (c.served) {
-            EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), 0);
-        }
+        if (!c.served) continue;
+        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 1);
+        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), 0);
+        // Only what is held can be released.
+        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), kQNGP_ErrMissingSuite);
     }
     // Both versions of the Canvas and Comp suites are one table.
     const void* older = nullptr;
