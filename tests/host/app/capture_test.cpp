@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <tuple>
 
 #include "instance_options.h"
 #include "render_context.h"
@@ -56,6 +57,13 @@ protected:
     // Scene assembly of the frame, as the render entry runs it.
     static void Assemble(ServedFrame& frame, SY_SceneDesc* scene, int32_t shadowChoice = 0) {
         Frame(frame, shadowChoice).Assemble(scene);
+    }
+
+    // The whole frame as the host calls the plug-in for it.
+    static int32_t RenderThroughTheEntry(ServedFrame& frame) {
+        Options options(0);
+        return ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
+                          nullptr);
     }
 
     // The render context of a frame for as long as a test needs it, as the render entry makes it.
@@ -191,10 +199,8 @@ TEST_F(Capture, RegionAndDownsampleMoveAndShrinkTheScreen) {
     EXPECT_DOUBLE_EQ(scene.frameProjection.mat[3][1], 55);
     EXPECT_DOUBLE_EQ(scene.frameProjection.mat[0][0], 0.5);
     EXPECT_DOUBLE_EQ(scene.frameProjection.mat[1][1], 0.25);
-    EXPECT_EQ(scene.downsampleX, 2);
-    EXPECT_EQ(scene.downsampleY, 4);
-    EXPECT_EQ(scene.dof.downsampleX, 2);
-    EXPECT_EQ(scene.dof.downsampleY, 4);
+    EXPECT_EQ(std::tuple(scene.downsampleX, scene.downsampleY), std::tuple(2, 4));
+    EXPECT_EQ(std::tuple(scene.dof.downsampleX, scene.dof.downsampleY), std::tuple(2, 4));
 }
 
 // Top to bottom: two cards, a null, a light of the layers below, two more cards, a light that
@@ -211,33 +217,29 @@ const std::string kLitCards = R"(
 )";
 
 TEST_F(Capture, LightsReachOnlyTheLayersBelowWhenTheyAskForIt) {
-    ServedFrame frame(CompJson("", kLitCards));
-    SY_SceneDesc scene;
-    Assemble(frame, &scene);
-    EXPECT_TRUE(scene.lightsEnabled);
-    // The light that is off is not captured.
-    ASSERT_EQ(scene.lights.Count(), 1);
-    EXPECT_EQ(scene.lights[0].id, 3);
-    EXPECT_EQ(scene.lights[0].type, kSY_LightPoint);
-    ASSERT_EQ(scene.layers.Count(), 4);
-    const int32_t kCompIndex[] = {0, 1, 4, 5};
-    for (int32_t i = 0; i < 4; ++i) {
-        SCOPED_TRACE(i);
-        EXPECT_EQ(scene.layers[i].compIndex, kCompIndex[i]);
-        EXPECT_EQ(scene.layers[i].renderIndex, i);
-        EXPECT_EQ(scene.layers[i].lightIds,
-                  kCompIndex[i] > 3 ? std::vector<int32_t>{3} : std::vector<int32_t>{});
+    for (bool enabled : {true, false}) {
+        SCOPED_TRACE(enabled ? "lights on" : "lights switched off in the comp");
+        ServedFrame frame(CompJson(enabled ? "" : R"("lightsAndDepthOfField": false)", kLitCards));
+        SY_SceneDesc scene;
+        Assemble(frame, &scene);
+        EXPECT_EQ(scene.lightsEnabled, enabled);
+        // The light that is off is not captured.
+        ASSERT_EQ(scene.lights.Count(), enabled ? 1 : 0);
+        if (enabled) {
+            EXPECT_EQ(scene.lights[0].id, 3);
+            EXPECT_EQ(scene.lights[0].type, kSY_LightPoint);
+        }
+        ASSERT_EQ(scene.layers.Count(), 4);
+        const int32_t kCompIndex[] = {0, 1, 4, 5};
+        for (int32_t i = 0; i < 4; ++i) {
+            SCOPED_TRACE(i);
+            EXPECT_EQ(scene.layers[i].compIndex, kCompIndex[i]);
+            EXPECT_EQ(scene.layers[i].renderIndex, i);
+            EXPECT_EQ(scene.layers[i].lightIds, enabled && kCompIndex[i] > 3
+                                                    ? std::vector<int32_t>{3}
+                                                    : std::vector<int32_t>{});
+        }
     }
-}
-
-TEST_F(Capture, NoLightsWhenTheCompSwitchesThemOff) {
-    ServedFrame frame(CompJson(R"("lightsAndDepthOfField": false)", kLitCards));
-    SY_SceneDesc scene;
-    Assemble(frame, &scene);
-    EXPECT_FALSE(scene.lightsEnabled);
-    EXPECT_EQ(scene.lights.Count(), 0);
-    for (const SY_LayerDesc& layer : scene.layers)
-        EXPECT_TRUE(layer.lightIds.empty());
 }
 
 TEST_F(Capture, LightValuesComeFromTheMiddleSample) {
@@ -271,32 +273,6 @@ TEST_F(Capture, ShadowMapSizeFromTheOptions) {
     }
 }
 
-// The layer's transfer mode as a test sets it, for numbers composition files have no name for.
-int32_t gMode = 0;
-
-int32_t TestTransferMode(QNGP_LayerH, QNGP_LayerTransferMode* mode) {
-    *mode = {gMode, 0, 0};
-    return 0;
-}
-
-TEST_F(Capture, NormalModeVariantsArriveAsNormal) {
-    struct Case {
-        int32_t host;
-        uint8_t stored;
-    };
-    for (const Case& c : {Case{3, 2}, Case{17, 2}, Case{18, 2}, Case{2, 2}, Case{5, 5}}) {
-        SCOPED_TRACE(c.host);
-        ServedFrame frame(CompJson("", kMovingCard));
-        QNGP_LayerSuite10 layers = *LayerSuite();
-        layers.GetLayerTransferMode = &TestTransferMode;
-        ScopedSuite served(kQNGP_LayerSuite, 10, &layers);
-        gMode = c.host;
-        SY_SceneDesc scene;
-        Assemble(frame, &scene);
-        EXPECT_EQ(scene.layers[0].mode, c.stored);
-    }
-}
-
 TEST_F(Capture, QualityAndShadowSwitches) {
     const std::string layers = R"(
       {"name": "wire", "kind": "solid", "threeD": true, "quality": "wireframe",
@@ -311,29 +287,20 @@ TEST_F(Capture, QualityAndShadowSwitches) {
     SY_SceneDesc scene;
     Assemble(frame, &scene);
     ASSERT_EQ(scene.layers.Count(), 4);
-    struct Expected {
-        bool renders, wireframe, castsShadows;
-        uint8_t acceptsShadows;
-        bool acceptsLights, bestQuality;
-        uint8_t mode;
-    };
-    const Expected kExpected[] = {
+    // Renders, wireframe, casts shadows, accepts shadows, accepts lights, best quality, mode.
+    using Switches = std::tuple<bool, bool, bool, int, bool, bool, int>;
+    const Switches kExpected[] = {
         {false, true, false, 0, false, false, 2},        // wireframe: no light, no shadow
         {false, false, true, 1, true, true, 2},          // casts shadows only: not drawn
         {true, false, false, 2, false, true, 5},         // accepts shadows only: mode 5, no lights
         {true, false, false, 1, false, true, 2 | 0x80},  // keeps the alpha below
     };
     for (int32_t i = 0; i < 4; ++i) {
-        SCOPED_TRACE(i);
         const SY_LayerDesc& l = scene.layers[i];
-        const Expected& e = kExpected[i];
-        EXPECT_EQ(l.renders, e.renders);
-        EXPECT_EQ(l.wireframe, e.wireframe);
-        EXPECT_EQ(l.castsShadows, e.castsShadows);
-        EXPECT_EQ(l.acceptsShadows, e.acceptsShadows);
-        EXPECT_EQ(l.acceptsLights, e.acceptsLights);
-        EXPECT_EQ(l.bestQuality, e.bestQuality);
-        EXPECT_EQ(l.mode, e.mode);
+        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
+                           l.acceptsLights, l.bestQuality, l.mode),
+                  kExpected[i])
+            << "layer " << i;
     }
 }
 
@@ -355,8 +322,7 @@ TEST_F(Capture, TrackMatteFetchedFromTheMatteLayer) {
         ASSERT_NE(scene.layers[0].trackMatte, nullptr);
         PF_World* matte = scene.layers[0].trackMatte->Fetch();
         ASSERT_NE(matte, nullptr);
-        EXPECT_EQ(matte->width, 64);
-        EXPECT_EQ(matte->height, 32);
+        EXPECT_EQ(std::tuple(matte->width, matte->height), std::tuple(64, 32));
         // White under a luma matte is fully opaque.
         EXPECT_EQ(matte->Row<PF_Pixel8>(0)[0].alpha, 255);
         EXPECT_TRUE(scene.layers[0].trackMatte->OutsideIsClear());
@@ -397,10 +363,7 @@ TEST_F(Capture, AnUnboundedWallFillsEveryPixelTheCardLeaves) {
             EXPECT_FALSE(scene.layers[0].unbounded);
             EXPECT_TRUE(scene.layers[1].unbounded);
 
-            Options options(0);
-            ASSERT_EQ(ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
-                                 nullptr),
-                      0);
+            ASSERT_EQ(RenderThroughTheEntry(frame), 0);
             const PF_World& out = frame.Session().Destination();
             int64_t wrong = 0;
             for (int32_t y = 0; y < out.height; ++y) {
@@ -415,38 +378,33 @@ TEST_F(Capture, AnUnboundedWallFillsEveryPixelTheCardLeaves) {
     }
 }
 
-TEST_F(Capture, AFailedFrameLeaksNothing) {
-    const std::string layers = R"(
+TEST_F(Capture, FramesThroughTheEntryLeaveNothingBehind) {
+    const std::string kOdd = R"(
       {"name": "fine", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
       {"name": "odd", "kind": "solid", "threeD": true, "transferMode": "sparkle",
        "source": {"color": "#ffffff"}})";
-    int64_t startBytes = U_AccountedBytes();
-    int64_t startHandles = LiveMemoryHandles();
-    {
-        ServedFrame frame(CompJson(kBlur, layers), 3);
-        Options options(0);
-        EXPECT_EQ(
-            ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(), nullptr),
-            kErrHostFailure);
-        EXPECT_EQ(LockedMemoryHandles(), 0);
-        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
+    struct Case {
+        const char* name;
+        std::string layers;
+        int32_t frame, result;
+    };
+    const Case kCases[] = {
+        {"a frame that renders", kLitCards + "," + kMovingCard, 12, 0},
+        {"a frame that fails in capture", kOdd, 3, kErrHostFailure},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.name);
+        int64_t startBytes = U_AccountedBytes();
+        int64_t startHandles = LiveMemoryHandles();
+        {
+            ServedFrame frame(CompJson(kBlur, c.layers), c.frame);
+            EXPECT_EQ(RenderThroughTheEntry(frame), c.result);
+            EXPECT_EQ(LockedMemoryHandles(), 0);
+            EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
+        }
+        EXPECT_EQ(LiveMemoryHandles(), startHandles);
+        EXPECT_EQ(U_AccountedBytes(), startBytes);
     }
-    EXPECT_EQ(LiveMemoryHandles(), startHandles);
-    EXPECT_EQ(U_AccountedBytes(), startBytes);
-}
-
-TEST_F(Capture, AFrameRendersThroughTheEntry) {
-    int64_t startBytes = U_AccountedBytes();
-    {
-        ServedFrame frame(CompJson(kBlur, kLitCards + "," + kMovingCard), 12);
-        Options options(0);
-        EXPECT_EQ(
-            ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(), nullptr),
-            0);
-        EXPECT_EQ(LockedMemoryHandles(), 0);
-        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
-    }
-    EXPECT_EQ(U_AccountedBytes(), startBytes);
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <tuple>
 
 #include "composition/composition_loader.h"
 #include "test_files.h"
@@ -30,8 +31,7 @@ TEST(CompositionLoader, ReadsEveryCompSetting) {
         "lightsAndDepthOfField": false, "blending": {"linear": true, "gamma": 1.8},
         "rendererOptions": "00ff10"})",
                                         "good.json");
-    EXPECT_EQ(comp.width, 1920);
-    EXPECT_EQ(comp.height, 1080);
+    EXPECT_EQ(std::tuple(comp.width, comp.height), std::tuple(1920, 1080));
     EXPECT_DOUBLE_EQ(comp.pixelAspect, 0.9);
     EXPECT_EQ(comp.frameRate.numerator, 30000);
     EXPECT_EQ(comp.frameRate.denominator, 1001);

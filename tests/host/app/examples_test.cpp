@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <tuple>
 #include <vector>
 
 #include "composition/composition_loader.h"
@@ -25,8 +26,7 @@ TEST(Examples, CardsInPerspectiveLoadAndDeliverTheirImages) {
         auto world =
             LayerSource(cache, comp.layers[static_cast<size_t>(index)], comp.bitDepth, 1, 1);
         M_LRect bounds = SourceBounds(comp.layers[static_cast<size_t>(index)]);
-        EXPECT_EQ(world->width, bounds.right);
-        EXPECT_EQ(world->height, bounds.bottom);
+        EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(bounds.right, bounds.bottom));
     }
     EXPECT_EQ(cache.Count(), 2u);
 }

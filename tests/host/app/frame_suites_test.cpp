@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <optional>
+#include <tuple>
 
 #include "served_frame.h"
 #include "suites/suite_errors.h"
@@ -62,9 +63,11 @@ TEST(HostSuites, UnknownNamesAndVersionsFail) {
         EXPECT_EQ(basic->AcquireSuite(c.name, c.version, &suite),
                   c.served ? 0 : kQNGP_ErrMissingSuite);
         EXPECT_EQ(suite != nullptr, c.served);
-        if (c.served) {
-            EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), 0);
-        }
+        if (!c.served) continue;
+        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 1);
+        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), 0);
+        // Only what is held can be released.
+        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), kQNGP_ErrMissingSuite);
     }
     // Both versions of the Canvas and Comp suites are one table.
     const void* older = nullptr;
@@ -117,10 +120,8 @@ TEST(CanvasSuite, RenderOrderLayerContextsAndTheirValues) {
 
     QNGP_ShortRect bounds{};
     ASSERT_EQ(canvas.GetRenderLayerBounds(render, context, &time, &bounds), 0);
-    EXPECT_EQ(bounds.left, 0);
-    EXPECT_EQ(bounds.top, 0);
-    EXPECT_EQ(bounds.right, 200);
-    EXPECT_EQ(bounds.bottom, 100);
+    EXPECT_EQ(std::tuple(bounds.left, bounds.top, bounds.right, bounds.bottom),
+              std::tuple(0, 0, 200, 100));
     double opacity = 0;
     ASSERT_EQ(canvas.GetRenderOpacity(render, context, &time, &opacity), 0);
     EXPECT_DOUBLE_EQ(opacity, 0.4);
@@ -136,8 +137,7 @@ TEST(CanvasSuite, RenderOrderLayerContextsAndTheirValues) {
 
     int16_t dx = 0, dy = 0;
     ASSERT_EQ(canvas.GetDownsample(render, &dx, &dy), 0);
-    EXPECT_EQ(dx, 1);
-    EXPECT_EQ(dy, 1);
+    EXPECT_EQ(std::tuple(dx, dy), std::tuple(1, 1));
     int32_t fieldMode = -1;
     ASSERT_EQ(canvas.GetFieldRender(render, &fieldMode), 0);
     EXPECT_EQ(fieldMode, 0);
@@ -166,15 +166,13 @@ TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
         PF_World* world = nullptr;
         ASSERT_EQ(canvas.RenderLayer(render, matteLayer, matte, kQNGP_RenderMatte, &world), 0);
         std::unique_ptr<PF_World> owned(world);
-        EXPECT_EQ(world->width, 51);
-        EXPECT_EQ(world->height, 17);
+        EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(51, 17));
         EXPECT_EQ(world->bitDepth, 8);
         EXPECT_EQ(canvas.RenderLayer(render, matteLayer, matte, 7, &world), kErrBadArgument);
 
         M_Matrix3 source{};
         ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
-        EXPECT_EQ(world->width, 100);
-        EXPECT_EQ(world->height, 34);
+        EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(100, 34));
         for (int r = 0; r < 3; ++r) {
             for (int c = 0; c < 3; ++c)
                 EXPECT_EQ(source.mat[r][c], r == c ? 1.0 : 0.0);
@@ -265,30 +263,13 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
         int32_t textureWidth, textureHeight;  // the comp at the downsample
         Channels wall;                        // #336699, opaque
     };
+    const M_LRect kRegion{100, 50, 401, 250};
     const Case kCases[] = {
         {"8 bits", 8, 1, 1, std::nullopt, 960, 540, 960, 540, {255, 51, 102, 153}},
         // trunc(c × 32768 + 0.5) of 0.2, 0.4 and 0.6.
-        {"16 bits at a downsample of 2 × 3",
-         16,
-         2,
-         3,
-         std::nullopt,
-         480,
-         180,
-         480,
-         180,
-         {32768, 6554, 13107, 19661}},
+        {"16 bits, 2 × 3", 16, 2, 3, std::nullopt, 480, 180, 480, 180, {32768, 6554, 13107, 19661}},
         // The 301 × 200 region at half size: ceil(301 / 2) × 100.
-        {"float, a region at a downsample of 2 × 2",
-         32,
-         2,
-         2,
-         M_LRect{100, 50, 401, 250},
-         151,
-         100,
-         480,
-         270,
-         {1, 0.2f, 0.4f, 0.6f}},
+        {"float, region, 2 × 2", 32, 2, 2, kRegion, 151, 100, 480, 270, {1, 0.2f, 0.4f, 0.6f}},
     };
     const QNGP_CanvasSuite13& canvas = *CanvasSuite();
     for (const Case& c : kCases) {
@@ -311,8 +292,7 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             ASSERT_EQ(
                 canvas.RenderLayer(render, frame.Layer(2), wall, kQNGP_RenderWholeLayer, &world),
                 0);
-            EXPECT_EQ(world->width, c.width);
-            EXPECT_EQ(world->height, c.height);
+            EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(c.width, c.height));
             EXPECT_EQ(world->bitDepth, c.bitDepth);
             EXPECT_EQ(PixelsOtherThan(*world, c.wall), 0);
             EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
@@ -320,8 +300,8 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             // Textures (which frames do not ask for) cover the source rectangle.
             M_Matrix3 source{};
             ASSERT_EQ(canvas.RenderTexture(render, wall, 1, nullptr, nullptr, &source, &world), 0);
-            EXPECT_EQ(world->width, c.textureWidth);
-            EXPECT_EQ(world->height, c.textureHeight);
+            EXPECT_EQ(std::tuple(world->width, world->height),
+                      std::tuple(c.textureWidth, c.textureHeight));
             EXPECT_EQ(PixelsOtherThan(*world, c.wall), 0);
             EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
 
@@ -332,8 +312,7 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             ASSERT_EQ(canvas.RenderLayer(render, frame.Layer(0), veil, kQNGP_RenderMatte, &world),
                       0);
             std::unique_ptr<PF_World> matte(world);
-            EXPECT_EQ(matte->width, c.width);
-            EXPECT_EQ(matte->height, c.height);
+            EXPECT_EQ(std::tuple(matte->width, matte->height), std::tuple(c.width, c.height));
             double max = c.wall[0];
             EXPECT_EQ(PixelsOtherThan(*matte, {max, max, max, max}), 0);
         }
@@ -354,14 +333,12 @@ TEST(CanvasSuite, RegionDownsampleAndFieldsShapeTheFrame) {
     PF_World* destination = nullptr;
     EXPECT_EQ(canvas.GetCompDestination(render, nullptr, &destination), kErrBadHandle);
     ASSERT_EQ(canvas.GetCompDestination(render, frame.Comp(), &destination), 0);
-    EXPECT_EQ(destination->width, 151);  // ceil(301 / 2)
-    EXPECT_EQ(destination->height, 100);
+    EXPECT_EQ(std::tuple(destination->width, destination->height),
+              std::tuple(151, 100));  // ceil(301 / 2)
     QNGP_ShortRect region{};
     ASSERT_EQ(canvas.GetRegionOfInterest(render, &region), 0);
-    EXPECT_EQ(region.top, 50);
-    EXPECT_EQ(region.left, 100);
-    EXPECT_EQ(region.bottom, 250);
-    EXPECT_EQ(region.right, 401);
+    EXPECT_EQ(std::tuple(region.left, region.top, region.right, region.bottom),
+              std::tuple(100, 50, 401, 250));
 
     // Lower field first: odd rows at the frame's time, then even rows half a frame later.
     ASSERT_EQ(frame.Session().PassCount(), 2);
@@ -408,12 +385,10 @@ TEST(CompSuites, CompItemCameraAndLight) {
     ASSERT_EQ(CompSuite()->GetItemFromComp(frame.Comp(), &item), 0);
     QNGP_Ratio aspect{};
     ASSERT_EQ(ItemSuite()->GetItemPixelAspectRatio(item, &aspect), 0);
-    EXPECT_EQ(aspect.num, 9);
-    EXPECT_EQ(aspect.den, 10);
+    EXPECT_EQ(std::tuple(aspect.num, aspect.den), std::tuple(9, 10));
     int32_t width = 0, height = 0;
     ASSERT_EQ(ItemSuite()->GetItemDimensions(item, &width, &height), 0);
-    EXPECT_EQ(width, 960);
-    EXPECT_EQ(height, 540);
+    EXPECT_EQ(std::tuple(width, height), std::tuple(960, 540));
 
     T_Time now{0, 1};
     QNGP_LayerH camera = nullptr;
@@ -492,9 +467,8 @@ TEST(LayerSuite, EveryLayerOfTheComp) {
     EXPECT_EQ(quality, 1);
     QNGP_LayerTransferMode mode{};
     ASSERT_EQ(layers.GetLayerTransferMode(card, &mode), 0);
-    EXPECT_EQ(mode.mode, 2);
-    EXPECT_EQ(mode.flags, kQNGP_TransferPreserveAlpha);
-    EXPECT_EQ(mode.trackMatte, 4);
+    EXPECT_EQ(std::tuple(mode.mode, mode.flags, mode.trackMatte),
+              std::tuple(2, kQNGP_TransferPreserveAlpha, 4));
     QNGP_EngineLayer engine{};
     ASSERT_EQ(layers.GetEngineLayer(card, &engine), 0);
     EXPECT_TRUE(engine.isAVLayer);

@@ -9,6 +9,7 @@
 #include "composition/image_cache.h"
 #include "test_files.h"
 #include "u_memory.h"
+#include "world_pixels.h"
 
 namespace ostrel {
 namespace {
@@ -22,19 +23,6 @@ Layer ImageLayer(const std::filesystem::path& file, int32_t width, int32_t heigh
     return layer;
 }
 
-template <class P>
-P At(const PF_World& world, int32_t x, int32_t y) {
-    return *world.PixelAt<P>(x, y);
-}
-
-template <class P>
-void ExpectPixel(const P& actual, const P& expected) {
-    EXPECT_EQ(actual.alpha, expected.alpha);
-    EXPECT_EQ(actual.red, expected.red);
-    EXPECT_EQ(actual.green, expected.green);
-    EXPECT_EQ(actual.blue, expected.blue);
-}
-
 class ImageCacheTest : public ::testing::Test {
 protected:
     TempFolder folder_;
@@ -45,28 +33,26 @@ TEST_F(ImageCacheTest, EightBitFileAtEveryDepthKeepsStraightColour) {
     // A half-transparent orange pixel keeps its colour exactly: the file stores it straight.
     auto file = folder_.WriteImage<uint8_t>("straight.png", 2, 1, 4,
                                             {200, 100, 0, 128, 255, 255, 255, 255});
-    Layer layer = ImageLayer(file, 2, 1);
-
-    auto world8 = LayerSource(cache_, layer, 8, 1, 1);
-    ASSERT_EQ(world8->GetBitDepth(), 8);
-    ASSERT_EQ(world8->width, 2);
-    ExpectPixel(At<PF_Pixel8>(*world8, 0, 0), {128, 200, 100, 0});
-    ExpectPixel(At<PF_Pixel8>(*world8, 1, 0), {255, 255, 255, 255});
-
+    struct Case {
+        int16_t depth;
+        Channels orange, white;
+    };
     // 16 bits follow the host's exact 8-to-16 conversion, 255 becoming 32768.
-    auto world16 = LayerSource(cache_, layer, 16, 1, 1);
-    ASSERT_EQ(world16->GetBitDepth(), 16);
-    ExpectPixel(At<PF_Pixel16>(*world16, 0, 0), {PF_8To16(128), PF_8To16(200), PF_8To16(100), 0});
-    ExpectPixel(At<PF_Pixel16>(*world16, 1, 0), {32768, 32768, 32768, 32768});
-
-    auto worldFloat = LayerSource(cache_, layer, 32, 1, 1);
-    ASSERT_EQ(worldFloat->GetBitDepth(), 32);
-    PF_PixelFloat p = At<PF_PixelFloat>(*worldFloat, 0, 0);
-    EXPECT_FLOAT_EQ(p.alpha, 128 / 255.0f);
-    EXPECT_FLOAT_EQ(p.red, 200 / 255.0f);
-    EXPECT_FLOAT_EQ(p.green, 100 / 255.0f);
-    EXPECT_FLOAT_EQ(p.blue, 0.0f);
-
+    const Case kCases[] = {
+        {8, {128, 200, 100, 0}, {255, 255, 255, 255}},
+        {16, {PF_8To16(128), PF_8To16(200), PF_8To16(100), 0}, {32768, 32768, 32768, 32768}},
+        {32, {128 / 255.0f, 200 / 255.0f, 100 / 255.0f, 0}, {1, 1, 1, 1}},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.depth);
+        auto world = LayerSource(cache_, ImageLayer(file, 2, 1), c.depth, 1, 1);
+        ASSERT_EQ(world->GetBitDepth(), c.depth);
+        ASSERT_EQ(world->width, 2);
+        for (int i = 0; i < 4; ++i) {  // float within rounding, whole numbers exactly
+            EXPECT_NEAR(ChannelsAt(*world, 0, 0)[i], c.orange[i], 1e-6) << "channel " << i;
+            EXPECT_NEAR(ChannelsAt(*world, 1, 0)[i], c.white[i], 1e-6) << "channel " << i;
+        }
+    }
     // One decode served all three depths.
     EXPECT_EQ(cache_.Count(), 1u);
 }
@@ -76,24 +62,22 @@ TEST_F(ImageCacheTest, SixteenBitFileScalesToTheHostMaximum) {
     // channel means opaque.
     auto file = folder_.WriteImage<uint16_t>("deep.png", 1, 1, 3, {65535, 32768, 0});
     auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 16, 1, 1);
-    ExpectPixel(At<PF_Pixel16>(*world, 0, 0), {32768, 32768, 16384, 0});
+    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{32768, 32768, 16384, 0}));
 }
 
 TEST_F(ImageCacheTest, PremultipliedFloatFileBecomesStraight) {
     // EXR stores colour premultiplied: 0.25 under alpha 0.5 is 0.5 straight.
     auto file = folder_.WriteImage<float>("float.exr", 1, 1, 4, {0.25f, 0.1f, 0.0f, 0.5f});
     auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 32, 1, 1);
-    PF_PixelFloat p = At<PF_PixelFloat>(*world, 0, 0);
-    EXPECT_NEAR(p.alpha, 0.5f, 1e-3f);  // EXR keeps half floats by default
-    EXPECT_NEAR(p.red, 0.5f, 1e-3f);
-    EXPECT_NEAR(p.green, 0.2f, 1e-3f);
-    EXPECT_EQ(p.blue, 0.0f);
+    const Channels actual = ChannelsAt(*world, 0, 0), expected{0.5, 0.5, 0.2, 0};
+    for (int i = 0; i < 4; ++i)
+        EXPECT_NEAR(actual[i], expected[i], 1e-3);  // EXR keeps half floats by default
 }
 
 TEST_F(ImageCacheTest, GreyFileFillsAllThreeColours) {
     auto file = folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77});
     auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1);
-    ExpectPixel(At<PF_Pixel8>(*world, 0, 0), {255, 77, 77, 77});
+    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{255, 77, 77, 77}));
 }
 
 TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
@@ -106,8 +90,8 @@ TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
     auto world = LayerSource(cache_, ImageLayer(file, 3, 2), 8, 2, 2);
     ASSERT_EQ(world->width, 2);
     ASSERT_EQ(world->height, 1);
-    ExpectPixel(At<PF_Pixel8>(*world, 0, 0), {128, 128, 0, 128});
-    ExpectPixel(At<PF_Pixel8>(*world, 1, 0), {255, 0, 255, 0});
+    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{128, 128, 0, 128}));
+    EXPECT_EQ(ChannelsAt(*world, 1, 0), (Channels{255, 0, 255, 0}));
 }
 
 TEST_F(ImageCacheTest, SolidFillsItsSizeAtTheDownsample) {
@@ -117,10 +101,7 @@ TEST_F(ImageCacheTest, SolidFillsItsSizeAtTheDownsample) {
     auto world = LayerSource(cache_, layer, 16, 2, 1);
     ASSERT_EQ(world->width, 2);
     ASSERT_EQ(world->height, 2);
-    for (int32_t y = 0; y < 2; ++y) {
-        for (int32_t x = 0; x < 2; ++x)
-            ExpectPixel(At<PF_Pixel16>(*world, x, y), {32768, 32768, 16384, 0});
-    }
+    EXPECT_EQ(PixelsOtherThan(*world, {32768, 32768, 16384, 0}), 0);
     EXPECT_EQ(cache_.Count(), 0u);
 }
 

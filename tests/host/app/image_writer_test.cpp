@@ -1,7 +1,5 @@
 #include <gtest/gtest.h>
 
-#include <unistd.h>
-
 #include <OpenImageIO/imagebuf.h>
 
 #include <filesystem>
@@ -10,27 +8,17 @@
 #include "host_error.h"
 #include "output/frame_writer.h"
 #include "output/image_writer.h"
+#include "test_files.h"
 
 namespace {
 
 namespace fs = std::filesystem;
+using ostrel::TempFolder;
 using ostrel::WriteWorld;
 
-class TempFolder {
-public:
-    TempFolder() : path_(fs::temp_directory_path() / ("ostrel-out-" + std::to_string(::getpid()))) {
-        fs::create_directories(path_);
-    }
-    ~TempFolder() { fs::remove_all(path_); }
-    fs::path operator/(const std::string& name) const { return path_ / name; }
-    size_t FileCount() const {
-        return static_cast<size_t>(
-            std::distance(fs::directory_iterator(path_), fs::directory_iterator()));
-    }
-
-private:
-    fs::path path_;
-};
+size_t FileCount(const ostrel::TempFolder& folder) {
+    return static_cast<size_t>(std::distance(fs::directory_iterator(folder.Path()), {}));
+}
 
 // Reads back RGBA as floats, as stored (no premultiplying on the way in).
 std::vector<float> ReadBack(const fs::path& path, OIIO::TypeDesc* stored) {
@@ -55,25 +43,25 @@ TEST(ImageWriter, KeepsDepthAndValues) {
     floating.At(0, 0) = {0.5f, 0.25f, 2.0f, 0.0f};
 
     OIIO::TypeDesc stored;
-    WriteWorld(eight, folder / "eight.png");
-    auto p8 = ReadBack(folder / "eight.png", &stored);
+    WriteWorld(eight, folder.Path() / "eight.png");
+    auto p8 = ReadBack(folder.Path() / "eight.png", &stored);
     EXPECT_EQ(stored, OIIO::TypeDesc::UINT8);
     EXPECT_FLOAT_EQ(p8[0] * 255, 10);
     EXPECT_FLOAT_EQ(p8[7] * 255, 128);  // straight alpha: colour is not scaled by it
     EXPECT_FLOAT_EQ(p8[4] * 255, 255);
 
-    WriteWorld(sixteen, folder / "sixteen.png");
-    auto p16 = ReadBack(folder / "sixteen.png", &stored);
+    WriteWorld(sixteen, folder.Path() / "sixteen.png");
+    auto p16 = ReadBack(folder.Path() / "sixteen.png", &stored);
     EXPECT_EQ(stored, OIIO::TypeDesc::UINT16);
     EXPECT_FLOAT_EQ(p16[0] * 65535, 32768);  // 16384 of 32768 is half: 32767.5 rounds up
     EXPECT_FLOAT_EQ(p16[3], 1);
 
-    WriteWorld(floating, folder / "float.exr");
-    auto pf = ReadBack(folder / "float.exr", &stored);
+    WriteWorld(floating, folder.Path() / "float.exr");
+    auto pf = ReadBack(folder.Path() / "float.exr", &stored);
     EXPECT_FLOAT_EQ(pf[0], 0.125f);  // OpenEXR holds premultiplied colour
     EXPECT_FLOAT_EQ(pf[1], 1.0f);
     EXPECT_FLOAT_EQ(pf[3], 0.5f);
-    EXPECT_EQ(folder.FileCount(), 3u);
+    EXPECT_EQ(FileCount(folder), 3u);
 }
 
 TEST(ImageWriter, AFailedWriteLeavesNoFile) {
@@ -84,8 +72,8 @@ TEST(ImageWriter, AFailedWriteLeavesNoFile) {
         const char* problem;
     };
     const Case cases[] = {
-        {folder / "missing-folder" / "frame.png", "cannot write the image"},
-        {folder / "frame.unknownformat", "cannot write images of this kind"},
+        {folder.Path() / "missing-folder" / "frame.png", "cannot write the image"},
+        {folder.Path() / "frame.unknownformat", "cannot write images of this kind"},
     };
     for (const Case& c : cases) {
         try {
@@ -97,7 +85,7 @@ TEST(ImageWriter, AFailedWriteLeavesNoFile) {
             EXPECT_NE(message.find(c.problem), std::string::npos) << message;
         }
     }
-    EXPECT_EQ(folder.FileCount(), 0u);
+    EXPECT_EQ(FileCount(folder), 0u);
 }
 
 // Frames written behind the render: a failed write comes back from the next call, naming
@@ -106,21 +94,21 @@ TEST(ImageWriter, FrameWriterReportsAFailureOnTheNextCall) {
     TempFolder folder;
     PF_WorldX<PF_Pixel8> world(4, 4);
     ostrel::FrameWriter writer;
-    writer.Write(ostrel::PrepareImage(world, folder / "0.png"));
-    writer.Write(ostrel::PrepareImage(world, folder / "missing-folder" / "1.png"));
+    writer.Write(ostrel::PrepareImage(world, folder.Path() / "0.png"));
+    writer.Write(ostrel::PrepareImage(world, folder.Path() / "missing-folder" / "1.png"));
     try {
-        writer.Write(ostrel::PrepareImage(world, folder / "2.png"));
+        writer.Write(ostrel::PrepareImage(world, folder.Path() / "2.png"));
         ADD_FAILURE() << "the failed write went unreported";
     } catch (const ostrel::HostError& e) {
         EXPECT_NE(std::string(e.what()).find("1.png: cannot write the image"), std::string::npos)
             << e.what();
     }
-    writer.Write(ostrel::PrepareImage(world, folder / "3.png"));
+    writer.Write(ostrel::PrepareImage(world, folder.Path() / "3.png"));
     writer.Finish();
-    EXPECT_TRUE(fs::exists(folder / "0.png"));
-    EXPECT_FALSE(fs::exists(folder / "2.png"));
-    EXPECT_TRUE(fs::exists(folder / "3.png"));
-    EXPECT_EQ(folder.FileCount(), 2u);
+    EXPECT_TRUE(fs::exists(folder.Path() / "0.png"));
+    EXPECT_FALSE(fs::exists(folder.Path() / "2.png"));
+    EXPECT_TRUE(fs::exists(folder.Path() / "3.png"));
+    EXPECT_EQ(FileCount(folder), 2u);
 }
 
 TEST(ImageWriter, FramePatterns) {

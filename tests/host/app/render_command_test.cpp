@@ -7,6 +7,7 @@
 #include <functional>
 #include <sstream>
 #include <string>
+#include <tuple>
 
 #include "cli/render_command.h"
 #include "suites/memory_suite.h"
@@ -152,8 +153,7 @@ TEST(RenderCommand, FramesOfTheRequestedSizeDepthAndFormat) {
                            (folder.Path() / "out" / c.file).string() + "\n");
         auto in = OIIO::ImageInput::open((folder.Path() / "out" / c.file).string());
         ASSERT_TRUE(in);
-        EXPECT_EQ(in->spec().width, c.width);
-        EXPECT_EQ(in->spec().height, c.height);
+        EXPECT_EQ(std::tuple(in->spec().width, in->spec().height), std::tuple(c.width, c.height));
         EXPECT_EQ(in->spec().format.basetype, c.type);
     }
     ClearApplicationSettings();

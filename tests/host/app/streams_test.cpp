@@ -86,11 +86,10 @@ TEST(Streams, LightValues) {
         "shadowDiffusion": 12, "lightsOnlyLayersBelow": true}})");
     const Layer& light = comp.layers[0];
     StreamVector color = StreamValues(light, kStreamColor, 0.0);
-    EXPECT_EQ(color.count, 4);
-    EXPECT_DOUBLE_EQ(color.values[0], 1.0);
-    EXPECT_DOUBLE_EQ(color.values[1], 1.0);
-    EXPECT_DOUBLE_EQ(color.values[2], 128.0 / 255.0);
-    EXPECT_DOUBLE_EQ(color.values[3], 0.0);
+    ASSERT_EQ(color.count, 4);
+    const double kOrange[] = {1, 1, 128.0 / 255.0, 0};  // alpha, red, green, blue
+    for (int i = 0; i < 4; ++i)
+        EXPECT_DOUBLE_EQ(color.values[i], kOrange[i]);
     struct Case {
         int32_t stream;
         double expected;

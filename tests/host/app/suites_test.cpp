@@ -7,28 +7,8 @@
 #include "suites/iterate_suite.h"
 #include "suites/memory_suite.h"
 #include "suites/persistent_data_suite.h"
-#include "suites/suite_registry.h"
 
 namespace {
-
-using ostrel::ScopedSuite;
-using ostrel::SuiteRegistry;
-
-TEST(SuiteRegistry, ServesByNameAndVersionOnly) {
-    ScopedSuite served(kQNGP_MemorySuite, 1, ostrel::MemorySuite());
-    const QNGP_BasicSuite* basic = SuiteRegistry::BasicSuite();
-    const void* suite = nullptr;
-    EXPECT_EQ(basic->AcquireSuite(kQNGP_MemorySuite, 1, &suite), 0);
-    EXPECT_EQ(suite, ostrel::MemorySuite());
-    EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 1);
-    EXPECT_EQ(basic->ReleaseSuite(kQNGP_MemorySuite, 1), 0);
-    EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
-
-    EXPECT_EQ(basic->AcquireSuite(kQNGP_MemorySuite, 2, &suite), kQNGP_ErrMissingSuite);
-    EXPECT_EQ(suite, nullptr);
-    EXPECT_EQ(basic->AcquireSuite("QNGP Teleport Suite", 1, &suite), kQNGP_ErrMissingSuite);
-    EXPECT_EQ(basic->ReleaseSuite(kQNGP_MemorySuite, 1), kQNGP_ErrMissingSuite);
-}
 
 TEST(MemorySuite, HandlesLockAndFree) {
     const QNGP_MemorySuite1* memory = ostrel::MemorySuite();

@@ -9,7 +9,6 @@
 namespace {
 
 using ostrel_test::AccountedBytesCheck;
-using ostrel_test::FailingAllocations;
 using ostrel_test::PixelIs;
 using ostrel_test::PixelOf;
 using ostrel_test::RecordingProgress;
@@ -36,33 +35,29 @@ TEST(MBuffer, KindFollowsDepthAndFlags) {
     }
 }
 
-TEST(MBuffer, NewBuildsTheBufferOfTheRequestedDepth) {
+// Best-quality requests get a buffer whose class answers for itself, so the spans add to it
+// with the AddFragment its answers choose; a draft request gets the draft buffer of its depth.
+TEST(MBuffer, EveryRequestGetsABufferThatDescribesItself) {
     AccountedBytesCheck memory;
     for (int16_t depth : {8, 16, 24, 32}) {
-        std::unique_ptr<SY_MBuffer> buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, false, false);
-        ASSERT_NE(buffer, nullptr);
-        EXPECT_EQ(buffer->GetBitDepth(), depth == 24 ? 8 : depth);
-        EXPECT_FALSE(buffer->IsAntialiased());
-        EXPECT_FALSE(buffer->HasMotionBlur());
-    }
-    auto buffer = SY_MBuffer::New({0, 0, 4, 4}, 24, false, false);
-    EXPECT_NE(dynamic_cast<SY_MBufferDraftX<PF_Pixel8>*>(buffer.get()), nullptr);
-    auto* container = dynamic_cast<PF_PixelContainerBase*>(buffer.get());
-    ASSERT_NE(container, nullptr);
-    EXPECT_EQ(container->GetBitDepth(), 8);
-}
-
-// Best-quality requests get a buffer whose class answers for itself, so the spans add to it
-// with the AddFragment its answers choose.
-TEST(MBuffer, EveryRequestGetsABufferThatDescribesItself) {
-    for (bool antialias : {false, true}) {
-        for (bool motionBlur : {false, true}) {
-            auto buffer = SY_MBuffer::New({0, 0, 2, 2}, 16, antialias, motionBlur);
-            ASSERT_NE(buffer, nullptr);
-            EXPECT_EQ(buffer->GetBitDepth(), 16);
-            if (!buffer->IsAntialiased()) {
+        for (bool antialias : {false, true}) {
+            for (bool motionBlur : {false, true}) {
+                SCOPED_TRACE(testing::Message() << depth << antialias << motionBlur);
+                auto buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, antialias, motionBlur);
+                ASSERT_NE(buffer, nullptr);
+                EXPECT_EQ(buffer->GetBitDepth(), depth == 24 ? 8 : depth);
+                auto* container = dynamic_cast<PF_PixelContainerBase*>(buffer.get());
+                ASSERT_NE(container, nullptr);
+                EXPECT_EQ(container->GetBitDepth(), buffer->GetBitDepth());
+                if (!antialias && !motionBlur) {
+                    EXPECT_FALSE(buffer->IsAntialiased());
+                }
+                if (buffer->IsAntialiased()) continue;
                 EXPECT_FALSE(buffer->HasMotionBlur());
-                EXPECT_NE(dynamic_cast<SY_MBufferDraftX<PF_Pixel16>*>(buffer.get()), nullptr);
+                bool draft = dynamic_cast<SY_MBufferDraftX<PF_Pixel8>*>(buffer.get()) ||
+                             dynamic_cast<SY_MBufferDraftX<PF_Pixel16>*>(buffer.get()) ||
+                             dynamic_cast<SY_MBufferDraftX<PF_PixelFloat>*>(buffer.get());
+                EXPECT_TRUE(draft);
             }
         }
     }
@@ -92,20 +87,12 @@ TYPED_TEST(MBufferDraftByDepth, CrossingLayersShowTheNearerOneAtEachPixel) {
         {
             auto owner = SY_MBuffer::New({1, 1, 9, 2}, PF_PixelTraits<P>::kBitDepth, false, false);
             auto* buffer = static_cast<Buffer*>(owner.get());
-            auto drawA = [&] {
-                for (int32_t x = 1; x < 9; ++x)
-                    buffer->AddFragment(&red, full, 2, (x - 1) + 0.25f, buffer->HeadAt(x, 1), 0);
-            };
-            auto drawB = [&] {
-                for (int32_t x = 1; x < 9; ++x)
-                    buffer->AddFragment(&blue, full, 2, 7.25f - (x - 1), buffer->HeadAt(x, 1), 0);
-            };
-            if (aFirst) {
-                drawA();
-                drawB();
-            } else {
-                drawB();
-                drawA();
+            for (int32_t pass = 0; pass < 2; ++pass) {
+                const bool a = (pass == 0) == aFirst;
+                for (int32_t x = 1; x < 9; ++x) {
+                    const float key = a ? (x - 1) + 0.25f : 7.25f - (x - 1);
+                    buffer->AddFragment(a ? &red : &blue, full, 2, key, buffer->HeadAt(x, 1), 0);
+                }
             }
             owner->Resolve(nullptr, nullptr, world);
         }
@@ -193,25 +180,15 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
     constexpr int32_t kPerBlock = kSY_FragmentRecordBytes / sizeof(Buffer::Record);
     const M_LRect bounds{0, 0, kPerBlock, 3};  // three full blocks
     const PF_Pixel16 p{32768, 1, 2, 3};
-    int32_t failures = 0;
-    for (int64_t n = 1;; ++n) {
-        AccountedBytesCheck memory;
-        bool completed = false;
-        try {
-            FailingAllocations failing(n);
-            auto owner = SY_MBuffer::New(bounds, 16, false, false);
-            auto* buffer = static_cast<Buffer*>(owner.get());
-            for (int32_t y = 0; y < bounds.bottom; ++y) {
-                for (int32_t x = 0; x < bounds.right; ++x)
-                    buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), 0);
-            }
-            completed = true;
-        } catch (int32_t error) {
-            EXPECT_EQ(error, 4) << "allocation " << n;
-            ++failures;
+    int32_t failures = scene_test::FailEachAllocationInTurn([&](auto fail) {
+        auto failing = fail();
+        auto owner = SY_MBuffer::New(bounds, 16, false, false);
+        auto* buffer = static_cast<Buffer*>(owner.get());
+        for (int32_t y = 0; y < bounds.bottom; ++y) {
+            for (int32_t x = 0; x < bounds.right; ++x)
+                buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), 0);
         }
-        if (completed) break;
-    }
+    });
     EXPECT_EQ(failures, 1 + 1 + 1 + 1 + 3);  // object, pool array, pool, head table, blocks
 }
 

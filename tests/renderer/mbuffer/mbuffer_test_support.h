@@ -7,6 +7,7 @@
 
 #include "pf_pixel.h"
 #include "renderer/scene/frame_test_support.h"
+#include "renderer/scene/scene_fixtures.h"
 #include "renderer/scene/threads.h"
 #include "u_memory.h"
 
@@ -62,24 +63,6 @@ public:
 
 private:
     int64_t start_;
-};
-
-// The nth allocation from now fails, and so does the retry after a purge if it comes to one.
-class FailingAllocations {
-public:
-    explicit FailingAllocations(int64_t n) {
-        U_FailAllocationAfter(n);
-        U_SetPurgeHandler([] {
-            U_FailAllocationAfter(1);
-            return true;
-        });
-    }
-    ~FailingAllocations() {
-        U_FailAllocationAfter(0);
-        U_SetPurgeHandler(nullptr);
-    }
-    FailingAllocations(const FailingAllocations&) = delete;
-    FailingAllocations& operator=(const FailingAllocations&) = delete;
 };
 
 }  // namespace ostrel_test

@@ -9,7 +9,6 @@
 namespace {
 
 using ostrel_test::AccountedBytesCheck;
-using ostrel_test::FailingAllocations;
 
 std::vector<uint16_t> RedsAt(const SY_ShadowFragmentArray& array, int32_t x, int32_t y) {
     std::vector<uint16_t> reds;
@@ -62,22 +61,12 @@ TEST(ShadowFragments, CompactionDropsEmptyArraysAndKeepsOrder) {
 }
 
 TEST(ShadowFragments, OutOfMemoryWhileAppendingReleasesEverything) {
-    int32_t failures = 0;
-    for (int64_t n = 1;; ++n) {
-        AccountedBytesCheck memory;
-        bool completed = false;
-        try {
-            FailingAllocations failing(n);
-            SY_ShadowFragmentArrayList list;
-            for (int32_t i = 0; i < 3; ++i)
-                list.Append({0, 0, 8, 8});
-            completed = true;
-        } catch (int32_t error) {
-            EXPECT_EQ(error, 4) << "allocation " << n;
-            ++failures;
-        }
-        if (completed) break;
-    }
+    int32_t failures = scene_test::FailEachAllocationInTurn([](auto fail) {
+        auto failing = fail();
+        SY_ShadowFragmentArrayList list;
+        for (int32_t i = 0; i < 3; ++i)
+            list.Append({0, 0, 8, 8});
+    });
     EXPECT_GE(failures, 3 * 4);  // at least object, pool array, pool and head table per array
 }
 

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cmath>
 #include <deque>
 #include <vector>
@@ -52,109 +53,36 @@ std::vector<Point> Square(double left, double top, double size) {
 }
 
 TEST(DepthRelation, SamplesWherePolygonsMeet) {
+    using Plane = std::array<double, 3>;  // depth kx·x + ky·y + k0
     struct Case {
         const char* name;
         std::vector<Point> a;
-        double az[3];  // depth plane of A: kx, ky, k0
+        Plane az;
         std::vector<Point> b;
-        double bz[3];
+        Plane bz;
         SY_DepthSense sense;
         bool aFirst, bFirst;
     };
     const auto nearer = SY_DepthSense::kLargerIsNearer;
     const auto farther = SY_DepthSense::kLargerIsFarther;
-    const std::vector<Case> cases = {
-        {"A behind B",
-         Square(0, 0, 10),
-         {0, 0, 1},
-         Square(5, 5, 10),
-         {0, 0, 2},
-         nearer,
-         true,
-         false},
-        {"B behind A",
-         Square(0, 0, 10),
-         {0, 0, 2},
-         Square(5, 5, 10),
-         {0, 0, 1},
-         nearer,
-         false,
-         true},
-        {"boxes only touch",
-         Square(0, 0, 10),
-         {0, 0, 1},
-         Square(10, 0, 10),
-         {0, 0, 2},
-         nearer,
-         false,
-         false},
-        {"apart", Square(0, 0, 10), {0, 0, 1}, Square(30, 30, 10), {0, 0, 2}, nearer, false, false},
-        {"crossing in depth",
-         Square(0, 0, 100),
-         {0.01, 0, 0},
-         Square(0, 0, 100),
-         {0, 0, 0.5},
-         nearer,
-         true,
-         true},
-        {"level", Square(0, 0, 10), {0, 0, 1}, Square(5, 5, 10), {0, 0, 1}, nearer, true, true},
-        {"level within 1e-12",
-         Square(0, 0, 10),
-         {0, 0, 1},
-         Square(5, 5, 10),
-         {0, 0, 1 + 1e-13},
-         nearer,
-         true,
-         true},
-        {"coplanar, B one depth step behind",
-         Square(0, 0, 10),
-         {0, 0, 1},
-         Square(5, 5, 10),
-         {0, 0, 1 - 1e-7},
-         nearer,
-         false,
-         true},
-        {"B inside A, no edges meet",
-         Square(0, 0, 100),
-         {0, 0, 1},
-         Square(40, 40, 10),
-         {0, 0, 2},
-         nearer,
-         true,
-         false},
-        {"A inside B, no edges meet",
-         Square(40, 40, 10),
-         {0, 0, 1},
-         Square(0, 0, 100),
-         {0, 0, 2},
-         nearer,
-         true,
-         false},
-        {"triangles sharing a diagonal",
-         {{0, 0}, {10, 0}, {0, 10}},
-         {0, 0, 1},
-         {{10, 0}, {10, 10}, {0, 10}},
-         {0, 0, 2},
-         nearer,
-         true,
-         false},
+    const auto s0 = Square(0, 0, 10), s5 = Square(5, 5, 10), s40 = Square(40, 40, 10);
+    const auto big = Square(0, 0, 100);
+    const std::vector<Point> upper{{0, 0}, {10, 0}, {0, 10}}, lower{{10, 0}, {10, 10}, {0, 10}};
+    const Case cases[] = {
+        {"A behind B", s0, {0, 0, 1}, s5, {0, 0, 2}, nearer, true, false},
+        {"B behind A", s0, {0, 0, 2}, s5, {0, 0, 1}, nearer, false, true},
+        {"boxes only touch", s0, {0, 0, 1}, Square(10, 0, 10), {0, 0, 2}, nearer, false, false},
+        {"apart", s0, {0, 0, 1}, Square(30, 30, 10), {0, 0, 2}, nearer, false, false},
+        {"crossing in depth", big, {0.01, 0, 0}, big, {0, 0, 0.5}, nearer, true, true},
+        {"level", s0, {0, 0, 1}, s5, {0, 0, 1}, nearer, true, true},
+        {"level within 1e-12", s0, {0, 0, 1}, s5, {0, 0, 1 + 1e-13}, nearer, true, true},
+        {"coplanar, B a step behind", s0, {0, 0, 1}, s5, {0, 0, 1 - 1e-7}, nearer, false, true},
+        {"B inside A, no edges meet", big, {0, 0, 1}, s40, {0, 0, 2}, nearer, true, false},
+        {"A inside B, no edges meet", s40, {0, 0, 1}, big, {0, 0, 2}, nearer, true, false},
+        {"triangles sharing a diagonal", upper, {0, 0, 1}, lower, {0, 0, 2}, nearer, true, false},
         // Orthographic depths are eye depths: A at 500 is behind B at 300.
-        {"orthographic, A behind B",
-         Square(0, 0, 10),
-         {0, 0, 500},
-         Square(5, 5, 10),
-         {0, 0, 300},
-         farther,
-         true,
-         false},
-        {"orthographic, B behind A",
-         Square(0, 0, 10),
-         {0, 0, 300},
-         Square(5, 5, 10),
-         {0, 0, 500},
-         farther,
-         false,
-         true},
+        {"orthographic, A behind B", s0, {0, 0, 500}, s5, {0, 0, 300}, farther, true, false},
+        {"orthographic, B behind A", s0, {0, 0, 300}, s5, {0, 0, 500}, farther, false, true},
     };
     for (const Case& c : cases) {
         SCOPED_TRACE(c.name);
@@ -231,30 +159,37 @@ protected:
     std::deque<SY_TRLayer> renderables_;
 };
 
-TEST_P(DepthGrouping, FarLayerIsDrawnBeforeNearOne) {
-    // Layer 0 in front of the zoom plane, layer 1 behind it: 1 first.
-    Add(100, 100, -100, 100, 100);
-    Add(120, 120, 100, 100, 100);
-    EXPECT_EQ(Cut(), (Groups{{1}, {0}}));
-    // The other way round, render order and depth order agree.
-    renderables_.clear();
-    Add(100, 100, 100, 100, 100);
-    Add(120, 120, -100, 100, 100);
-    EXPECT_EQ(Cut(), (Groups{{0}, {1}}));
-}
-
-TEST_P(DepthGrouping, CoplanarLayersAreOrderedByRenderIndex) {
-    // The later layer of a coplanar stack is drawn first, so the earlier one ends on top.
-    Add(100, 100, 0, 100, 100);
-    Add(150, 120, 0, 100, 100);
-    Add(120, 150, 0, 100, 100);
-    EXPECT_EQ(Cut(), (Groups{{2}, {1}, {0}}));
-}
-
-TEST_P(DepthGrouping, TouchingBoxesStayApart) {
-    Add(100, 100, 0, 100, 100);
-    Add(200, 100, 0, 100, 100);
-    EXPECT_EQ(Cut(), (Groups{{0}, {1}}));
+TEST_P(DepthGrouping, SeparateLayersComeBackToFront) {
+    struct Square {
+        double x, y, z, size;
+    };
+    struct Case {
+        const char* name;
+        std::vector<Square> layers;
+        Groups groups;
+    };
+    const Case cases[] = {
+        // Layer 0 in front of the zoom plane, layer 1 behind it.
+        {"far layer first", {{100, 100, -100, 100}, {120, 120, 100, 100}}, {{1}, {0}}},
+        {"render and depth order agree", {{100, 100, 100, 100}, {120, 120, -100, 100}}, {{0}, {1}}},
+        // The later layer of a coplanar stack is drawn first, so the earlier one ends on top.
+        {"coplanar stack",
+         {{100, 100, 0, 100}, {150, 120, 0, 100}, {120, 150, 0, 100}},
+         {{2}, {1}, {0}}},
+        {"touching boxes stay apart", {{100, 100, 0, 100}, {200, 100, 0, 100}}, {{0}, {1}}},
+        {"a layer alone", {{100, 100, 0, 100}}, {{0}}},
+        // Layer 1 is in front of layer 0; layer 2 overlaps nothing.
+        {"isolated layer",
+         {{100, 100, 0, 100}, {150, 150, -50, 100}, {10, 10, 0, 20}},
+         {{0}, {1}, {2}}},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        renderables_.clear();
+        for (const Square& l : c.layers)
+            Add(l.x, l.y, l.z, l.size, l.size);
+        EXPECT_EQ(Cut(), c.groups);
+    }
 }
 
 TEST_P(DepthGrouping, CrossingLayersFormOneGroup) {
@@ -266,30 +201,25 @@ TEST_P(DepthGrouping, CrossingLayersFormOneGroup) {
     EXPECT_EQ(groups[0].size(), 2u);
 }
 
-TEST_P(DepthGrouping, IsolatedLayerIsAGroupOfOne) {
-    Add(100, 100, 0, 100, 100);
-    EXPECT_EQ(Cut(), (Groups{{0}}));
-    Add(150, 150, -50, 100, 100);
-    Add(10, 10, 0, 20, 20);
-    // Layer 1 is in front of layer 0; layer 2 overlaps nothing.
-    EXPECT_EQ(Cut(), (Groups{{0}, {1}, {2}}));
-}
-
 INSTANTIATE_TEST_SUITE_P(Cameras, DepthGrouping, ::testing::Values(true, false),
                          [](const ::testing::TestParamInfo<bool>& param) {
                              return param.param ? "Perspective" : "Orthographic";
                          });
 
-TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
-    // A: top strip, depth rising to the right (up to 1); B: right strip at depth 1.1;
-    // C: diagonal strip from the top-left corner (depth −0.5) to the bottom-right one (1.5).
-    // A is behind B at the top right, B behind C at the bottom right, C behind A at the top
-    // left.
+// A: top strip, depth rising to the right (up to 1); B: right strip at depth 1.1; C: diagonal
+// strip from the top-left corner (depth −0.5) to the bottom-right one (1.5). A is behind B at the
+// top right, B behind C at the bottom right, C behind A at the top left.
+std::deque<SY_TRLayer> CycleOfThree() {
     std::deque<SY_TRLayer> renderables;
     renderables.push_back(Flat({{0, 0}, {100, 0}, {100, 10}, {0, 10}}, 0.01, 0, 0, 0));
     renderables.push_back(Flat({{90, 0}, {100, 0}, {100, 100}, {90, 100}}, 0, 0, 1.1, 1));
     renderables.push_back(
         Flat({{0, 0}, {10, 0}, {100, 90}, {100, 100}, {90, 100}, {0, 10}}, 0.01, 0.01, -0.5, 2));
+    return renderables;
+}
+
+TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
+    std::deque<SY_TRLayer> renderables = CycleOfThree();
     const auto sense = SY_DepthSense::kLargerIsNearer;
     SY_DrawOrder ab = SY_RelateRenderables(renderables[0], renderables[1], sense);
     SY_DrawOrder bc = SY_RelateRenderables(renderables[1], renderables[2], sense);
@@ -305,11 +235,7 @@ TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
 TEST(DepthGroupingCut, CycleStaysTogetherWhileOthersAreOrderedAroundIt) {
     // The cycle of three lies in front of a large background layer (render index 3) and
     // behind a small foreground layer (render index 4) over its top-left corner.
-    std::deque<SY_TRLayer> renderables;
-    renderables.push_back(Flat({{0, 0}, {100, 0}, {100, 10}, {0, 10}}, 0.01, 0, 0, 0));
-    renderables.push_back(Flat({{90, 0}, {100, 0}, {100, 100}, {90, 100}}, 0, 0, 1.1, 1));
-    renderables.push_back(
-        Flat({{0, 0}, {10, 0}, {100, 90}, {100, 100}, {90, 100}, {0, 10}}, 0.01, 0.01, -0.5, 2));
+    std::deque<SY_TRLayer> renderables = CycleOfThree();
     renderables.push_back(Flat(Square(-50, -50, 200), 0, 0, -10, 3));
     renderables.push_back(Flat(Square(2, 2, 5), 0, 0, 10, 4));
     Groups groups = Group(renderables, SY_DepthSense::kLargerIsNearer);
@@ -351,24 +277,11 @@ TEST(DepthGroupingCut, ReplacesEarlierGroupsAndFreesWhatItTook) {
         EXPECT_TRUE(groups.empty());
     }
     EXPECT_EQ(U_AccountedBytes(), start);
-    int failures = 0;
-    for (int64_t n = 1;; ++n) {
-        bool done = false;
-        {
-            SY_RenderableGroups groups;
-            FailingAllocation failing(n);
-            try {
-                SY_GroupByDepth(list, 3, SY_DepthSense::kLargerIsNearer, &groups);
-                done = true;
-            } catch (int32_t code) {
-                EXPECT_EQ(code, kU_ErrOutOfMemory);
-                ++failures;
-            }
-        }
-        EXPECT_EQ(U_AccountedBytes(), start) << "failing allocation " << n;
-        if (done) break;
-        ASSERT_LT(n, 100);
-    }
+    int32_t failures = FailEachAllocationInTurn([&](auto fail) {
+        SY_RenderableGroups groups;
+        auto failing = fail();
+        SY_GroupByDepth(list, 3, SY_DepthSense::kLargerIsNearer, &groups);
+    });
     EXPECT_GT(failures, 3);
 }
 

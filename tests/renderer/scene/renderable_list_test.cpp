@@ -197,25 +197,11 @@ TEST_F(RenderableList, MemoryFailureLeavesNothingAllocated) {
         layer.motionBlur = i % 2 == 1;
         layer.lightIds = {0};
     }
-    int64_t start = U_AccountedBytes();
-    int failures = 0;
-    for (int64_t n = 1;; ++n) {
-        bool built = false;
-        {
-            SY_Renderables renderables;
-            FailingAllocation failing(n);
-            try {
-                SY_BuildRenderables(Sources(), &renderables);
-                built = true;
-            } catch (int32_t code) {
-                EXPECT_EQ(code, kU_ErrOutOfMemory);
-                ++failures;
-            }
-        }
-        EXPECT_EQ(U_AccountedBytes(), start) << "failing allocation " << n;
-        if (built) break;
-        ASSERT_LT(n, 200);
-    }
+    int32_t failures = FailEachAllocationInTurn([&](auto fail) {
+        SY_Renderables renderables;
+        auto failing = fail();
+        SY_BuildRenderables(Sources(), &renderables);
+    });
     EXPECT_GT(failures, 4);
 }
 

@@ -1,8 +1,11 @@
 // Cameras and layer placements built the way scene capture builds them, for geometry tests.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <cmath>
 #include <initializer_list>
+#include <new>
 
 #include "m_matrix.h"
 #include "renderer/scene/renderable.h"
@@ -77,5 +80,32 @@ public:
     FailingAllocation(const FailingAllocation&) = delete;
     FailingAllocation& operator=(const FailingAllocation&) = delete;
 };
+
+// Runs work(fail) with its first, second, ... allocation failing until it runs through; work
+// calls `auto failing = fail();` where failures are to start. Every failure must throw the
+// out-of-memory code (or std::bad_alloc where `standardToo`, as tracked objects do) and leave
+// the accounted bytes where they were. Returns the failure count.
+template <class Work>
+int32_t FailEachAllocationInTurn(Work work, bool standardToo = false, int64_t limit = 500) {
+    int32_t failures = 0;
+    for (int64_t n = 1; n <= limit; ++n) {
+        int64_t start = U_AccountedBytes();
+        bool completed = false;
+        try {
+            work([n] { return FailingAllocation(n); });
+            completed = true;
+        } catch (int32_t code) {
+            EXPECT_EQ(code, kU_ErrOutOfMemory) << "failing allocation " << n;
+            ++failures;
+        } catch (const std::bad_alloc&) {
+            EXPECT_TRUE(standardToo) << "std::bad_alloc at failing allocation " << n;
+            ++failures;
+        }
+        EXPECT_EQ(U_AccountedBytes(), start) << "failing allocation " << n;
+        if (completed) return failures;
+    }
+    ADD_FAILURE() << "still failing after " << limit << " allocations";
+    return failures;
+}
 
 }  // namespace scene_test

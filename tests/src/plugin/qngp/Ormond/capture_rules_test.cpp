@@ -2,6 +2,7 @@
 // shadow map sizes, transfer modes and quality.
 #include <gtest/gtest.h>
 
+#include <tuple>
 #include <vector>
 
 #include "camera_capture.h"
@@ -42,9 +43,8 @@ TEST(CameraPair, DefaultCameraLooksAtTheCompCentreFromItsDistance) {
     M_Matrix4 placement, projection;
     EXPECT_EQ(ORM_CameraPair(view, nullptr, 0, &placement, &projection), 200);
     // Eye at (aspect × width / 2, height / 2, −distance), axes as the world's.
-    EXPECT_EQ(placement.mat[3][0], 100);
-    EXPECT_EQ(placement.mat[3][1], 25);
-    EXPECT_EQ(placement.mat[3][2], -200);
+    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
+              std::tuple(100, 25, -200));
     EXPECT_EQ(placement.mat[0][0], 1);
     EXPECT_NE(projection.mat[2][3], 0);
     // On the image plane one eye unit across is half a (wide) pixel.
@@ -92,9 +92,8 @@ TEST(CameraPair, CameraLayerPlacesTheEyeAndItsZoomProjects) {
     EXPECT_EQ(ORM_CameraPair(view, &cameraToWorld, 400, &placement, &projection), 400);
     // The layer's transform, then stretched by the pixel aspect.
     EXPECT_EQ(placement.mat[0][0], 2);
-    EXPECT_EQ(placement.mat[3][0], 14);
-    EXPECT_EQ(placement.mat[3][1], 8);
-    EXPECT_EQ(placement.mat[3][2], -300);
+    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
+              std::tuple(14, 8, -300));
     ScreenPoint p = Screen(projection, 20, 10, 400);
     EXPECT_DOUBLE_EQ(p.x, 60);
     EXPECT_DOUBLE_EQ(p.y, 35);
@@ -162,34 +161,29 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
 }
 
 TEST(LayerQuality, QualityAndShadowStreamsSetTheSwitches) {
+    // Renders, wireframe, casts shadows, accepts shadows, accepts lights, best quality, mode.
+    using Switches = std::tuple<bool, bool, bool, int, bool, bool, int>;
     struct Case {
         const char* name;
         int16_t quality;
         ORM_ShadowStreams streams;
-        bool renders, wireframe, castsShadows;
-        uint8_t acceptsShadows;
-        bool acceptsLights, bestQuality;
-        uint8_t mode;
+        Switches switches;
     };
     const Case kCases[] = {
-        {"wireframe ignores the streams", 0, {1, 1, 1}, false, true, false, 0, false, false, 2},
-        {"draft, casting and accepting", 1, {1, 1, 1}, true, false, true, 1, true, false, 2},
-        {"best, neither", 2, {0, 0, 0}, true, false, false, 0, false, true, 2},
-        {"casts shadows only", 1, {2, 0, 1}, false, false, true, 0, true, false, 2},
-        {"accepts shadows only", 2, {0, 2, 1}, true, false, false, 2, false, true, 5},
-        {"accepts shadows truncated", 1, {0, 1.7, 1}, true, false, false, 1, true, false, 2},
+        {"wireframe ignores the streams", 0, {1, 1, 1}, {false, true, false, 0, false, false, 2}},
+        {"draft, casting and accepting", 1, {1, 1, 1}, {true, false, true, 1, true, false, 2}},
+        {"best, neither", 2, {0, 0, 0}, {true, false, false, 0, false, true, 2}},
+        {"casts shadows only", 1, {2, 0, 1}, {false, false, true, 0, true, false, 2}},
+        {"accepts shadows only", 2, {0, 2, 1}, {true, false, false, 2, false, true, 5}},
+        {"accepts shadows truncated", 1, {0, 1.7, 1}, {true, false, false, 1, true, false, 2}},
     };
     for (const Case& c : kCases) {
-        SCOPED_TRACE(c.name);
-        SY_LayerDesc layer;
-        ORM_ApplyQuality(c.quality, c.streams, &layer);
-        EXPECT_EQ(layer.renders, c.renders);
-        EXPECT_EQ(layer.wireframe, c.wireframe);
-        EXPECT_EQ(layer.castsShadows, c.castsShadows);
-        EXPECT_EQ(layer.acceptsShadows, c.acceptsShadows);
-        EXPECT_EQ(layer.acceptsLights, c.acceptsLights);
-        EXPECT_EQ(layer.bestQuality, c.bestQuality);
-        EXPECT_EQ(layer.mode, c.mode);
+        SY_LayerDesc l;
+        ORM_ApplyQuality(c.quality, c.streams, &l);
+        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
+                           l.acceptsLights, l.bestQuality, l.mode),
+                  c.switches)
+            << c.name;
     }
 }
 

@@ -38,12 +38,7 @@ protected:
     QNGP_InData in{};
 };
 
-TEST_F(InstanceOptions, SetUpWithoutFlattenedDataChoosesCompSize) {
-    EXPECT_EQ(ChoiceAfterSetUp(nullptr), 0);
-    EXPECT_EQ(server.Held(), 0);
-}
-
-TEST_F(InstanceOptions, OptionsHandleIsSixteenNamedBytesUnlocked) {
+TEST_F(InstanceOptions, SetUpWithoutFlattenedDataMakesSixteenNamedBytesChoosingCompSize) {
     QNGP_MemHandle options = nullptr;
     ASSERT_EQ(ORM_InstanceSetUp(&in, nullptr, nullptr, nullptr, nullptr, nullptr, &options), 0);
     const MemoryHost::Block& block = MemoryHost::Of(options);
@@ -52,6 +47,13 @@ TEST_F(InstanceOptions, OptionsHandleIsSixteenNamedBytesUnlocked) {
     EXPECT_EQ(block.pluginId, kPluginId);
     EXPECT_EQ(block.flags, 1);
     EXPECT_EQ(block.locks, 0);
+    ORM_InstanceOptions record;
+    std::memcpy(&record, block.bytes.data(), sizeof record);
+    EXPECT_EQ(record.shadowMapSizeChoice, 0);
+    // Set-down frees it.
+    EXPECT_EQ(ORM_InstanceSetDown(&in, nullptr, nullptr, nullptr, options), 0);
+    EXPECT_EQ(memory.Live(), 0u);
+    EXPECT_EQ(server.Held(), 0);
 }
 
 TEST_F(InstanceOptions, ChoiceFiveFlattensToTwelveBigEndianBytesAndSetsUpAgain) {
@@ -96,14 +98,6 @@ TEST_F(InstanceOptions, FlattenWithoutOptionsDoesNothing) {
     EXPECT_EQ(ORM_FlattenInstance(&in, nullptr, nullptr, nullptr, nullptr, &flattened), 0);
     EXPECT_EQ(flattened, nullptr);
     EXPECT_EQ(memory.Live(), 0u);
-}
-
-TEST_F(InstanceOptions, SetDownFreesTheHandle) {
-    QNGP_MemHandle options = nullptr;
-    ASSERT_EQ(ORM_InstanceSetUp(&in, nullptr, nullptr, nullptr, nullptr, nullptr, &options), 0);
-    EXPECT_EQ(ORM_InstanceSetDown(&in, nullptr, nullptr, nullptr, options), 0);
-    EXPECT_EQ(memory.Live(), 0u);
-    EXPECT_EQ(server.Held(), 0);
 }
 
 TEST_F(InstanceOptions, MemoryFailureIsReturnedAndLeavesNoHandle) {

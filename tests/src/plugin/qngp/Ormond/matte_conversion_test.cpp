@@ -19,25 +19,19 @@ auto ConvertOne(P pixel, ORM_MatteType type) {
 }
 
 TEST(MatteConversion, WhiteOpaqueAtEachDepth) {
-    const ORM_MatteType kAlpha = ORM_MatteType::kAlpha, kInverted = ORM_MatteType::kInvertedAlpha,
-                        kLuma = ORM_MatteType::kLuma, kInvertedLuma = ORM_MatteType::kInvertedLuma;
-    const PF_Pixel8 white8{255, 255, 255, 255};
-    EXPECT_EQ(ConvertOne(white8, kAlpha), 255);
-    EXPECT_EQ(ConvertOne(white8, kInverted), 0);
-    EXPECT_EQ(ConvertOne(white8, kLuma), 255);
-    EXPECT_EQ(ConvertOne(white8, kInvertedLuma), 0);
-
-    const PF_Pixel16 white16{32768, 32768, 32768, 32768};
-    EXPECT_EQ(ConvertOne(white16, kAlpha), 32768);
-    EXPECT_EQ(ConvertOne(white16, kInverted), 0);
-    EXPECT_EQ(ConvertOne(white16, kLuma), 32768);
-    EXPECT_EQ(ConvertOne(white16, kInvertedLuma), 0);
-
-    const PF_PixelFloat whiteF{1, 1, 1, 1};
-    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kAlpha), 1);
-    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kInverted), 0);
-    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kLuma), 1);
-    EXPECT_FLOAT_EQ(ConvertOne(whiteF, kInvertedLuma), 0);
+    struct Case {
+        ORM_MatteType type;
+        bool shows;  // full alpha, or none
+    };
+    for (const Case& c : {Case{ORM_MatteType::kAlpha, true},
+                          {ORM_MatteType::kInvertedAlpha, false},
+                          {ORM_MatteType::kLuma, true},
+                          {ORM_MatteType::kInvertedLuma, false}}) {
+        SCOPED_TRACE(static_cast<int>(c.type));
+        EXPECT_EQ(ConvertOne(PF_Pixel8{255, 255, 255, 255}, c.type), c.shows ? 255 : 0);
+        EXPECT_EQ(ConvertOne(PF_Pixel16{32768, 32768, 32768, 32768}, c.type), c.shows ? 32768 : 0);
+        EXPECT_FLOAT_EQ(ConvertOne(PF_PixelFloat{1, 1, 1, 1}, c.type), c.shows ? 1 : 0);
+    }
 }
 
 TEST(MatteConversion, EightBitLumaRoundsAlphaTimesLumaOver255ToNearest) {

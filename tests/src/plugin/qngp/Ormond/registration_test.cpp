@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <tuple>
 
 #include "about_box.h"
 #include "plugin_test_support.h"
@@ -59,10 +60,8 @@ TEST(Registration, RegistersTheArtisanAndItsDeathHook) {
 
     const Registry& r = Registry::Get();
     EXPECT_EQ(global, -42);  // the plug-in id, sign-extended
-    EXPECT_EQ(r.api.major, 1);
-    EXPECT_EQ(r.api.minor, 0);
-    EXPECT_EQ(r.artisan.major, 1);
-    EXPECT_EQ(r.artisan.minor, 0);
+    EXPECT_EQ(std::tuple(r.api.major, r.api.minor, r.artisan.major, r.artisan.minor),
+              std::tuple(1, 0, 1, 0));
     EXPECT_EQ(r.pluginId, -42);
     EXPECT_EQ(r.reference, -42);
     EXPECT_EQ(r.matchName, "VLMR Ormond");
