@@ -6,8 +6,8 @@
 #include "composition/render_order.h"
 #include "composition/transform.h"
 #include "host_error.h"
-#include "session/frame_suites.h"
 #include "pf_xfer.h"
+#include "session/frame_suites.h"
 
 namespace ostrel {
 namespace {
@@ -115,6 +115,7 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
             << Quoted(layer.name) << std::setw(6) << KindName(layer.kind) << " 3-D  "
             << std::setw(10) << QualityName(layer.quality) << layer.transferMode
             << (PF_XferModeFromName(layer.transferMode) < 0 ? " (unknown mode)" : "")
+            << (layer.source.unbounded ? ", unbounded" : "")
             << (layer.trackMatte != TrackMatte::kNone
                     ? ", matte " + Quoted(comp.layers[static_cast<size_t>(layer.matteLayer)].name)
                     : "")

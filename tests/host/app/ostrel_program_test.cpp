@@ -133,6 +133,11 @@ TEST(OstrelProgram, InfoListsWhatWillRender) {
         EXPECT_NE(run.out.find(part), std::string::npos) << part << "\n" << run.out;
     }
     EXPECT_LT(run.out.find("\"disc\""), run.out.find("\"floor\""));
+
+    run = Ostrel(folder, "info " + Quote(kExamples / "backdrop" / "backdrop.json"));
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_NE(run.out.find("solid  3-D  best      normal, unbounded"), std::string::npos)
+        << run.out;
 }
 
 TEST(OstrelProgram, AboutShowsTheRenderersNote) {
