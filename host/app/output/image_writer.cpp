@@ -85,22 +85,24 @@ Pixels Convert(const PF_World& world, const std::string& format) {
     }
 }
 
-}  // namespace
-
-PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path) {
-    std::string name = path.string();
+// The writer of the file's kind, chosen by its extension.
+auto WriterFor(const std::string& name) {
     auto out = OIIO::ImageOutput::create(name);
     if (!out)
         throw HostError(name + ": cannot write images of this kind (" + OIIO::geterror() + ")");
-    Pixels pixels = Convert(world, out->format_name());
+    return out;
+}
+
+}  // namespace
+
+PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path) {
+    Pixels pixels = Convert(world, WriterFor(path.string())->format_name());
     return {path, world.width, world.height, pixels.type.basetype, std::move(pixels.bytes)};
 }
 
 void WritePrepared(const PreparedImage& image) {
     std::string name = image.path.string();
-    auto out = OIIO::ImageOutput::create(name);
-    if (!out)
-        throw HostError(name + ": cannot write images of this kind (" + OIIO::geterror() + ")");
+    auto out = WriterFor(name);
     std::string format = out->format_name();
     OIIO::TypeDesc type(static_cast<OIIO::TypeDesc::BASETYPE>(image.channelType));
     OIIO::ImageSpec layout(image.width, image.height, 4, type);
