@@ -138,8 +138,8 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
     if (!geometry.Empty()) {
         MatteHold matteHold;
         PF_World* matte = nullptr;
-        bool matteApplies = target.mode != kSY_TargetDepthOfField &&
-                            target.mode != kSY_TargetShadowArray && trackMatte;
+        bool matteApplies = target.mode() != kSY_TargetDepthOfField &&
+                            target.mode() != kSY_TargetShadowArray && trackMatte;
         if (matteApplies) matte = matteHold.Fetch(trackMatte);
         if (!matteApplies || matte || !trackMatte->OutsideIsClear()) {
             SY_SpanTable table;
