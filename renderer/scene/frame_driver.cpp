@@ -104,9 +104,7 @@ void DrawThroughFragmentBuffer(SY_RenderContext* context, const SY_RenderableGro
     const SY_RenderTarget target(*buffer);
     for (SY_TRLayer* renderable : group)
         DrawRenderable(context, renderable, target);
-    buffer->Resolve(context->progress,
-                    reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
-                    *context->destination);
+    buffer->Resolve(context->progress, context->scene->colorSettings, *context->destination);
 }
 
 void DrawGroup(SY_RenderContext* context, const SY_RenderableGroup& group) {

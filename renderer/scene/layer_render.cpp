@@ -143,16 +143,15 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
         if (matteApplies) matte = matteHold.Fetch(trackMatte);
         if (!matteApplies || matte || !trackMatte->OutsideIsClear()) {
             SY_SpanTable table;
-            RowClosure closure{
-                &geometry,
-                shader,
-                matte,
-                matte && trackMatte->OutsideIsClear(),
-                &table,
-                &target,
-                reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
-                ImageBlend(material),
-                context->destination->width};
+            RowClosure closure{&geometry,
+                               shader,
+                               matte,
+                               matte && trackMatte->OutsideIsClear(),
+                               &table,
+                               &target,
+                               context->scene->colorSettings,
+                               ImageBlend(material),
+                               context->destination->width};
             if (simplePath)
                 DrawSimplePath(context, closure, fieldMode);
             else

@@ -146,8 +146,8 @@ bool FrameSession::TakeBack(PF_World* world) {
     return true;
 }
 
-uint64_t FrameSession::ColorSettings() const {
-    return reinterpret_cast<uint64_t>(blending_.get());
+const PF_LinearBlendingTables* FrameSession::ColorSettings() const {
+    return blending_.get();
 }
 
 void FrameSession::NoteFailure(const std::string& message) {
