@@ -13,39 +13,34 @@ using ostrel_test::PixelIs;
 using ostrel_test::PixelOf;
 using ostrel_test::RecordingProgress;
 
-TEST(MBuffer, KindFollowsDepthAndFlags) {
+TEST(MBuffer, QualityFollowsTheFlags) {
     struct Case {
-        int16_t bitDepth;
         bool antialias, motionBlur;
         SY_MBufferQuality quality;
-        int16_t depth;
     };
     using Q = SY_MBufferQuality;
     const Case cases[] = {
-        {8, false, false, Q::kDraft, 8},        {16, false, false, Q::kDraft, 16},
-        {32, false, false, Q::kDraft, 32},      {24, false, false, Q::kDraft, 8},
-        {0, false, false, Q::kDraft, 8},        {8, true, false, Q::kAntialiased, 8},
-        {32, true, false, Q::kAntialiased, 32}, {16, false, true, Q::kMotionBlur, 16},
-        {24, true, true, Q::kMotionBlur, 8},    {32, true, true, Q::kMotionBlur, 32},
+        {false, false, Q::kDraft},
+        {true, false, Q::kAntialiased},
+        {false, true, Q::kMotionBlur},
+        {true, true, Q::kMotionBlur},
     };
-    for (const Case& c : cases) {
-        SY_MBufferKind kind = SY_MBufferKindFor(c.bitDepth, c.antialias, c.motionBlur);
-        EXPECT_EQ(kind.quality, c.quality) << c.bitDepth << c.antialias << c.motionBlur;
-        EXPECT_EQ(kind.bitDepth, c.depth) << c.bitDepth << c.antialias << c.motionBlur;
-    }
+    for (const Case& c : cases)
+        EXPECT_EQ(SY_MBufferQualityFor(c.antialias, c.motionBlur), c.quality)
+            << c.antialias << c.motionBlur;
 }
 
 // Best-quality requests get a buffer whose class answers for itself, so the spans add to it
 // with the AddFragment its answers choose; a draft request gets the draft buffer of its depth.
 TEST(MBuffer, EveryRequestGetsABufferThatDescribesItself) {
     AccountedBytesCheck memory;
-    for (int16_t depth : {8, 16, 24, 32}) {
+    for (int16_t depth : {8, 16, 32}) {
         for (bool antialias : {false, true}) {
             for (bool motionBlur : {false, true}) {
                 SCOPED_TRACE(testing::Message() << depth << antialias << motionBlur);
                 auto buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, antialias, motionBlur);
                 ASSERT_NE(buffer, nullptr);
-                EXPECT_EQ(buffer->GetBitDepth(), depth == 24 ? 8 : depth);
+                EXPECT_EQ(buffer->GetBitDepth(), depth);
                 auto* container = dynamic_cast<PF_PixelContainerBase*>(buffer.get());
                 ASSERT_NE(container, nullptr);
                 EXPECT_EQ(container->GetBitDepth(), buffer->GetBitDepth());

@@ -4,6 +4,7 @@
 
 #include "raster_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
@@ -42,11 +43,10 @@ protected:
         geometry_.texture = image_.get();
         SetPlane(&geometry_, 1, 0, false);
     }
-    void Draw(void* target, int32_t mode, int32_t x, int32_t count, int32_t y,
+    void Draw(const SY_RenderTarget& target, int32_t x, int32_t count, int32_t y,
               const PF_World* matte = nullptr) {
-        SY_RenderTarget t{mode, target};
-        SY_RenderLayerSpanFromImage_SwitchDepth(blend_, geometry_, matte, x, count, y, nullptr, t,
-                                                0);
+        SY_RenderLayerSpanFromImage_SwitchDepth(blend_, geometry_, matte, x, count, y, nullptr,
+                                                target, 0);
     }
 
     ostrel_test::MemoryTextureFetcher fetcher_;
@@ -72,7 +72,14 @@ TYPED_TEST(ImageSpan, SpansCopyTheirImagePixelsClippedToTheImage) {
     };
     for (const Case& c : cases) {
         PF_WorldX<P> destination(kWidth + 4, kHeight + 2);
-        this->Draw(&destination, c.mode, c.x, c.count, c.y);
+        SY_ShadowFragmentArray occluders({0, 0, kWidth, kHeight});
+        const SY_RenderTarget targets[] = {SY_RenderTarget(destination),
+                                           SY_RenderTarget(SY_SpanImageRecord{&destination, 0, 0}),
+                                           SY_RenderTarget(occluders)};
+        for (const SY_RenderTarget& target : targets) {
+            if (target.mode() == c.mode) this->Draw(target, c.x, c.count, c.y);
+        }
+        EXPECT_EQ(occluders.fragmentCount, 0u);
         for (int32_t y = 0; y < destination.height; ++y) {
             for (int32_t x = 0; x < destination.width; ++x) {
                 bool drawn = y == c.y && x >= c.from && x < c.to;
@@ -92,7 +99,7 @@ TYPED_TEST(ImageSpan, KeepAlphaLeavesTheDestinationAlpha) {
     for (int32_t mode : {kPF_XferNormal, 4, kPF_XferMultiply, 6}) {
         this->blend_.mode = static_cast<uint8_t>(mode | 128);
         auto destination = FilledWorld<P>(kWidth, kHeight, under);
-        this->Draw(destination.get(), kSY_TargetDestination, 0, kWidth, 3);
+        this->Draw(SY_RenderTarget(*destination), 0, kWidth, 3);
         for (int32_t x = 0; x < kWidth; ++x) {
             EXPECT_EQ(destination->At(x, 3).alpha, under.alpha) << mode << " at " << x;
             EXPECT_FALSE(Equal(destination->At(x, 3), under)) << mode << " at " << x;
@@ -110,7 +117,7 @@ TYPED_TEST(ImageSpan, MatteAndOpacityScaleTheCoverage) {
     for (int32_t x = 0; x < kWidth; ++x)
         matte.At(x, 4).alpha = x < 8 ? 0 : static_cast<typename Traits::Channel>(Traits::kMax / 2);
     PF_WorldX<P> destination(kWidth, kHeight);
-    this->Draw(&destination, kSY_TargetDestination, 0, kWidth, 4, &matte);
+    this->Draw(SY_RenderTarget(destination), 0, kWidth, 4, &matte);
     for (int32_t x = 0; x < kWidth; ++x) {
         const P& got = destination.At(x, 4);
         if (x < 8)
@@ -131,7 +138,7 @@ TYPED_TEST(ImageSpan, FragmentsTakeTheirDepthFromThePlane) {
         this->image_->At(5, 1) = P{};
         auto buffer =
             SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
-        this->Draw(buffer.get(), kSY_TargetFragmentBuffer, 2, 6, 1);
+        this->Draw(SY_RenderTarget(*buffer), 2, 6, 1);
         auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
         for (int32_t x = 0; x < kWidth; ++x) {
             const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
@@ -154,7 +161,7 @@ TYPED_TEST(ImageSpan, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
     using P = TypeParam;
     SetPlane(&this->geometry_, 1, -0.125, true);
     PF_WorldX<P> destination(kWidth, kHeight);
-    this->Draw(&destination, kSY_TargetDestination, 0, kWidth, 0);
+    this->Draw(SY_RenderTarget(destination), 0, kWidth, 0);
     for (int32_t x = 0; x < kWidth; ++x)
         EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
 }
@@ -172,9 +179,9 @@ TYPED_TEST(ImageSpan, ImageLayersSortAgainstTexturedLayersByDepth) {
     SY_LayerShader shader;
     auto buffer =
         SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
-    SY_RenderTarget target{kSY_TargetFragmentBuffer, buffer.get()};
+    SY_RenderTarget target(*buffer);
     SY_RenderLayerSpan_SwitchDepth(wall, &shader, nullptr, 0, kWidth, 6, nullptr, target, 0);
-    this->Draw(buffer.get(), kSY_TargetFragmentBuffer, 0, kWidth, 6);
+    this->Draw(SY_RenderTarget(*buffer), 0, kWidth, 6);
     PF_WorldX<P> destination(kWidth, kHeight);
     ostrel_test::RecordingProgress progress;
     buffer->Resolve(&progress, nullptr, destination);

@@ -4,6 +4,7 @@
 
 #include "raster_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
@@ -32,9 +33,9 @@ protected:
         geometry_.perspective = false;
     }
 
-    void Draw(PF_World* target, int32_t x, int32_t count, int32_t y, int32_t mode = 1) {
-        SY_RenderTarget t{mode, target};
-        SY_RenderLayerSpan_SwitchDepth(geometry_, &shader_, nullptr, x, count, y, nullptr, t, 0);
+    void Draw(PF_World* target, int32_t x, int32_t count, int32_t y) {
+        SY_RenderLayerSpan_SwitchDepth(geometry_, &shader_, nullptr, x, count, y, nullptr,
+                                       SY_RenderTarget(*target), 0);
     }
 
     ostrel_test::MemoryTextureFetcher fetcher_;
@@ -78,7 +79,8 @@ TYPED_TEST(SpanDispatch, StoreTargetWritesAtTheImageOrigin) {
     using P = TypeParam;
     PF_WorldX<P> image(10, 4);
     SY_SpanImageRecord record{&image, 3, 1};
-    SY_RenderTarget target{kSY_TargetDepthOfField, &record};
+    SY_RenderTarget target(record);
+    EXPECT_EQ(target.mode(), kSY_TargetDepthOfField);
     SY_RenderLayerSpan_SwitchDepth(this->geometry_, &this->shader_, nullptr, 4, 5, 2, nullptr,
                                    target, 0);
     for (int32_t i = 0; i < 10; ++i) {
@@ -88,12 +90,13 @@ TYPED_TEST(SpanDispatch, StoreTargetWritesAtTheImageOrigin) {
     EXPECT_TRUE(IsClear(image.At(1, 0)));
 }
 
-TYPED_TEST(SpanDispatch, TargetsWithoutASpanRoutineDrawNothing) {
-    using P = TypeParam;
-    PF_WorldX<P> destination(16, 8);
-    for (int32_t mode : {0, 4, 5})
-        this->Draw(&destination, 0, 16, 1, mode);
-    ExpectOnly(destination, 0, 0, 1);
+TYPED_TEST(SpanDispatch, ShadowArraysReceiveNothingFromLayerSpans) {
+    SY_ShadowFragmentArray occluders({0, 0, 16, 8});
+    SY_RenderTarget target(occluders);
+    EXPECT_EQ(target.mode(), kSY_TargetShadowArray);
+    SY_RenderLayerSpan_SwitchDepth(this->geometry_, &this->shader_, nullptr, 0, 16, 1, nullptr,
+                                   target, 0);
+    EXPECT_EQ(occluders.fragmentCount, 0u);
 }
 
 // Fragments of a span resolve to what compositing the span straight gives.
@@ -105,7 +108,7 @@ TYPED_TEST(SpanDispatch, FragmentsResolveToTheDirectComposite) {
         this->Draw(&direct, 2, 9, 3);
         std::unique_ptr<SY_MBuffer> buffer =
             SY_MBuffer::New({0, 0, 16, 8}, PF_PixelTraits<P>::kBitDepth, false, false);
-        SY_RenderTarget target{kSY_TargetFragmentBuffer, buffer.get()};
+        SY_RenderTarget target(*buffer);
         SY_RenderLayerSpan_SwitchDepth(this->geometry_, &this->shader_, nullptr, 2, 9, 3, nullptr,
                                        target, 0);
         ostrel_test::RecordingProgress progress;
@@ -161,7 +164,7 @@ TEST(SpanDispatchDepth, TextureOfAnotherDepthIsReportedAndThrowsThree) {
     geometry.screenToTexture.Allocate(1);
     SY_LayerShader shader;
     PF_WorldX<PF_Pixel16> destination(4, 4);
-    SY_RenderTarget target{kSY_TargetDestination, &destination};
+    SY_RenderTarget target(destination);
     struct Case {
         const char* message;
         std::function<void()> draw;
