@@ -3,6 +3,9 @@
 
 #include <cstdint>
 
+// The error thrown for a world or buffer whose bit depth is not 8, 16 or 32.
+inline constexpr int32_t kPF_ErrUnexpectedBitDepth = 3;
+
 // Channels are stored alpha first; colour is straight (not premultiplied).
 struct PF_Pixel8 {
     uint8_t alpha, red, green, blue;
@@ -13,14 +16,17 @@ struct PF_Pixel16 {
     uint16_t alpha, red, green, blue;
 };
 
+// Float channels are nominally 0..1; colour may run above 1.
 struct PF_PixelFloat {
     float alpha, red, green, blue;
 };
 
+// Double channels, for sums that must not lose precision.
 struct PF_PixelDouble {
     double alpha, red, green, blue;
 };
 
+// What differs between the three pixel types, for templates written once over them.
 template <class P>
 struct PF_PixelTraits;
 

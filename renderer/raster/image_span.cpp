@@ -9,8 +9,6 @@
 
 namespace {
 
-constexpr int32_t kErrUnexpectedBitDepth = 3;
-
 // The span's pixels, clipped to the image, and the plane's depth at the first of them.
 struct ImageSpan {
     int32_t x;
@@ -75,7 +73,7 @@ void SY_RenderLayerSpanFromImage_SwitchDepth(const SY_SpanBlend& blend,
     if (depth != 8 && depth != 16 && depth != 32) {
         U_ReportFailedVerification(
             0, __LINE__, 0, "Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()");
-        throw kErrUnexpectedBitDepth;
+        throw kPF_ErrUnexpectedBitDepth;
     }
 
     const PF_World& image = *layer.texture;

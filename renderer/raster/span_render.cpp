@@ -9,8 +9,6 @@
 
 namespace {
 
-constexpr int32_t kErrUnexpectedBitDepth = 3;
-
 SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
     SY_SpanRayState ray;
     const auto& e = geometry.eyeRay.mat;
@@ -121,6 +119,6 @@ void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_
         default:
             U_ReportFailedVerification(0, __LINE__, 0,
                                        "Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()");
-            throw kErrUnexpectedBitDepth;
+            throw kPF_ErrUnexpectedBitDepth;
     }
 }

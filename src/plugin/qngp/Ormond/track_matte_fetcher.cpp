@@ -15,7 +15,7 @@ void ORM_ConvertMatteWorld(const PF_World& world, ORM_MatteType type) {
             break;
         default:
             U_ReportFailedVerification(0, __LINE__, 0, "Unexpected bitdepth in PF_IteratePixels()");
-            throw kORM_ErrBitDepth;
+            throw kPF_ErrUnexpectedBitDepth;
     }
 }
 
