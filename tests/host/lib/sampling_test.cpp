@@ -174,8 +174,8 @@ TYPED_TEST(Samplers, BilinearInterpolatesPremultipliedTexels) {
         const P& p1 = world.At(2, 0);
         double alpha = (1 - c.t) * Unit<P>(p0.alpha) + c.t * Unit<P>(p1.alpha);
         double color = ((1 - c.t) * Unit<P>(p0.alpha) * Unit<P>(p0.red) +
-                         c.t * Unit<P>(p1.alpha) * Unit<P>(p1.red)) /
-                        alpha;
+                        c.t * Unit<P>(p1.alpha) * Unit<P>(p1.red)) /
+                       alpha;
         EXPECT_NEAR(alpha, c.alpha, Step<P>());
         EXPECT_NEAR(color, c.color, 2 * Step<P>());
         // On a row, and halfway between two equal rows.
