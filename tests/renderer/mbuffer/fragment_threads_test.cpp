@@ -28,10 +28,10 @@ float KeyOf(int32_t layer) {
 
 void DrawRow(const void* closure, int32_t row, int32_t, int32_t thread) {
     const auto& draw = *static_cast<const LayerDraw*>(closure);
-    const PF_Pixel16 colour{32768, static_cast<uint16_t>(draw.layer), 0, 0};
+    const PF_Pixel16 color{32768, static_cast<uint16_t>(draw.layer), 0, 0};
     Buffer::Record** head = draw.buffer->HeadAt(kBounds.left, row);
     for (int32_t x = kBounds.left; x < kBounds.right; ++x, ++head)
-        draw.buffer->AddFragment(&colour, 32768, 2, KeyOf(draw.layer), head, thread);
+        draw.buffer->AddFragment(&color, 32768, 2, KeyOf(draw.layer), head, thread);
 }
 
 TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {

@@ -99,7 +99,7 @@ TYPED_TEST(MBufferDraftByDepth, CrossingLayersShowTheNearerOneAtEachPixel) {
     }
 }
 
-TYPED_TEST(MBufferDraftByDepth, KeepAlphaChangesColourNotAlpha) {
+TYPED_TEST(MBufferDraftByDepth, KeepAlphaChangesColorNotAlpha) {
     using P = TypeParam;
     PF_WorldX<P> world(2, 1);
     const P halfGrey = PixelOf<P>(0.5f, 0.5f, 0.5f, 0.5f);
@@ -190,7 +190,7 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
 // Lists of 0 to 3 opaque records over a row of five: the nearest (largest key) shows, whatever
 // the order of adding, and the empty pixel keeps what it had.
 TEST(MBufferDraft, ListsOfEveryLengthBlendFarthestFirst) {
-    const PF_Pixel8 colours[] = {{255, 255, 0, 0}, {255, 0, 255, 0}, {255, 0, 0, 255}};
+    const PF_Pixel8 colors[] = {{255, 255, 0, 0}, {255, 0, 255, 0}, {255, 0, 0, 255}};
     const int32_t lengths[] = {0, 1, 2, 3, 1};
     PF_WorldX<PF_Pixel8> world(5, 1);
     const PF_Pixel8 before{128, 10, 20, 30};
@@ -199,12 +199,12 @@ TEST(MBufferDraft, ListsOfEveryLengthBlendFarthestFirst) {
     SY_MBufferDraftX<PF_Pixel8> buffer({0, 0, 5, 1});
     for (int32_t x = 0; x < 5; ++x) {
         for (int32_t k = lengths[x] - 1; k >= 0; --k)  // nearest first
-            buffer.AddFragment(&colours[k], 255, 2, static_cast<float>(k), buffer.HeadAt(x, 0), 0);
+            buffer.AddFragment(&colors[k], 255, 2, static_cast<float>(k), buffer.HeadAt(x, 0), 0);
     }
     buffer.Resolve(nullptr, nullptr, world);
     EXPECT_TRUE(PixelIs(world.At(0, 0), before));
     for (int32_t x = 1; x < 5; ++x)
-        EXPECT_TRUE(PixelIs(world.At(x, 0), colours[lengths[x] - 1])) << "x " << x;
+        EXPECT_TRUE(PixelIs(world.At(x, 0), colors[lengths[x] - 1])) << "x " << x;
 }
 
 }  // namespace

@@ -24,8 +24,8 @@ TEST(ShadowFragments, NearestToTheLightFirstAndTiesInArrivalOrder) {
         float depth;
     } added[] = {{1, 5}, {2, 5}, {3, 9}, {4, 2}, {5, 5}};
     for (const auto& a : added) {
-        const PF_Pixel16 colour{123, a.red, 7, 8};
-        array.AddShadowFragment(&colour, a.depth, 0.5f, 0xFFFF, array.HeadAt(1, 2), 0);
+        const PF_Pixel16 color{123, a.red, 7, 8};
+        array.AddShadowFragment(&color, a.depth, 0.5f, 0xFFFF, array.HeadAt(1, 2), 0);
     }
     EXPECT_EQ(RedsAt(array, 1, 2), (std::vector<uint16_t>{3, 1, 2, 5, 4}));
     EXPECT_EQ(array.fragmentCount.load(), 5u);
@@ -47,10 +47,10 @@ TEST(ShadowFragments, EveryOccluderIsKeptEvenWithoutAlpha) {
 TEST(ShadowFragments, CompactionDropsEmptyArraysAndKeepsOrder) {
     AccountedBytesCheck memory;
     SY_ShadowFragmentArrayList list;
-    const PF_Pixel16 colour{0, 1, 1, 1};
+    const PF_Pixel16 color{0, 1, 1, 1};
     for (int32_t i = 0; i < 5; ++i) {
         SY_ShadowFragmentArray* array = list.Append({0, 0, i + 1, 1});
-        if (i % 2 == 1) array->AddShadowFragment(&colour, 1.0f, 0.0f, 0, array->HeadAt(0, 0), 0);
+        if (i % 2 == 1) array->AddShadowFragment(&color, 1.0f, 0.0f, 0, array->HeadAt(0, 0), 0);
     }
     list.Compact();
     ASSERT_EQ(list.Count(), 2);

@@ -63,9 +63,9 @@ TEST(FrameRender, WireframeOutlinesTheLayerButNotTheOutputBorder) {
 
 // A best-quality layer sampled at the nearest texel at two instants 4 pixels apart: where both
 // instants cover a pixel it is opaque, where one does alpha is halved, colour unchanged.
-TEST(FrameRender, MotionSubsamplesAverageCoverageAndKeepColour) {
-    const PF_Pixel8 colour = Opaque<PF_Pixel8>(200, 100, 50);
-    auto texture = raster_test::FilledWorld<PF_Pixel8>(8, 8, colour);
+TEST(FrameRender, MotionSubsamplesAverageCoverageAndKeepColor) {
+    const PF_Pixel8 color = Opaque<PF_Pixel8>(200, 100, 50);
+    auto texture = raster_test::FilledWorld<PF_Pixel8>(8, 8, color);
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(10, 10, 0));
     scene_test::SetPlacements(&layer, {Translation(10, 10, 0), Translation(14, 10, 0)});

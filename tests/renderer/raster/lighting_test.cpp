@@ -114,7 +114,7 @@ TEST(Lighting, DistanceFalloff) {
     }
 }
 
-TEST(Lighting, MetalDecidesTheHighlightColour) {
+TEST(Lighting, MetalDecidesTheHighlightColor) {
     // A parallel light from the eye's direction: the half vector is the normal, q = 1, and the
     // highlight is colour × specular. A red texel (1, 0, 0) shows texel × D + S.
     SY_SpecularTables tables;

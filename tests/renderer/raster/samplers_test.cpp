@@ -114,10 +114,10 @@ TYPED_TEST(Samplers, FootprintReachingTheEyePlaneIsTransparent) {
 
 // Two subsamples, the second absent: alpha is halved, the colour stays. With both absent the
 // sample is transparent.
-TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColour) {
+TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
     using P = TypeParam;
-    const P colour = {Code<P>(255), Code<P>(200), Code<P>(100), Code<P>(50)};
-    auto texture = raster_test::FilledWorld<P>(8, 8, colour);
+    const P color = {Code<P>(255), Code<P>(200), Code<P>(100), Code<P>(50)};
+    auto texture = raster_test::FilledWorld<P>(8, 8, color);
     for (int32_t quality : {0, 1}) {
         SY_SpanSubsampleState<P> state;
         StartTexture<P>(*texture, quality, false, &state.texture);
@@ -132,9 +132,9 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColour) {
         else
             SY_SampleFiltered(state, &got);
         EXPECT_NEAR(got.alpha, PF_PixelTraits<P>::kMax / 2, PF_PixelTraits<P>::kMax / 255.0);
-        EXPECT_EQ(got.red, colour.red);
-        EXPECT_EQ(got.green, colour.green);
-        EXPECT_EQ(got.blue, colour.blue);
+        EXPECT_EQ(got.red, color.red);
+        EXPECT_EQ(got.green, color.green);
+        EXPECT_EQ(got.blue, color.blue);
 
         state.mappings[0].StartAbsent();
         if (quality == 0)
