@@ -24,7 +24,7 @@ SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
 
 void StartTexture(const SY_ScreenGeometry& geometry, SY_SpanTexture* texture) {
     texture->world = geometry.texture;
-    texture->quality = geometry.quality;
+    texture->samplingFilter = geometry.samplingFilter;
     texture->sampling.src = geometry.texture;
     texture->perspective = geometry.perspective;
 }
@@ -37,7 +37,7 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     switch (target.mode) {
         case kSY_TargetDestination: {
             auto* world = static_cast<PF_World*>(target.object);
-            SY_CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
+            SY_CompositeDelivery<P> delivery(world->Row<P>(y), shader.material.mode, tables);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
@@ -45,7 +45,7 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
             auto* buffer = static_cast<SY_MBuffer*>(target.object);
             if (buffer->IsAntialiased() || buffer->HasMotionBlur()) break;
             SY_DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                                 shader.mode);
+                                                 shader.material.mode);
             SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
             break;
         }
