@@ -44,8 +44,8 @@ TEST(FrameRender, WireframeOutlinesTheLayerButNotTheOutputBorder) {
     auto texture = PatternTexture<PF_Pixel8>(40, 40);
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(40, 30, 0));
-    layer.renders = false;
-    layer.wireframe = true;
+    layer.material.renders = false;
+    layer.material.wireframe = true;
     PF_WorldX<PF_Pixel8> destination(kWidth, kHeight);
     frame.Render(&destination);
     auto white = [](const PF_Pixel8& p) {
@@ -69,8 +69,8 @@ TEST(FrameRender, MotionSubsamplesAverageCoverageAndKeepColor) {
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(10, 10, 0));
     scene_test::SetPlacements(&layer, {Translation(10, 10, 0), Translation(14, 10, 0)});
-    layer.motionBlur = true;
-    layer.bestQuality = true;
+    layer.material.motionBlur = true;
+    layer.material.bestQuality = true;
     PF_WorldX<PF_Pixel8> destination(kWidth, kHeight);
     frame.Render(&destination);
     for (int32_t x = 8; x < 24; ++x) {
@@ -146,18 +146,18 @@ void RenderMixedFrame(PF_World* plain, PF_World* large, PF_World* destination,
     frame.Layer(0, plain, Translation(2, 3, 0));
     SY_LayerDesc& turned = frame.Layer(
         1, large, scene_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
-    turned.bestQuality = true;
-    turned.engineFlag = 1;
+    turned.material.bestQuality = true;
+    turned.material.engineFlag = SY_SamplingFilter::kBilinear;
     SY_LayerDesc& bicubic = frame.Layer(2, plain, scene_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
-    bicubic.bestQuality = true;
-    bicubic.engineFlag = 2;
-    bicubic.opacity = 0.7;
-    bicubic.mode = kPF_XferMultiply;
+    bicubic.material.bestQuality = true;
+    bicubic.material.engineFlag = SY_SamplingFilter::kBicubic;
+    bicubic.material.opacity = 0.7;
+    bicubic.material.mode = kPF_XferMultiply;
     SY_LayerDesc& moving = frame.Layer(3, plain, Translation(30, 5, 0));
     scene_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
-    moving.motionBlur = true;
-    moving.bestQuality = true;
-    moving.engineFlag = 1;
+    moving.material.motionBlur = true;
+    moving.material.bestQuality = true;
+    moving.material.engineFlag = SY_SamplingFilter::kBilinear;
     frame.Render(destination, iterate);
 }
 

@@ -115,8 +115,8 @@ TYPED_TEST(LayerRender, BestQualitySamplesHalfATexelUpAndLeft) {
     auto texture = PatternTexture<P>(kTexW, kTexH);
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0));
-    layer.bestQuality = true;
-    layer.engineFlag = 1;
+    layer.material.bestQuality = true;
+    layer.material.engineFlag = SY_SamplingFilter::kBilinear;
     PF_WorldX<P> destination(kWidth, kHeight);
     frame.Render(&destination);
     // Pixel centre (x + ½, y + ½) moved by half a texel is texel (x − left, y − top)'s centre,
@@ -133,7 +133,7 @@ TYPED_TEST(LayerRender, MultiplyDarkensAKnownBackground) {
     using P = TypeParam;
     auto texture = raster_test::FilledWorld<P>(kTexW, kTexH, Opaque<P>(255, 0, 102));
     Frame frame(kWidth, kHeight, 1);
-    frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0)).mode = kPF_XferMultiply;
+    frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0)).material.mode = kPF_XferMultiply;
     auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, Opaque<P>(200, 100, 50));
     frame.Render(destination.get());
     // Multiply of opaque colours: each channel is the product in units of the maximum.
@@ -151,7 +151,7 @@ TYPED_TEST(LayerRender, HalfOpacityHalvesCoverage) {
     using P = TypeParam;
     auto texture = raster_test::FilledWorld<P>(kTexW, kTexH, Opaque<P>(255, 255, 255));
     Frame frame(kWidth, kHeight, 1);
-    frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0)).opacity = 0.5;
+    frame.Layer(0, texture.get(), Translation(kLeft, kTop, 0)).material.opacity = 0.5;
     PF_WorldX<P> destination(kWidth, kHeight);
     frame.Render(&destination);
     P got = destination.At(kLeft + 1, kTop + 1);

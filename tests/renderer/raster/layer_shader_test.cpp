@@ -26,29 +26,29 @@ TEST(LayerShader, FieldsFromTheMaterialAndTheFrame) {
     SY_RenderContext context;
     context.cameraPosition[0] = 1, context.cameraPosition[1] = 2, context.cameraPosition[2] = -3;
     SY_LayerDesc layer;
-    layer.renderIndex = 4;
-    layer.depthIndex = 4;
-    layer.mode = 0x85;
-    layer.opacity = 0.5;
-    layer.ambient = 0.1, layer.diffuse = 0.2, layer.specular = 0.3;
-    layer.lightTransmission = 0.4, layer.metal = 0.6;
-    layer.acceptsShadows = 1;
-    layer.bestQuality = true;
+    layer.material.renderIndex = 4;
+    layer.material.depthIndex = 4;
+    layer.material.mode = 0x85;
+    layer.material.opacity = 0.5;
+    layer.material.ambient = 0.1, layer.material.diffuse = 0.2, layer.material.specular = 0.3;
+    layer.material.lightTransmission = 0.4, layer.material.metal = 0.6;
+    layer.material.acceptsShadows = 1;
+    layer.material.bestQuality = true;
     SY_LightState point = Point(0, 0, -100);
     auto shader = SY_MakeLayerShader(&context, Renderable(layer, {&point}));
     EXPECT_EQ(shader->layerId, 4);
-    EXPECT_EQ(shader->mode, 0x85);
-    EXPECT_EQ(shader->opacity, 0.5);
-    EXPECT_EQ(shader->ambient, 0.1);
-    EXPECT_EQ(shader->diffuse, 0.2);
-    EXPECT_EQ(shader->specular, 0.3);
-    EXPECT_EQ(shader->lightTransmission, 0.4);
-    EXPECT_EQ(shader->metal, 0.6);
+    EXPECT_EQ(shader->material.mode, 0x85);
+    EXPECT_EQ(shader->material.opacity, 0.5);
+    EXPECT_EQ(shader->material.ambient, 0.1);
+    EXPECT_EQ(shader->material.diffuse, 0.2);
+    EXPECT_EQ(shader->material.specular, 0.3);
+    EXPECT_EQ(shader->material.lightTransmission, 0.4);
+    EXPECT_EQ(shader->material.metal, 0.6);
     EXPECT_EQ(shader->eye[0], 1);
     EXPECT_EQ(shader->eye[2], -3);
     EXPECT_FLOAT_EQ(shader->depthOffset, -4e-7f);  // later layers lie behind
-    EXPECT_EQ(shader->acceptsShadows, 1);
-    EXPECT_EQ(shader->acceptsLights, 1);
+    EXPECT_EQ(shader->material.acceptsShadows, 1);
+    EXPECT_EQ(shader->material.acceptsLights, 1);
     EXPECT_EQ(shader->softShadowLookup, 1);  // best quality filters its shadow edges
     ASSERT_EQ(shader->lights.Count(), 1);
     EXPECT_EQ(shader->lights[0], &point);
@@ -92,9 +92,9 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
         {
             SY_RenderContext context;
             SY_LayerDesc layer;
-            layer.acceptsLights = c.acceptsLights;
-            layer.acceptsShadows = c.acceptsShadows;
-            layer.specular = c.specular;
+            layer.material.acceptsLights = c.acceptsLights;
+            layer.material.acceptsShadows = c.acceptsShadows;
+            layer.material.specular = c.specular;
             SY_TRLayer renderable(layer);
             renderable.lights.Allocate(static_cast<int32_t>(c.lights.size()));
             for (size_t i = 0; i < c.lights.size(); ++i)
@@ -114,8 +114,8 @@ TEST(LayerShader, EqualShininessSharesATable) {
     SY_RenderContext context;
     SY_LightState point = Point(0, 0, -100);
     SY_LayerDesc a, b, c;
-    a.shininess = b.shininess = 30;
-    c.shininess = 60;
+    a.material.shininess = b.material.shininess = 30;
+    c.material.shininess = 60;
     auto first = SY_MakeLayerShader(&context, Renderable(a, {&point}));
     auto second = SY_MakeLayerShader(&context, Renderable(b, {&point}));
     auto third = SY_MakeLayerShader(&context, Renderable(c, {&point}));

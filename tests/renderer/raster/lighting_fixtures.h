@@ -91,7 +91,7 @@ private:
 inline std::unique_ptr<SY_LayerShader> LitShader(
     std::initializer_list<const SY_LightState*> lights) {
     auto shader = std::make_unique<SY_LayerShader>();
-    shader->acceptsLights = 1;
+    shader->material.acceptsLights = 1;
     shader->shaded = 1;
     shader->needsPoint = 1;
     shader->eye[2] = -1000;

@@ -48,16 +48,16 @@ struct RandomScene {
         shader.lights.Allocate(n);
         for (int i = 0; i < n; ++i)
             shader.lights[i] = &lights[i];
-        shader.acceptsLights = unit(random) < 0.8;
-        shader.acceptsShadows = static_cast<uint8_t>(unit(random) * 3);
+        shader.material.acceptsLights = unit(random) < 0.8;
+        shader.material.acceptsShadows = static_cast<uint8_t>(unit(random) * 3);
         shader.softShadowLookup = unit(random) < 0.5;
         shader.needsPoint = 1;
-        shader.ambient = unit(random);
-        shader.diffuse = unit(random) < 0.2 ? 0 : unit(random);
-        shader.specular = unit(random) < 0.2 ? 0 : unit(random);
-        shader.lightTransmission = unit(random) < 0.5 ? 0 : unit(random);
+        shader.material.ambient = unit(random);
+        shader.material.diffuse = unit(random) < 0.2 ? 0 : unit(random);
+        shader.material.specular = unit(random) < 0.2 ? 0 : unit(random);
+        shader.material.lightTransmission = unit(random) < 0.5 ? 0 : unit(random);
         const double metals[] = {0, 1, unit(random)};
-        shader.metal = metals[static_cast<int>(unit(random) * 3)];
+        shader.material.metal = metals[static_cast<int>(unit(random) * 3)];
         shader.specularTable = &tables.ForShininess(unit(random) * 100);
         shader.eye[0] = coordinate(random);
         shader.eye[1] = coordinate(random);
@@ -107,7 +107,7 @@ TEST(LightingPair, SameAsOnePixelBitForBit) {
                 << two[0].diffuse[0] << ", " << one[1].diffuse[0] << " vs " << two[1].diffuse[0];
             for (const SY_Lighting& out : one) {
                 highlights += out.specular[0] != 0;
-                shadowed += !setup.shader.acceptsLights && out.diffuse[0] != 1;
+                shadowed += !setup.shader.material.acceptsLights && out.diffuse[0] != 1;
             }
             pairsThatDiffer += !Same(one[0], one[1]);
         }

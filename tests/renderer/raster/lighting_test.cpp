@@ -23,12 +23,12 @@ void ExpectTriple(const float actual[3], float r, float g, float b, const char* 
 TEST(Lighting, AmbientOnly) {
     SY_LightState ambient = Ambient(1, 0.5, 0.25);
     auto shader = LitShader({&ambient});
-    shader->ambient = 0.8;
-    shader->diffuse = 1;
+    shader->material.ambient = 0.8;
+    shader->material.diffuse = 1;
     SY_Lighting out = LightAt(*shader, 10, 20, 0);
     ExpectTriple(out.diffuse, 0.8f, 0.4f, 0.2f, "colour × ambient");
     ExpectTriple(out.specular, 0, 0, 0, "no highlight");
-    shader->ambient = 0;
+    shader->material.ambient = 0;
     out = LightAt(*shader, 10, 20, 0);
     ExpectTriple(out.diffuse, 0, 0, 0, "ambient coefficient 0");
 }
@@ -51,8 +51,8 @@ TEST(Lighting, FacingAndTransmission) {
     for (const Case& c : cases) {
         SY_LightState light = Point(c.z == 0 ? 100 : 0, 0, c.z);
         auto shader = LitShader({&light});
-        shader->diffuse = 0.5;
-        shader->lightTransmission = c.transmission;
+        shader->material.diffuse = 0.5;
+        shader->material.lightTransmission = c.transmission;
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
         std::string what = "z " + std::to_string(c.z) + " t " + std::to_string(c.transmission);
         ExpectTriple(out.diffuse, c.diffuse, c.diffuse, c.diffuse, what.c_str());
@@ -78,7 +78,7 @@ TEST(Lighting, SpotCone) {
     for (const Case& c : cases) {
         SY_LightState spot = Spot(0, 0, -300, 0, 0, -1, c.cosOuter, c.cosInner);
         auto shader = LitShader({&spot});
-        shader->diffuse = 1;
+        shader->material.diffuse = 1;
         SY_Lighting out = LightAt(*shader, c.x, 0, 0);
         EXPECT_NEAR(out.diffuse[0], c.diffuse, 1e-6) << c.x << " " << c.cosOuter;
     }
@@ -108,7 +108,7 @@ TEST(Lighting, DistanceFalloff) {
         SY_LightState light = Point(0, 0, -c.d);
         SetFalloff(&light, c.type, 100, c.distance);
         auto shader = LitShader({&light});
-        shader->diffuse = 1;
+        shader->material.diffuse = 1;
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
         EXPECT_NEAR(out.diffuse[1], c.falloff, 1e-6) << c.type << " at " << c.d;
     }
@@ -131,8 +131,8 @@ TEST(Lighting, MetalDecidesTheHighlightColor) {
     };
     for (const Case& c : cases) {
         auto shader = LitShader({&light});
-        shader->specular = 1;
-        shader->metal = c.metal;
+        shader->material.specular = 1;
+        shader->material.metal = c.metal;
         shader->specularTable = &tables.ForShininess(50);
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
         const float texel[3] = {1, 0, 0};
@@ -149,8 +149,8 @@ TEST(Lighting, GrazingLightFadesTheHighlight) {
     double s = 0.005, c = std::sqrt(1 - s * s);
     SY_LightState light = Parallel(c, 0, -s);
     auto shader = LitShader({&light});
-    shader->specular = 1;
-    shader->metal = 0;
+    shader->material.specular = 1;
+    shader->material.metal = 0;
     shader->specularTable = &tables.ForShininess(0);  // cos¹ of the half-vector angle
     SY_Lighting out = LightAt(*shader, 0, 0, 0);
     // V = (0, 0, -1): q = (N·H)² / |H|² = (1 + s)² / ((c)² + (1 + s)²) = (1 + s) / 2.
@@ -183,8 +183,8 @@ TEST(Lighting, ShadowOnlyLayerIsDarkenedByShadows) {
         light.shadowMap = std::make_unique<FixedShadow>(c.t, c.t, 1);
         SY_LightState lightWithoutMap = Point(0, 0, -100);
         auto shader = LitShader({&light, &lightWithoutMap});
-        shader->acceptsLights = 0;
-        shader->acceptsShadows = 2;
+        shader->material.acceptsLights = 0;
+        shader->material.acceptsShadows = 2;
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
         ExpectTriple(out.diffuse, c.diffuse, c.diffuse, 1, std::to_string(c.darkness).c_str());
         ExpectTriple(out.specular, 0, 0, 0, "no highlight");
@@ -210,8 +210,8 @@ TEST(Lighting, ShadowsAttenuateLitLight) {
         const FixedShadow& lookups = *map;
         light.shadowMap = std::move(map);
         auto shader = LitShader({&light});
-        shader->diffuse = 1;
-        shader->acceptsShadows = 1;
+        shader->material.diffuse = 1;
+        shader->material.acceptsShadows = 1;
         shader->softShadowLookup = c.soft;
         shader->layerId = 7;
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
@@ -219,7 +219,7 @@ TEST(Lighting, ShadowsAttenuateLitLight) {
         EXPECT_EQ(lookups.softLookups, c.soft ? 1 : 0);
         EXPECT_EQ(lookups.hardLookups, c.soft ? 0 : 1);
         EXPECT_EQ(lookups.lastReceiver, 7);
-        shader->acceptsShadows = 0;  // a layer that takes no shadows is never looked up
+        shader->material.acceptsShadows = 0;  // a layer that takes no shadows is never looked up
         out = LightAt(*shader, 0, 0, 0);
         EXPECT_NEAR(out.diffuse[0], 1, 1e-6);
         EXPECT_EQ(lookups.hardLookups + lookups.softLookups, 1);
@@ -236,9 +236,9 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
         SetFalloff(&point, 2, 60, 0);
         auto shader = LitShader({&spot, &point});
         shader->eye[2] = side * 1000;
-        shader->diffuse = 0.7;
-        shader->specular = 0.6;
-        shader->metal = 0.3;
+        shader->material.diffuse = 0.7;
+        shader->material.specular = 0.6;
+        shader->material.metal = 0.3;
         shader->specularTable = &tables.ForShininess(40);
         const double n[3] = {0, 0, side};
         SY_Lighting out{};
@@ -266,7 +266,7 @@ struct Reports {
 TEST(Lighting, EyeOnTheSurfaceIsReportedAndThrown) {
     SY_LightState light = Point(0, 0, -100);
     auto shader = LitShader({&light});
-    shader->diffuse = 1;
+    shader->material.diffuse = 1;
     shader->eye[2] = 0;
     Reports::All().clear();
     U_Reporter previous = U_SetReporter(&Reports::Collect);
@@ -288,8 +288,8 @@ TEST(Lighting, LightOnTheSurfaceIsSkippedSilently) {
     SY_LightState ambient = Ambient(0.2, 0.2, 0.2);
     SY_LightState onSurface = Point(5, 5, 0);
     auto shader = LitShader({&ambient, &onSurface});
-    shader->ambient = 1;
-    shader->diffuse = 1;
+    shader->material.ambient = 1;
+    shader->material.diffuse = 1;
     Reports::All().clear();
     U_Reporter previous = U_SetReporter(&Reports::Collect);
     SY_Lighting out = LightAt(*shader, 5, 5, 0);

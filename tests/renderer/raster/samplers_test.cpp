@@ -2,6 +2,7 @@
 
 #include "raster_test_support.h"
 #include "renderer/raster/samplers.h"
+#include "renderer/scene/scene_print.h"
 
 namespace {
 
@@ -26,9 +27,10 @@ M_Matrix3 Identity() {
 }
 
 template <class P>
-void StartTexture(const PF_World& world, int32_t quality, bool perspective, SY_SpanTexture* t) {
+void StartTexture(const PF_World& world, SY_SamplingFilter filter, bool perspective,
+                  SY_SpanTexture* t) {
     t->world = &world;
-    t->quality = quality;
+    t->samplingFilter = filter;
     t->sampling.src = &world;
     t->perspective = perspective;
 }
@@ -49,7 +51,7 @@ TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
     };
     for (const Case& c : cases) {
         SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, 0, false, &state.texture);
+        StartTexture<P>(*texture, SY_SamplingFilter::kNearest, false, &state.texture);
         state.mapping.Start(Identity(), c.x, c.y, false, 1.0f);
         P got;
         SY_SampleNearest(state, &got);
@@ -63,13 +65,13 @@ TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
 TYPED_TEST(Samplers, FilteredAtATexelCentreIsTheTexelForBothQualities) {
     using P = TypeParam;
     auto texture = PatternTexture<P>(8, 8);
-    for (int32_t quality : {1, 2}) {
+    for (SY_SamplingFilter filter : {SY_SamplingFilter::kBilinear, SY_SamplingFilter::kBicubic}) {
         SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, quality, false, &state.texture);
+        StartTexture<P>(*texture, filter, false, &state.texture);
         state.mapping.Start(Identity(), 4, 3, false, 1.0f);
         P got;
         SY_SampleFiltered(state, &got);
-        EXPECT_TRUE(Equal(got, PatternTexel<P>(4, 3))) << "quality " << quality;
+        EXPECT_TRUE(Equal(got, PatternTexel<P>(4, 3))) << filter;
     }
 }
 
@@ -83,7 +85,7 @@ TYPED_TEST(Samplers, HalfATexelFootprintInterpolatesAndWiderAverages) {
         M_Matrix3 m = Identity();
         m.mat[0][0] = m.mat[1][1] = scale;
         SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, 1, false, &state.texture);
+        StartTexture<P>(*texture, SY_SamplingFilter::kBilinear, false, &state.texture);
         state.mapping.Start(m, 4 / scale, 3 / scale, false, 1.0f);
         P got;
         SY_SampleFiltered(state, &got);
@@ -102,7 +104,7 @@ TYPED_TEST(Samplers, FootprintReachingTheEyePlaneIsTransparent) {
     m.mat[1][1] = 0;
     m.mat[2][1] = 0.1;
     SY_SpanSampleState<P> state;
-    StartTexture<P>(*texture, 1, true, &state.texture);
+    StartTexture<P>(*texture, SY_SamplingFilter::kBilinear, true, &state.texture);
     state.mapping.Start(m, 0.0, 0.5, true, 1.0f);
     P got;
     SY_SampleFiltered(state, &got);
@@ -118,16 +120,16 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
     using P = TypeParam;
     const P color = {Code<P>(255), Code<P>(200), Code<P>(100), Code<P>(50)};
     auto texture = raster_test::FilledWorld<P>(8, 8, color);
-    for (int32_t quality : {0, 1}) {
+    for (SY_SamplingFilter filter : {SY_SamplingFilter::kNearest, SY_SamplingFilter::kBilinear}) {
         SY_SpanSubsampleState<P> state;
-        StartTexture<P>(*texture, quality, false, &state.texture);
+        StartTexture<P>(*texture, filter, false, &state.texture);
         state.count = 2;
         state.first = 0;
         state.last = 1;
         state.mappings[0].Start(Identity(), 4, 4, false, 0.5f);
         state.mappings[1].StartAbsent();
         P got;
-        if (quality == 0)
+        if (filter == SY_SamplingFilter::kNearest)
             SY_SampleNearest(state, &got);
         else
             SY_SampleFiltered(state, &got);
@@ -137,7 +139,7 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
         EXPECT_EQ(got.blue, color.blue);
 
         state.mappings[0].StartAbsent();
-        if (quality == 0)
+        if (filter == SY_SamplingFilter::kNearest)
             SY_SampleNearest(state, &got);
         else
             SY_SampleFiltered(state, &got);

@@ -131,15 +131,15 @@ TYPED_TEST(SpanDispatch, ShadingScalesTexelsByTheLightingTerms) {
     ambient.color[1] = ambient.color[2] = ambient.color[3] = 0.5;
     this->shader_.lights.Allocate(1);
     this->shader_.lights[0] = &ambient;
-    this->shader_.ambient = 1;
-    this->shader_.acceptsLights = 1;
+    this->shader_.material.ambient = 1;
+    this->shader_.material.acceptsLights = 1;
     this->shader_.shaded = 1;
     auto half = [](auto c) {
         double v = c * 0.5;
         return Traits::kIsFloat ? v : std::floor(v + 0.5);
     };
     for (uint8_t acceptsShadows : {0, 2}) {
-        this->shader_.acceptsShadows = acceptsShadows;
+        this->shader_.material.acceptsShadows = acceptsShadows;
         PF_WorldX<P> destination(16, 8);
         this->Draw(&destination, 1, 3, 4);  // a pair and the tail
         for (int32_t i = 1; i < 4; ++i) {

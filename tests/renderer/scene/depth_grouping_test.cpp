@@ -25,7 +25,7 @@ struct Point {
 SY_TRLayer Flat(const std::vector<Point>& polygon, double kx, double ky, double k0,
                 int32_t renderIndex = 0) {
     SY_LayerDesc layer;
-    layer.renderIndex = renderIndex;
+    layer.material.renderIndex = renderIndex;
     SY_TRLayer r(layer);
     r.subsamples.Allocate(1);
     SY_Subsample& s = r.subsamples[0];
@@ -141,14 +141,15 @@ protected:
     // the camera unless turned about y by ry (about the layer's centre).
     void Add(double x, double y, double z, double width, double height, double ry = 0) {
         SY_LayerDesc layer;
-        layer.renderIndex = layer.depthIndex = static_cast<int32_t>(renderables_.size());
+        layer.material.renderIndex = layer.material.depthIndex =
+            static_cast<int32_t>(renderables_.size());
         SetRect(&layer, 0, 0, static_cast<int32_t>(width), static_cast<int32_t>(height));
         SetPlacements(&layer,
                       {Turned(width / 2, height / 2, 0, ry, x + width / 2, y + height / 2, z)});
         M_Matrix4 camera = DefaultCamera(kWidth, kHeight, kDistance, Perspective());
         SY_SetUpOptions options;
         options.output = {0, 0, kWidth, kHeight};
-        options.depthOffset = layer.depthIndex * 1e-7;
+        options.depthOffset = layer.material.depthIndex * 1e-7;
         renderables_.emplace_back(layer);
         ASSERT_TRUE(
             SY_SetUpRenderable(layer, {&camera, 1, Perspective()}, options, &renderables_.back()));

@@ -145,7 +145,7 @@ TEST(FrameDriver, AnInjectedAllocationFailureFreesEverything) {
             scene_test::SetPlacements(&scene.layers[2], {scene_test::Translation(0, 0, 10)});
             for (int32_t i = 0; i < 3; ++i) {
                 scene_test::SetRect(&scene.layers[i], 0, 0, 32, 32);
-                scene.layers[i].renderIndex = scene.layers[i].depthIndex = i;
+                scene.layers[i].material.renderIndex = scene.layers[i].material.depthIndex = i;
                 scene.layers[i].lightIds = {0, 7};
             }
             PF_WorldX<PF_Pixel8> destination(64, 64);

@@ -192,7 +192,7 @@ TEST(LayerProjection, BestQualityQuadIsHalfAPixelLarger) {
     };
     for (const Case& c : {Case{false, 0.0}, Case{true, 0.5}}) {
         Projection p(100, 50, {Translation(50, 40, 0)});
-        p.layer.bestQuality = c.bestQuality;
+        p.layer.material.bestQuality = c.bestQuality;
         ASSERT_TRUE(p.SetUp());
         double g = c.grow;
         ExpectPolygon(
@@ -326,7 +326,7 @@ TEST(LayerProjection, MemoryFailureLeavesNothingAllocated) {
     M_Matrix4 cameras[2] = {DefaultCamera(kWidth, kHeight, kDistance, true),
                             DefaultCamera(kWidth, kHeight, kDistance, true)};
     SY_LayerDesc layer;
-    layer.bestQuality = true;
+    layer.material.bestQuality = true;
     SetRect(&layer, 0, 0, 600, 400);
     SetPlacements(&layer, {Translation(-100, -50, 0), Translation(-90, -50, 0)});
     int32_t failures = FailEachAllocationInTurn([&](auto fail) {

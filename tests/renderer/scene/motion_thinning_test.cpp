@@ -12,7 +12,7 @@ namespace {
 // original index in its camera index.
 SY_TRLayer MakeRenderable(const std::vector<bool>& valid, bool bestQuality) {
     SY_LayerDesc layer;
-    layer.bestQuality = bestQuality;
+    layer.material.bestQuality = bestQuality;
     SY_TRLayer renderable(layer);
     renderable.subsamples.Allocate(static_cast<int32_t>(valid.size()));
     for (int32_t i = 0; i < renderable.subsamples.Count(); ++i) {

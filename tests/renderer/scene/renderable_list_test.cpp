@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "renderer/scene/light_state.h"
+#include "renderer/scene/scene_print.h"
 #include "tests/renderer/scene/scene_fixtures.h"
 #include "u_memory.h"
 
@@ -30,7 +31,8 @@ protected:
     SY_LayerDesc& AddLayer(double x) {
         layers_.emplace_back();
         SY_LayerDesc& layer = layers_.back();
-        layer.renderIndex = layer.depthIndex = static_cast<int32_t>(layers_.size()) - 1;
+        layer.material.renderIndex = layer.material.depthIndex =
+            static_cast<int32_t>(layers_.size()) - 1;
         SetRect(&layer, 0, 0, 20, 20);
         SetPlacements(&layer, {Translation(x, 40, 0)});
         return layer;
@@ -71,10 +73,10 @@ TEST_F(RenderableList, KeepsTheLayersThatAreDrawnInRenderOrder) {
     std::vector<int32_t> expected;
     for (const Case& c : cases) {
         SY_LayerDesc& layer = AddLayer(50);
-        layer.opacity = c.opacity;
-        layer.renders = c.renders;
-        layer.wireframe = c.wireframe;
-        if (c.kept) expected.push_back(layer.renderIndex);
+        layer.material.opacity = c.opacity;
+        layer.material.renders = c.renders;
+        layer.material.wireframe = c.wireframe;
+        if (c.kept) expected.push_back(layer.material.renderIndex);
     }
     // A layer seen edge-on and one behind the camera are dropped by their set-up.
     SetPlacements(&AddLayer(0), {Turned(10, 10, 0, M_PI / 2, 200, 150, 0)});
@@ -89,7 +91,7 @@ TEST_F(RenderableList, KeepsTheLayersThatAreDrawnInRenderOrder) {
 }
 
 TEST_F(RenderableList, MotionBlurredLayersFollowTheCameraSubsamples) {
-    AddLayer(50).motionBlur = true;
+    AddLayer(50).material.motionBlur = true;
     AddLayer(100);
     SY_Renderables renderables;
     SY_BuildRenderables(Sources(), &renderables);
@@ -109,7 +111,7 @@ TEST_F(RenderableList, MotionBlurredLayersFollowTheCameraSubsamples) {
 
 TEST_F(RenderableList, DepthIndexSeparatesACoplanarStack) {
     AddLayer(50);
-    AddLayer(50).depthIndex = 3;
+    AddLayer(50).material.depthIndex = 3;
     SY_Renderables renderables;
     SY_BuildRenderables(Sources(), &renderables);
     ASSERT_EQ(renderables.size(), 2u);
@@ -162,12 +164,12 @@ TEST_F(RenderableList, CopiesMaterialFlagsAndBorrowsTheTrackMatte) {
         bool OutsideIsClear() const override { return false; }
     };
     SY_LayerDesc& layer = AddLayer(50);
-    layer.mode = 5;
-    layer.opacity = 0.25;
-    layer.shininess = 40;
-    layer.castsShadows = true;
-    layer.acceptsShadows = 2;
-    layer.engineFlag = 2;
+    layer.material.mode = 5;
+    layer.material.opacity = 0.25;
+    layer.material.shininess = 40;
+    layer.material.castsShadows = true;
+    layer.material.acceptsShadows = 2;
+    layer.material.engineFlag = SY_SamplingFilter::kBicubic;
     layer.collapsed = true;
     layer.trackMatte = std::make_unique<Matte>();
     layer.lightIds = {1};
@@ -182,7 +184,7 @@ TEST_F(RenderableList, CopiesMaterialFlagsAndBorrowsTheTrackMatte) {
     EXPECT_EQ(r.material.shininess, 40);
     EXPECT_TRUE(r.material.castsShadows);
     EXPECT_EQ(r.material.acceptsShadows, 2);
-    EXPECT_EQ(r.material.engineFlag, 2);
+    EXPECT_EQ(r.material.engineFlag, SY_SamplingFilter::kBicubic);
     EXPECT_TRUE(r.collapsed);
     EXPECT_FALSE(r.unbounded);
     EXPECT_EQ(r.trackMatte, layer.trackMatte.get());
@@ -194,7 +196,7 @@ TEST_F(RenderableList, MemoryFailureLeavesNothingAllocated) {
     lights_.resize(1);
     for (int i = 0; i < 4; ++i) {
         SY_LayerDesc& layer = AddLayer(30 + 40 * i);
-        layer.motionBlur = i % 2 == 1;
+        layer.material.motionBlur = i % 2 == 1;
         layer.lightIds = {0};
     }
     int32_t failures = FailEachAllocationInTurn([&](auto fail) {

@@ -7,6 +7,7 @@
 #include "memory_texture_fetcher.h"
 #include "renderer/scene/layer_projection.h"
 #include "renderer/scene/render_context.h"
+#include "renderer/scene/scene_print.h"
 #include "renderer/scene/screen_geometry.h"
 #include "scene_fixtures.h"
 
@@ -65,20 +66,22 @@ struct Fixture {
 
 TEST(ScreenGeometry, TheZoomPlaneMapsPixelCentresOneToOne) {
     struct Case {
-        int32_t quality;
+        SY_SamplingFilter filter;
         double shift;  // filtered samplers read half a texel up and to the left
     };
-    for (const Case& c : {Case{0, 0.0}, Case{1, -0.5}, Case{2, -0.5}}) {
+    for (const Case& c :
+         {Case{SY_SamplingFilter::kNearest, 0.0}, Case{SY_SamplingFilter::kBilinear, -0.5},
+          Case{SY_SamplingFilter::kBicubic, -0.5}}) {
         Fixture f;
         SY_GeometryFlags flags;
-        flags.quality = c.quality;
+        flags.samplingFilter = c.filter;
         f.Build(scene_test::Translation(30, 20, 0), flags);
         ASSERT_FALSE(f.geometry.Empty());
         for (auto [x, y] : {std::pair{30.5, 20.5}, std::pair{93.5, 51.5}}) {
             double u, v;
             f.TextureAt(x, y, &u, &v);
-            EXPECT_NEAR(u, x - 30 + c.shift, 1e-9) << "quality " << c.quality;
-            EXPECT_NEAR(v, y - 20 + c.shift, 1e-9) << "quality " << c.quality;
+            EXPECT_NEAR(u, x - 30 + c.shift, 1e-9) << c.filter;
+            EXPECT_NEAR(v, y - 20 + c.shift, 1e-9) << c.filter;
         }
         EXPECT_NEAR(f.geometry.projectionW, 1 / kDistance, 1e-15);
     }

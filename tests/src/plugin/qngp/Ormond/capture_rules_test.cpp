@@ -9,6 +9,7 @@
 #include "layer_capture.h"
 #include "light_capture.h"
 #include "m_matrix.h"
+#include "renderer/scene/scene_print.h"
 #include "resources/shadow_map_sizes.h"
 #include "u_memory.h"
 
@@ -179,11 +180,12 @@ TEST(LayerQuality, QualityAndShadowStreamsSetTheSwitches) {
     };
     for (const Case& c : kCases) {
         SY_LayerDesc l;
-        ORM_ApplyQuality(c.quality, c.streams, &l);
-        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
-                           l.acceptsLights, l.bestQuality, l.mode),
+        ORM_ApplyQuality(c.quality, c.streams, &l.material);
+        EXPECT_EQ(Switches(l.material.renders, l.material.wireframe, l.material.castsShadows,
+                           l.material.acceptsShadows, l.material.acceptsLights,
+                           l.material.bestQuality, l.material.mode),
                   c.switches)
-            << c.name;
+            << c.name << ": " << l.material;
     }
 }
 
