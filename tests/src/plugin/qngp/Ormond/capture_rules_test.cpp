@@ -1,9 +1,11 @@
-// The rules scene capture applies to what the host reports: camera matrices and transfer modes.
+// The rules scene capture applies to what the host reports: camera matrices, shadow map sizes
+// and transfer modes.
 #include <gtest/gtest.h>
 
 #include "camera_capture.h"
 #include "layer_capture.h"
 #include "m_matrix.h"
+#include "resources/shadow_map_sizes.h"
 
 namespace {
 
@@ -63,6 +65,13 @@ TEST(CameraPair, EyeAndScreenFollowTheViewAndTheCameraLayer) {
         EXPECT_DOUBLE_EQ(out[0] / out[3], c.screen[0]);
         EXPECT_DOUBLE_EQ(out[1] / out[3], c.screen[1]);
     }
+}
+
+// A project saved by a later version may carry a choice the popup does not have.
+TEST(ShadowMapSize, ChoiceOutsideThePopupIsCompSize) {
+    for (int32_t choice : {-1, 0, 9})
+        EXPECT_EQ(ORM_ShadowMapSize(choice), 0) << choice;
+    EXPECT_EQ(ORM_ShadowMapSize(8), 4000);
 }
 
 TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {

@@ -41,9 +41,8 @@ public:
     // The answer to a suite it does not serve; 0 answers success with a null suite.
     void SetMissingError(int32_t error) { missingError_ = error; }
     const QNGP_BasicSuite* Basic() const { return &kBasic; }
-    // Suites acquired and not yet released, and those released, in order.
+    // Suites acquired and not yet released; a release of a suite it does not serve is ignored.
     int32_t Held() const { return held_; }
-    const std::vector<std::pair<std::string, int32_t>>& Released() const { return released_; }
 
     QNGP_MemHandle Make(std::vector<uint8_t> bytes) {
         auto block = std::make_unique<Block>(Block{std::move(bytes)});
@@ -73,8 +72,7 @@ private:
         return 0;
     }
     static int32_t Release(const char* name, int32_t version) {
-        --current()->held_;
-        current()->released_.emplace_back(name, version);
+        current()->held_ -= current()->suites_.count({name, version}) ? 1 : 0;
         return 0;
     }
     static int32_t NewHandle(int32_t, const char*, uint32_t size, int32_t, QNGP_MemHandle* handle) {
@@ -112,7 +110,6 @@ private:
     std::map<std::pair<std::string, int32_t>, const void*> suites_;
     int32_t missingError_ = kQNGP_ErrMissingSuite;
     int32_t held_ = 0;
-    std::vector<std::pair<std::string, int32_t>> released_;
     std::map<QNGP_MemHandle, std::unique_ptr<Block>> blocks_;
     int32_t failNew_ = 0;
     std::vector<std::string> reports_;
