@@ -88,19 +88,6 @@ TEST(FrameDriver, IdenticalCameraSubsamplesCollapseToOne) {
     EXPECT_EQ(moving.worldToScreen.Count(), 5);
 }
 
-TEST(FrameDriver, WorldToScreenMapsTheZoomPlaneOneToOne) {
-    SY_SceneDesc scene;
-    SetDefaultCamera(&scene, 640, 480, 800);
-    SY_RenderContext context;
-    SY_SetUpContext(&context, scene, nullptr, nullptr, nullptr, false, nullptr);
-    double world[4] = {17, 23, 0, 1}, screen[4];
-    M_TransformVector4NoDivide(&context.frameWorldToScreen[0], world, screen);
-    EXPECT_NEAR(screen[0] / screen[3], 17, 1e-9);
-    EXPECT_NEAR(screen[1] / screen[3], 23, 1e-9);
-    EXPECT_DOUBLE_EQ(context.cameraPosition[2], -800);
-    EXPECT_DOUBLE_EQ(context.cameraAxis[2], 1);
-}
-
 TEST(FrameDriver, AFrameWithoutLayersLeavesTheDestinationUntouched) {
     int64_t start = U_AccountedBytes();
     {

@@ -12,68 +12,58 @@ namespace {
 using ostrel_test::RecordingProgress;
 using ostrel_test::ThreadedIterateSuite;
 
-std::vector<int32_t> RowsDrawn(int32_t fieldMode, int32_t rows, RecordingProgress* progress) {
-    std::vector<int32_t> drawn;
-    SY_RowWork work{
-        &PF_IterateGeneric_Static,
-        progress,
-        0,
-        rows,
-        fieldMode,
-        [](const void* closure, int32_t row, int32_t, int32_t) {
-            static_cast<std::vector<int32_t>*>(const_cast<void*>(closure))->push_back(row);
-        },
-        &drawn};
-    SY_RunRowWork(work);
-    return drawn;
+// Runs work over `rows` rows in a field mode and returns the rows drawn; row `failing` throws 4.
+std::vector<int32_t> RowsDrawn(int32_t fieldMode, int32_t rows, RecordingProgress* progress,
+                               int32_t failing = -1) {
+    struct Closure {
+        std::vector<int32_t> drawn;
+        int32_t failing;
+    } closure{{}, failing};
+    SY_RowWork work{&PF_IterateGeneric_Static,
+                    progress,
+                    0,
+                    rows,
+                    fieldMode,
+                    [](const void* c, int32_t row, int32_t, int32_t) {
+                        auto* self = static_cast<Closure*>(const_cast<void*>(c));
+                        if (row == self->failing) throw int32_t{4};
+                        self->drawn.push_back(row);
+                    },
+                    &closure};
+    try {
+        SY_RunRowWork(work);
+    } catch (int32_t code) {
+        closure.drawn.push_back(-code);  // the rethrown code, after the rows drawn
+    }
+    return closure.drawn;
 }
 
-TEST(RowWork, FieldModesSkipRows) {
+TEST(RowWork, FieldModesSkipRowsAndProgressComesEveryFourthRow) {
+    using Reports = std::vector<std::pair<int32_t, int32_t>>;
     struct Case {
-        int32_t fieldMode;
-        std::vector<int32_t> rows;
+        int32_t fieldMode, rows;
+        std::vector<int32_t> drawn;
+        Reports progress;
     };
-    const Case cases[] = {{0, {0, 1, 2, 3, 4}}, {1, {0, 2, 4}}, {2, {1, 3}}};
-    for (const Case& c : cases) {
+    const Case kCases[] = {
+        {0, 5, {0, 1, 2, 3, 4}, {{0, 5}, {4, 5}}},
+        {1, 5, {0, 2, 4}, {{0, 5}, {4, 5}}},
+        {2, 5, {1, 3}, {}},
+        {0, 10, {0, 1, 2, 3, 4, 5, 6, 7, 8, 9}, {{0, 10}, {4, 10}, {8, 10}}},
+        {0, 1, {0}, {{0, 1}}},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(testing::Message()
+                     << "field mode " << c.fieldMode << ", " << c.rows << " rows");
         RecordingProgress progress;
-        EXPECT_EQ(RowsDrawn(c.fieldMode, 5, &progress), c.rows) << "field mode " << c.fieldMode;
+        EXPECT_EQ(RowsDrawn(c.fieldMode, c.rows, &progress), c.drawn);
+        EXPECT_EQ(progress.rows, c.progress);
     }
 }
 
-TEST(RowWork, ProgressEveryFourthRowFromThreadZero) {
-    RecordingProgress progress;
-    RowsDrawn(0, 10, &progress);
-    using Report = std::pair<int32_t, int32_t>;
-    EXPECT_EQ(progress.rows, (std::vector<Report>{{0, 10}, {4, 10}, {8, 10}}));
-    RecordingProgress single;
-    RowsDrawn(0, 1, &single);
-    EXPECT_EQ(single.rows, (std::vector<Report>{{0, 1}}));
-}
-
 TEST(RowWork, TheFirstFailureStopsTheRestAndIsRethrown) {
-    int32_t drawn = 0;
     RecordingProgress progress;
-    SY_RowWork work{&PF_IterateGeneric_Static,
-                    &progress,
-                    0,
-                    10,
-                    0,
-                    [](const void* closure, int32_t row, int32_t, int32_t) {
-                        if (row == 3) throw int32_t{4};
-                        ++*static_cast<int32_t*>(const_cast<void*>(closure));
-                    },
-                    &drawn};
-    EXPECT_THROW(
-        {
-            try {
-                SY_RunRowWork(work);
-            } catch (int32_t code) {
-                EXPECT_EQ(code, 4);
-                throw;
-            }
-        },
-        int32_t);
-    EXPECT_EQ(drawn, 3);
+    EXPECT_EQ(RowsDrawn(0, 10, &progress, 3), (std::vector<int32_t>{0, 1, 2, -4}));
 }
 
 // Items that share a counter through the allocation lock, as fragment pools share blocks.

@@ -80,42 +80,4 @@ TEST(SpanTable, NegativeRowsAndColumnsRoundOutward) {
     EXPECT_EQ(Rows(table), (std::vector<Row>{{-3, 1}, {-3, 1}, {-3, 1}}));
 }
 
-SY_Subsample Square(double left, double top, double size) {
-    SY_Subsample s;
-    s.plane[2] = -1;
-    s.vertices = {{left, top, 1, 1},
-                  {left + size, top, 1, 1},
-                  {left + size, top + size, 1, 1},
-                  {left, top + size, 1, 1}};
-    return s;
-}
-
-TEST(SpanTable, CoveredPolygonIsTheAreaSweptOverTheShutter) {
-    SY_LayerDesc layer;
-    // One subsample: its own polygon.
-    {
-        SY_TRLayer renderable(layer);
-        renderable.subsamples.Allocate(1);
-        renderable.subsamples[0] = Square(2, 2, 2);
-        SY_AccountedVector<M_Point2> polygon;
-        SY_CoveredPolygon(renderable, &polygon);
-        EXPECT_EQ(polygon.size(), 4u);
-    }
-    // A square moving diagonally from (2, 2) to (6, 6) sweeps a hexagon; an absent subsample in
-    // between adds nothing.
-    SY_TRLayer renderable(layer);
-    renderable.subsamples.Allocate(3);
-    renderable.subsamples[0] = Square(2, 2, 2);
-    renderable.subsamples[2] = Square(6, 6, 2);
-    SY_AccountedVector<M_Point2> polygon;
-    SY_CoveredPolygon(renderable, &polygon);
-    EXPECT_EQ(polygon.size(), 6u);
-    SY_SpanTable table;
-    SY_BuildSpanTable(polygon.data(), static_cast<int32_t>(polygon.size()), &table);
-    EXPECT_EQ(table.firstRow, 2);
-    // Hexagon (2,2) (4,2) (8,6) (8,8) (6,8) (2,4): the right side runs x = y + 2 from row 2 to
-    // 5, the left side x = y − 2 from row 4 on.
-    EXPECT_EQ(Rows(table), (std::vector<Row>{{2, 5}, {2, 6}, {2, 7}, {3, 8}, {4, 8}, {5, 8}}));
-}
-
 }  // namespace
