@@ -8,7 +8,6 @@
 #include <vector>
 
 #include "tests/renderer/scene/scene_fixtures.h"
-#include "u_memory.h"
 
 namespace {
 
@@ -26,11 +25,9 @@ SY_TRLayer Flat(const std::vector<Point>& polygon, double kx, double ky, double 
     SY_TRLayer r(layer);
     r.subsamples.Allocate(1);
     SY_Subsample& s = r.subsamples[0];
-    double length = std::sqrt(kx * kx + ky * ky + 1);
-    s.plane[0] = kx / length;
-    s.plane[1] = ky / length;
-    s.plane[2] = -1 / length;
-    s.plane[3] = k0 / length;
+    const double plane[4] = {kx, ky, -1, k0}, length = std::sqrt(kx * kx + ky * ky + 1);
+    for (int i = 0; i < 4; ++i)
+        s.plane[i] = plane[i] / length;
     for (const Point& p : polygon) {
         double z = kx * p.x + ky * p.y + k0;
         s.vertices.push_back({p.x, p.y, z, 1});
@@ -67,19 +64,14 @@ TEST(DepthRelation, SamplesWherePolygonsMeet) {
     const std::vector<Point> upper{{0, 0}, {10, 0}, {0, 10}}, lower{{10, 0}, {10, 10}, {0, 10}};
     const Case cases[] = {
         {"A behind B", s0, {0, 0, 1}, s5, {0, 0, 2}, nearer, true, false},
-        {"B behind A", s0, {0, 0, 2}, s5, {0, 0, 1}, nearer, false, true},
         {"boxes only touch", s0, {0, 0, 1}, Square(10, 0, 10), {0, 0, 2}, nearer, false, false},
-        {"apart", s0, {0, 0, 1}, Square(30, 30, 10), {0, 0, 2}, nearer, false, false},
         {"crossing in depth", big, {0.01, 0, 0}, big, {0, 0, 0.5}, nearer, true, true},
         {"level", s0, {0, 0, 1}, s5, {0, 0, 1}, nearer, true, true},
-        {"level within 1e-12", s0, {0, 0, 1}, s5, {0, 0, 1 + 1e-13}, nearer, true, true},
         {"coplanar, B a step behind", s0, {0, 0, 1}, s5, {0, 0, 1 - 1e-7}, nearer, false, true},
         {"B inside A, no edges meet", big, {0, 0, 1}, s40, {0, 0, 2}, nearer, true, false},
-        {"A inside B, no edges meet", s40, {0, 0, 1}, big, {0, 0, 2}, nearer, true, false},
         {"triangles sharing a diagonal", upper, {0, 0, 1}, lower, {0, 0, 2}, nearer, true, false},
         // Orthographic depths are eye depths: A at 500 is behind B at 300.
         {"orthographic, A behind B", s0, {0, 0, 500}, s5, {0, 0, 300}, farther, true, false},
-        {"orthographic, B behind A", s0, {0, 0, 300}, s5, {0, 0, 500}, farther, false, true},
     };
     for (const Case& c : cases) {
         SCOPED_TRACE(c.name);
@@ -91,9 +83,17 @@ TEST(DepthRelation, SamplesWherePolygonsMeet) {
     }
 }
 
-// Render indices of each group, in drawing order.
-std::vector<std::vector<int32_t>> Indices(const SY_RenderableGroups& groups) {
-    std::vector<std::vector<int32_t>> result;
+using Groups = std::vector<std::vector<int32_t>>;
+
+// The render indices of each group the renderables are cut into, in drawing order.
+Groups Group(std::deque<SY_TRLayer>& renderables) {
+    std::vector<SY_TRLayer*> list;
+    for (SY_TRLayer& r : renderables)
+        list.push_back(&r);
+    SY_RenderableGroups groups;
+    SY_GroupByDepth(list.data(), static_cast<int32_t>(list.size()), SY_DepthSense::kLargerIsNearer,
+                    &groups);
+    Groups result;
     for (const SY_RenderableGroup& group : groups) {
         result.emplace_back();
         for (const SY_TRLayer* r : group)
@@ -102,41 +102,16 @@ std::vector<std::vector<int32_t>> Indices(const SY_RenderableGroups& groups) {
     return result;
 }
 
-using Groups = std::vector<std::vector<int32_t>>;
-
-Groups Group(std::deque<SY_TRLayer>& renderables, SY_DepthSense sense) {
-    std::vector<SY_TRLayer*> list;
-    for (SY_TRLayer& r : renderables)
-        list.push_back(&r);
-    SY_RenderableGroups groups;
-    SY_GroupByDepth(list.data(), static_cast<int32_t>(list.size()), sense, &groups);
-    return Indices(groups);
-}
-
-// A: top strip, depth rising to the right (up to 1); B: right strip at depth 1.1; C: diagonal
-// strip from the top-left corner (depth −0.5) to the bottom-right one (1.5). A is behind B at the
-// top right, B behind C at the bottom right, C behind A at the top left.
-std::deque<SY_TRLayer> CycleOfThree() {
+TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
+    // A: top strip, depth rising to the right (up to 1); B: right strip at depth 1.1; C: diagonal
+    // strip from the top-left corner (depth −0.5) to the bottom-right one (1.5). A is behind B at
+    // the top right, B behind C at the bottom right, C behind A at the top left.
     std::deque<SY_TRLayer> renderables;
     renderables.push_back(Flat({{0, 0}, {100, 0}, {100, 10}, {0, 10}}, 0.01, 0, 0, 0));
     renderables.push_back(Flat({{90, 0}, {100, 0}, {100, 100}, {90, 100}}, 0, 0, 1.1, 1));
     renderables.push_back(
         Flat({{0, 0}, {10, 0}, {100, 90}, {100, 100}, {90, 100}, {0, 10}}, 0.01, 0.01, -0.5, 2));
-    return renderables;
-}
-
-TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
-    std::deque<SY_TRLayer> renderables = CycleOfThree();
-    const auto sense = SY_DepthSense::kLargerIsNearer;
-    SY_DrawOrder ab = SY_RelateRenderables(renderables[0], renderables[1], sense);
-    SY_DrawOrder bc = SY_RelateRenderables(renderables[1], renderables[2], sense);
-    SY_DrawOrder ca = SY_RelateRenderables(renderables[2], renderables[0], sense);
-    EXPECT_TRUE(ab.aFirst && !ab.bFirst);
-    EXPECT_TRUE(bc.aFirst && !bc.bFirst);
-    EXPECT_TRUE(ca.aFirst && !ca.bFirst);
-    Groups groups = Group(renderables, sense);
-    ASSERT_EQ(groups.size(), 1u);
-    EXPECT_EQ(groups[0], (std::vector<int32_t>{0, 2, 1}));
+    EXPECT_EQ(Group(renderables), (Groups{{0, 2, 1}}));
 }
 
 TEST(DepthGroupingCut, LongChainNeedsNoDeepRecursion) {
@@ -144,14 +119,12 @@ TEST(DepthGroupingCut, LongChainNeedsNoDeepRecursion) {
     // goes 3000 deep and the groups come out back to front.
     constexpr int32_t kCount = 3000;
     std::deque<SY_TRLayer> renderables;
+    Groups expected;
     for (int32_t i = 0; i < kCount; ++i) {
         renderables.push_back(Flat(Square(i, 0, 2), 0, 0, -i, i));
+        expected.push_back({kCount - 1 - i});
     }
-    Groups groups = Group(renderables, SY_DepthSense::kLargerIsNearer);
-    ASSERT_EQ(groups.size(), static_cast<size_t>(kCount));
-    for (int32_t i = 0; i < kCount; ++i) {
-        EXPECT_EQ(groups[static_cast<size_t>(i)], (std::vector<int32_t>{kCount - 1 - i}));
-    }
+    EXPECT_EQ(Group(renderables), expected);
 }
 
 }  // namespace

@@ -17,11 +17,7 @@ constexpr int32_t kWidth = 200, kHeight = 100;
 // geometry of a 64 × 32 layer built in it.
 struct Fixture {
     explicit Fixture(const M_Matrix4& placement) {
-        ostrel_test::SetDefaultCamera(&scene, kWidth, kHeight, 400);
-        M_IdentityMatrix4(&scene.frameProjection);
-        M_TranslateMatrix4(kWidth / 2.0, kHeight / 2.0, 0, &scene.frameProjection);
-        scene.cameraProjections[0] = scene.frameProjection;
-        scene.perspective = false;
+        ostrel_test::SetDefaultCamera(&scene, kWidth, kHeight, 400, 1, false);
         SY_SetUpContext(&context, scene, &fetcher, nullptr, nullptr, false, nullptr);
         fetcher.Add(0, &texture);
         scene_test::SetPlacements(&layer, {placement});
