@@ -52,8 +52,11 @@ TEST(RenderableList, KeepsTheLayersThatAreDrawnInRenderOrder) {
     SY_Renderables renderables;
     SY_BuildRenderables(sources, &renderables);
     std::vector<int32_t> kept;
-    for (const SY_TRLayer& r : renderables)
+    for (const SY_TRLayer& r : renderables) {
         kept.push_back(r.material.renderIndex);
+        // Coplanar layers step 1e-7 farther per depth index, so that the stack keeps its order.
+        EXPECT_NEAR(r.subsamples[0].vertices[0].z, 1 - 1e-7 * r.material.renderIndex, 1e-12);
+    }
     EXPECT_EQ(kept, expected);
 }
 

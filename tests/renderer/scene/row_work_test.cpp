@@ -44,7 +44,6 @@ TEST(RowWork, FieldModesSkipRowsProgressComesEveryFourthRowAndAFailureStopsTheRe
         {1, 5, -1, {0, 2, 4}, {{0, 5}, {4, 5}}},
         {2, 5, -1, {1, 3}, {}},
         {0, 10, -1, {0, 1, 2, 3, 4, 5, 6, 7, 8, 9}, {{0, 10}, {4, 10}, {8, 10}}},
-        {0, 1, -1, {0}, {{0, 1}}},
         {0, 10, 3, {0, 1, 2, -4}, {{0, 10}}},
     };
     for (const Case& c : kCases) {

@@ -48,8 +48,7 @@ TEST(SpanTable, CoversEveryPixelThePolygonTouches) {
          {{4, 6}, {2, 8}, {1, 9}, {0, 10}, {1, 9}, {2, 8}, {4, 6}}},
         // Negative rows and columns round outward too.
         {{{-2.5, -1.5}, {0.5, -1.5}, {0.5, 0.5}, {-2.5, 0.5}}, -2, {{-3, 1}, {-3, 1}, {-3, 1}}},
-        // Only a line: no rows.
-        {{{1, 2}, {5, 2}}, 0, {}},
+        {{{1, 2}, {5, 2}}, 0, {}},  // only a line: no rows
         {{}, 0, {}},
     };
     int64_t start = U_AccountedBytes();
