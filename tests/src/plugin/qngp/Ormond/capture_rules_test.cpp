@@ -67,11 +67,12 @@ TEST(CameraPair, EyeAndScreenFollowTheViewAndTheCameraLayer) {
     }
 }
 
-// A project saved by a later version may carry a choice the popup does not have.
-TEST(ShadowMapSize, ChoiceOutsideThePopupIsCompSize) {
-    for (int32_t choice : {-1, 0, 9})
-        EXPECT_EQ(ORM_ShadowMapSize(choice), 0) << choice;
-    EXPECT_EQ(ORM_ShadowMapSize(8), 4000);
+// The popup's labels read their sizes; a project saved by a later version may carry a choice
+// the popup does not have, which is the comp size.
+TEST(ShadowMapSize, ChoiceReadsItsPopupLabel) {
+    const int32_t kSizes[] = {0, 0, 250, 500, 750, 1000, 1500, 2000, 3000, 4000, 0};
+    for (int32_t choice = -1; choice <= 9; ++choice)
+        EXPECT_EQ(ORM_ShadowMapSize(choice), kSizes[choice + 1]) << "choice " << choice;
 }
 
 TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
@@ -92,6 +93,17 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
     for (const Case& c : kCases) {
         SCOPED_TRACE(testing::Message() << "mode " << c.mode << " flags " << c.flags);
         EXPECT_EQ(ORM_StoredTransferMode({c.mode, c.flags, 0}, c.engine), c.stored);
+    }
+}
+
+// Only best is best quality; the accepts-shadows stream is a popup index, truncated.
+TEST(LayerQuality, DraftIsNotBestAndAcceptsShadowsTruncates) {
+    for (int16_t quality : {1, 2}) {
+        SY_LayerDesc l;
+        ORM_ApplyQuality(quality, {0, 1.7, 1}, &l);
+        EXPECT_EQ(l.bestQuality, quality == 2) << "quality " << quality;
+        EXPECT_TRUE(l.renders && l.acceptsLights && !l.castsShadows);
+        EXPECT_EQ(l.acceptsShadows, 1);
     }
 }
 

@@ -1,5 +1,4 @@
-// The built library as the host sees it: the entry is exported by name and nothing of ours is,
-// so that it cannot clash with what the host or another plug-in defines.
+// The built library exports its entry and nothing else that could clash with the host's.
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 
