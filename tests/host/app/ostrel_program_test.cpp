@@ -15,8 +15,7 @@
 namespace ostrel {
 namespace {
 
-const std::filesystem::path kExamples =
-    std::filesystem::path(__FILE__).parent_path() / ".." / ".." / ".." / "examples";
+const std::filesystem::path kExamples = OSTREL_EXAMPLES_DIR;
 
 struct Outcome {
     int status;
