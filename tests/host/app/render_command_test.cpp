@@ -19,7 +19,8 @@
 namespace ostrel {
 namespace {
 
-const std::filesystem::path kCards = std::filesystem::path(OSTREL_EXAMPLES_DIR) / "cards" / "cards.json";
+const std::filesystem::path kCards =
+    std::filesystem::path(OSTREL_EXAMPLES_DIR) / "cards" / "cards.json";
 
 RenderOptions OptionsFor(const std::filesystem::path& comp, const TempFolder& folder) {
     RenderOptions options;
