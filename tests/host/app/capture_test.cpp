@@ -2,7 +2,6 @@
 // in the renderer's scene record.
 #include <gtest/gtest.h>
 
-#include <cmath>
 #include <tuple>
 
 #include "instance_options.h"
@@ -16,7 +15,6 @@
 #include "suites/suite_errors.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
-#include "world_pixels.h"
 
 namespace ostrel {
 namespace {
@@ -24,11 +22,11 @@ namespace {
 // The instance options as the plug-in keeps them, in a memory handle freed with the object.
 class Options {
 public:
-    explicit Options(int32_t shadowMapSizeChoice) {
+    Options() {
         MemorySuite()->NewHandle(1, "options", sizeof(ORM_InstanceOptions), 1, &handle_);
         void* bytes = nullptr;
         MemorySuite()->LockHandle(handle_, &bytes);
-        *static_cast<ORM_InstanceOptions*>(bytes) = {1, 0, shadowMapSizeChoice, 0};
+        *static_cast<ORM_InstanceOptions*>(bytes) = {1, 0, 0, 0};
         MemorySuite()->UnlockHandle(handle_);
     }
     ~Options() { MemorySuite()->FreeHandle(handle_); }
@@ -54,24 +52,11 @@ protected:
         ORM_UnregisterStrings();
     }
 
-    // Scene assembly of the frame, as the render entry runs it.
-    static void Assemble(ServedFrame& frame, SY_SceneDesc* scene, int32_t shadowChoice = 0) {
-        Frame(frame, shadowChoice).Assemble(scene);
-    }
-
-    // The whole frame as the host calls the plug-in for it.
-    static int32_t RenderThroughTheEntry(ServedFrame& frame) {
-        Options options(0);
-        return ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
-                          nullptr);
-    }
-
     // The render context of a frame for as long as a test needs it, as the render entry makes it.
     class Frame {
     public:
-        explicit Frame(ServedFrame& frame, int32_t shadowChoice = 0)
-            : options_(shadowChoice),
-              context_(&kInData,
+        explicit Frame(ServedFrame& frame)
+            : context_(&kInData,
                        {nullptr, nullptr, frame.Render(), nullptr, options_.Get(), nullptr}) {}
         void Assemble(SY_SceneDesc* scene) { ORM_AssembleScene(context_, scene); }
 
@@ -79,6 +64,9 @@ protected:
         Options options_;
         ORM_RenderContext context_;
     };
+
+    // Scene assembly of the frame, as the render entry runs it.
+    static void Assemble(ServedFrame& frame, SY_SceneDesc* scene) { Frame(frame).Assemble(scene); }
 };
 
 // The comp's sample count as a test sets it, for counts a composition file cannot hold.
@@ -134,19 +122,6 @@ TEST_F(Capture, SampleCountsClampedToTwoToSixtyFour) {
         // The card without its own motion-blur switch keeps one transform.
         EXPECT_EQ(scene.layers[1].placements.Count(), 1);
     }
-}
-
-TEST_F(Capture, DefaultCameraWithoutACameraLayer) {
-    ServedFrame frame(CompJson("", kMovingCard));
-    SY_SceneDesc scene;
-    Assemble(frame, &scene);
-    EXPECT_TRUE(scene.perspective);
-    EXPECT_FALSE(scene.dof.enabled);
-    // The eye at the comp's centre, the default distance 960 × 50 / 36 in front of it.
-    const M_Matrix4& eye = scene.framePlacement;
-    EXPECT_EQ(std::tuple(eye.mat[3][0], eye.mat[3][1], eye.mat[3][2]),
-              std::tuple(480, 270, -960 * 50.0 / 36));
-    EXPECT_NE(scene.frameProjection.mat[2][3], 0);
 }
 
 const std::string kOrthographicCamera = R"(
@@ -224,37 +199,6 @@ TEST_F(Capture, LightsReachOnlyTheLayersBelowWhenTheyAskForIt) {
     }
 }
 
-TEST_F(Capture, LightValuesComeFromTheMiddleSample) {
-    // Five samples from 0.5 − 1/96 s, 1/240 s apart: the third is at 0.5 − 1/96 + 1/120 s, where
-    // the intensity ramp reads that many hundred percent.
-    ServedFrame frame(CompJson(kBlur, kLitCards), 12);
-    SampleCountOverride samples(5);
-    SY_SceneDesc scene;
-    Assemble(frame, &scene);
-    ASSERT_EQ(scene.lights.Count(), 1);
-    const SY_LightDesc& light = scene.lights[0];
-    double middle = 0.5 - 1.0 / 96 + 1.0 / 120;
-    EXPECT_DOUBLE_EQ(light.color[0], 1);
-    for (int c = 1; c < 4; ++c)
-        EXPECT_NEAR(light.color[c], middle, 1e-12);
-    EXPECT_EQ(light.placements.Count(), 5);
-}
-
-TEST_F(Capture, ShadowMapSizeFromTheOptions) {
-    struct Case {
-        int32_t choice;
-        int32_t size;
-    };
-    for (const Case& c : {Case{0, 0}, Case{1, 250}, Case{8, 4000}}) {
-        SCOPED_TRACE(c.choice);
-        ServedFrame frame(CompJson("", kLitCards));
-        SY_SceneDesc scene;
-        Assemble(frame, &scene, c.choice);
-        ASSERT_EQ(scene.lights.Count(), 1);
-        EXPECT_EQ(scene.lights[0].shadowMapSize, c.size);
-    }
-}
-
 TEST_F(Capture, QualityAndShadowSwitches) {
     const std::string layers = R"(
       {"name": "wire", "kind": "solid", "threeD": true, "quality": "wireframe",
@@ -313,53 +257,6 @@ TEST_F(Capture, TrackMatteFetchedFromTheMatteLayer) {
     EXPECT_EQ(U_AccountedBytes(), startBytes);
 }
 
-// The default camera of a 360-pixel comp is 500 pixels in front of it, so a card half way
-// there is seen at twice its size: the 40 × 20 card covers x 140 to 220 and y 70 to 110 of the
-// frame. The unbounded wall lies in the comp's plane behind it and faces the camera.
-TEST_F(Capture, AnUnboundedWallFillsEveryPixelTheCardLeaves) {
-    const std::string comp = R"({"width": 360, "height": 180, "duration": 1, "layers": [
-      {"name": "card", "kind": "solid", "threeD": true, "quality": "draft",
-       "source": {"color": "#ff0000", "width": 40, "height": 20},
-       "transform": {"position": [180, 90, -250]}},
-      {"name": "wall", "kind": "solid", "threeD": true,
-       "source": {"color": "#336699", "unbounded": true}}]})";
-    struct Case {
-        int16_t bitDepth;
-        Channels card, wall;
-    };
-    const Case kCases[] = {
-        {8, {255, 255, 0, 0}, {255, 51, 102, 153}},
-        {16, {32768, 32768, 0, 0}, {32768, 6554, 13107, 19661}},
-        {32, {1, 1, 0, 0}, {1, 0.2f, 0.4f, 0.6f}},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(c.bitDepth);
-        int64_t startBytes = U_AccountedBytes();
-        {
-            RenderSettings settings;
-            settings.bitDepth = c.bitDepth;
-            ServedFrame frame(comp, 0, settings);
-            SY_SceneDesc scene;
-            Assemble(frame, &scene);
-            ASSERT_EQ(scene.layers.Count(), 2);
-            EXPECT_FALSE(scene.layers[0].unbounded);
-            EXPECT_TRUE(scene.layers[1].unbounded);
-
-            ASSERT_EQ(RenderThroughTheEntry(frame), 0);
-            const PF_World& out = frame.Session().Destination();
-            int64_t wrong = 0;
-            for (int32_t y = 0; y < out.height; ++y) {
-                for (int32_t x = 0; x < out.width; ++x) {
-                    bool onCard = x >= 140 && x < 220 && y >= 70 && y < 110;
-                    wrong += ChannelsAt(out, x, y) != (onCard ? c.card : c.wall);
-                }
-            }
-            EXPECT_EQ(wrong, 0);
-        }
-        EXPECT_EQ(U_AccountedBytes(), startBytes);
-    }
-}
-
 TEST_F(Capture, FramesThroughTheEntryLeaveNothingBehind) {
     const std::string kOdd = R"(
       {"name": "fine", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
@@ -380,7 +277,10 @@ TEST_F(Capture, FramesThroughTheEntryLeaveNothingBehind) {
         int64_t startHandles = LiveMemoryHandles();
         {
             ServedFrame frame(CompJson(kBlur, c.layers), c.frame);
-            EXPECT_EQ(RenderThroughTheEntry(frame), c.result);
+            Options options;
+            EXPECT_EQ(ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
+                                 nullptr),
+                      c.result);
             EXPECT_EQ(LockedMemoryHandles(), 0);
             EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
         }

@@ -64,41 +64,6 @@ TEST(HostSuites, OnlyKnownNamesAndVersionsAreServed) {
     }
 }
 
-TEST(CanvasSuite, LayerContextsAndTheirValues) {
-    // Frame 12 is 0.5 s.
-    ServedFrame frame(CompJson(kSettings, kLayers), 12);
-    const QNGP_CanvasSuite13& canvas = *CanvasSuite();
-    QNGP_RenderContextH render = frame.Render();
-    // The two 3-D solids that are on; the stencil serves as the card's matte, so only the card.
-    int32_t count = 0;
-    ASSERT_EQ(canvas.GetNumLayersToRender(render, &count), 0);
-    ASSERT_EQ(count, 1);
-    QNGP_LayerContextH context = nullptr;
-    EXPECT_EQ(canvas.GetNthLayerContext(render, 1, &context), kErrBadIndex);
-    ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &context), 0);
-    QNGP_LayerH layer = nullptr;
-    ASSERT_EQ(canvas.GetLayerFromLayerContext(render, context, &layer), 0);
-    EXPECT_EQ(layer, frame.Layer(4));
-
-    // Anchor point at the origin, scale 50 % × 25 %, then the card's position (10, 20, 30) in
-    // the rig's space, which sits at (100, 0, 0): layer pixel (0, 0) lands on (110, 20, 30).
-    T_Time time{}, step{};
-    ASSERT_EQ(canvas.GetRenderTime(render, &time, &step), 0);
-    M_Matrix4 placement{};
-    ASSERT_EQ(canvas.GetRenderLayerToWorldXform(render, context, &time, &placement), 0);
-    EXPECT_EQ(std::tuple(placement.mat[0][0], placement.mat[1][1], placement.mat[3][0],
-                         placement.mat[3][1], placement.mat[3][2]),
-              std::tuple(0.5, 0.25, 110, 20, 30));
-    double opacity = 0;
-    ASSERT_EQ(canvas.GetRenderOpacity(render, context, &time, &opacity), 0);
-    EXPECT_DOUBLE_EQ(opacity, 0.4);
-    // 180° opening 90° before the frame: 0.5 − 1/96 s for 1/48 s.
-    T_Time start{}, duration{};
-    ASSERT_EQ(canvas.GetShutterInterval(render, &start, &duration), 0);
-    EXPECT_DOUBLE_EQ(T_Seconds(start), 0.5 - 1.0 / 96);
-    EXPECT_DOUBLE_EQ(T_Seconds(duration), 1.0 / 48);
-}
-
 TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
     int64_t startBytes = U_AccountedBytes();
     {
@@ -275,31 +240,6 @@ TEST(CanvasSuite, ProgressAnswersTheUsersCancel) {
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 2, 3), kErrUserCancel);
 }
 
-TEST(CompSuites, CompItemCameraAndLight) {
-    ServedFrame frame(CompJson(kSettings, kLayers));
-    int32_t flags = 0, samples = 0, type = -1;
-    ASSERT_EQ(CompSuite()->GetCompFlags(frame.Comp(), &flags), 0);
-    EXPECT_EQ(flags, 0x8 | 0x100);
-    ASSERT_EQ(CompSuite()->GetCompMotionBlurSamples(frame.Comp(), &samples), 0);
-    EXPECT_EQ(samples, 12);
-    QNGP_ItemH item = nullptr;
-    ASSERT_EQ(CompSuite()->GetItemFromComp(frame.Comp(), &item), 0);
-    QNGP_Ratio aspect{};
-    ASSERT_EQ(ItemSuite()->GetItemPixelAspectRatio(item, &aspect), 0);
-    EXPECT_EQ(std::tuple(aspect.num, aspect.den), std::tuple(9, 10));
-
-    T_Time now{0, 1};
-    QNGP_LayerH camera = nullptr;
-    ASSERT_EQ(CameraSuite()->GetCamera(frame.Render(), &now, &camera), 0);
-    EXPECT_EQ(camera, frame.Layer(0));
-    ASSERT_EQ(CameraSuite()->GetCameraType(camera, &type), 0);
-    EXPECT_EQ(type, kQNGP_CameraOrthographic);
-    EXPECT_EQ(CameraSuite()->GetCameraType(frame.Layer(1), &type), kErrWrongLayerKind);
-    ASSERT_EQ(LightSuite()->GetLightType(frame.Layer(1), &type), 0);
-    EXPECT_EQ(type, 1);  // spot
-    EXPECT_EQ(LightSuite()->GetLightType(frame.Layer(0), &type), kErrWrongLayerKind);
-}
-
 TEST(LayerSuite, EveryLayerOfTheComp) {
     ServedFrame frame(CompJson(kSettings, kLayers));
     const QNGP_LayerSuite10& layers = *LayerSuite();
@@ -334,36 +274,6 @@ TEST(LayerSuite, EveryLayerOfTheComp) {
     EXPECT_EQ(std::tuple(engine.isAVLayer, engine.samplingQuality), std::tuple(true, 2));
     int32_t flags = 0;
     EXPECT_EQ(layers.GetLayerFlags(nullptr, &flags), kErrBadHandle);
-}
-
-TEST(StreamSuite, ValuesByStreamNumber) {
-    ServedFrame frame(CompJson(kSettings, kLayers));
-    struct Case {
-        int32_t layer;
-        int32_t stream;
-        QNGP_StreamValue value;
-    };
-    const Case kCases[] = {
-        {4, 1, {{10, 20, 30, 0}}},     // position
-        {4, 7, {{40, 0, 0, 0}}},       // opacity
-        {1, 17, {{1, 1, 0.5, 0.25}}},  // colour: alpha, red, green, blue
-    };
-    T_Time now{0, 1};
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(std::to_string(c.layer) + ", stream " + std::to_string(c.stream));
-        QNGP_StreamValue value{{-1, -1, -1, -1}};
-        ASSERT_EQ(StreamSuite()->GetLayerStreamValue(frame.Layer(c.layer), c.stream,
-                                                     kQNGP_TimeModeLayer, &now, 0, &value),
-                  0);
-        for (int i = 0; i < 4; ++i)
-            EXPECT_DOUBLE_EQ(value.v[i], c.value.v[i]);
-    }
-    QNGP_StreamValue value{};
-    EXPECT_EQ(StreamSuite()->GetLayerStreamValue(frame.Layer(0), 24, kQNGP_TimeModeLayer, &now, 0,
-                                                 &value),
-              kErrNoSuchStream);
-    EXPECT_EQ(StreamSuite()->GetLayerStreamValue(frame.Layer(4), 1, 0, &now, 0, &value),
-              kErrBadArgument);
 }
 
 }  // namespace

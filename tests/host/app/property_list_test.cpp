@@ -9,17 +9,6 @@ namespace {
 using ostrel::ParsePropertyList;
 using ostrel_test::PropertyListBuilder;
 
-TEST(PropertyList, ReadsEveryProperty) {
-    auto bytes = PropertyListBuilder::General("GPMain_Ormond").Bytes();
-    ostrel::PropertyList list = ParsePropertyList(bytes, "Ormond.prpl");
-    EXPECT_EQ(list.kind, "QNgx");
-    EXPECT_EQ(list.name, "$$$/QN/QNGP/Name/Test=Test");
-    EXPECT_EQ(list.category, "Ignored");
-    EXPECT_EQ(list.version, 0x00010000u);
-    EXPECT_EQ(list.entryPoint, "GPMain_Ormond");
-    EXPECT_EQ(list.flags, 0x10u);
-}
-
 TEST(PropertyList, RejectsWhatAHostCannotUse) {
     struct Case {
         const char* name;
