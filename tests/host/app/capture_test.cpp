@@ -131,20 +131,7 @@ const std::string kOrthographicCamera = R"(
      "irisShape": "hexagon", "irisRoundness": 30, "highlightThreshold": 200}}},
 )";
 
-TEST_F(Capture, OrthographicCameraHasNoProjectionAndZoomZero) {
-    ServedFrame frame(CompJson("", kOrthographicCamera + kMovingCard));
-    SY_SceneDesc scene;
-    Assemble(frame, &scene);
-    EXPECT_FALSE(scene.perspective);
-    EXPECT_EQ(scene.frameProjection.mat[2][3], 0);
-    ASSERT_TRUE(scene.dof.enabled);
-    // Percentages become fractions; an orthographic camera has no zoom.
-    EXPECT_EQ(std::tuple(scene.dof.zoom, scene.dof.focusDistance, scene.dof.blurLevel,
-                         scene.dof.irisShape, scene.dof.irisRoundness),
-              std::tuple(0, 900, 1.2, 6, 0.3));
-}
-
-TEST_F(Capture, RegionAndDownsampleMoveAndShrinkTheScreen) {
+TEST_F(Capture, OrthographicCameraRegionAndDownsample) {
     RenderSettings settings;
     settings.downsampleX = 2;
     settings.downsampleY = 4;
@@ -158,6 +145,12 @@ TEST_F(Capture, RegionAndDownsampleMoveAndShrinkTheScreen) {
     EXPECT_EQ(std::tuple(screen.mat[3][0], screen.mat[3][1], screen.mat[0][0], screen.mat[1][1]),
               std::tuple(190, 55, 0.5, 0.25));
     EXPECT_EQ(std::tuple(scene.downsampleX, scene.dof.downsampleY), std::tuple(2, 4));
+    // An orthographic camera has no zoom; the depth of field's percentages become fractions.
+    EXPECT_FALSE(scene.perspective);
+    ASSERT_TRUE(scene.dof.enabled);
+    EXPECT_EQ(std::tuple(scene.dof.zoom, scene.dof.focusDistance, scene.dof.blurLevel,
+                         scene.dof.irisShape, scene.dof.irisRoundness),
+              std::tuple(0, 900, 1.2, 6, 0.3));
 }
 
 // Top to bottom: two cards, a null, a light of the layers below, two more cards, a light that

@@ -37,33 +37,6 @@ const std::string kSettings =
     R"("pixelAspect": 0.9, "lightsAndDepthOfField": false,
        "motionBlur": {"enabled": true, "samplesPerFrame": 12})";
 
-TEST(HostSuites, OnlyKnownNamesAndVersionsAreServed) {
-    HostSuites suites;
-    const QNGP_BasicSuite* basic = SuiteRegistry::BasicSuite();
-    struct Case {
-        const char* name;
-        int32_t version;
-        bool served;
-    };
-    const Case kCases[] = {
-        {kQNGP_CanvasSuite, 10, true},  {kQNGP_CanvasSuite, 13, true},
-        {kQNGP_CanvasSuite, 11, false}, {kQNGP_CompSuite, 15, false},
-        {kQNGP_LayerSuite, 10, true},   {"QNGP Canvas Suit", 10, false},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(std::string(c.name) + " " + std::to_string(c.version));
-        const void* suite = nullptr;
-        EXPECT_EQ(basic->AcquireSuite(c.name, c.version, &suite),
-                  c.served ? 0 : kQNGP_ErrMissingSuite);
-        EXPECT_EQ(suite != nullptr, c.served);
-        if (!c.served) continue;
-        EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 1);
-        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), 0);
-        // Only what is held can be released.
-        EXPECT_EQ(basic->ReleaseSuite(c.name, c.version), kQNGP_ErrMissingSuite);
-    }
-}
-
 TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
     int64_t startBytes = U_AccountedBytes();
     {
@@ -238,42 +211,6 @@ TEST(CanvasSuite, ProgressAnswersTheUsersCancel) {
     frame.Session().SetProgress(&progress);
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 1, 3), 0);
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 2, 3), kErrUserCancel);
-}
-
-TEST(LayerSuite, EveryLayerOfTheComp) {
-    ServedFrame frame(CompJson(kSettings, kLayers));
-    const QNGP_LayerSuite10& layers = *LayerSuite();
-    QNGP_LayerH layer = nullptr;
-    EXPECT_EQ(layers.GetCompLayerByIndex(frame.Comp(), 7, &layer), kErrBadIndex);
-    // Index, flags, object type, active, has a track matte.
-    using Row = std::tuple<int32_t, int32_t, int32_t, bool, bool>;
-    const Row kRows[] = {
-        {0, 0, 2, true, false},          // camera
-        {1, 0x200, 1, true, false},      // light of the layers below
-        {4, 0x8 | 0x80, 0, true, true},  // card: motion blur, collapse
-        {6, 0, 0, false, false},         // switched off
-    };
-    T_Time now{0, 1};
-    for (const Row& row : kRows) {
-        ASSERT_EQ(layers.GetCompLayerByIndex(frame.Comp(), std::get<0>(row), &layer), 0);
-        Row got{};
-        auto& [index, flags, type, active, hasMatte] = got;
-        ASSERT_EQ(layers.GetLayerIndex(layer, &index), 0);
-        ASSERT_EQ(layers.GetLayerFlags(layer, &flags), 0);
-        ASSERT_EQ(layers.GetLayerObjectType(layer, &type), 0);
-        ASSERT_EQ(layers.IsLayerActive(layer, &now, &active), 0);
-        ASSERT_EQ(layers.LayerHasTrackMatte(layer, &hasMatte), 0);
-        EXPECT_EQ(got, row);
-    }
-    QNGP_LayerTransferMode mode{};
-    ASSERT_EQ(layers.GetLayerTransferMode(frame.Layer(4), &mode), 0);
-    EXPECT_EQ(std::tuple(mode.mode, mode.flags, mode.trackMatte),
-              std::tuple(2, kQNGP_TransferPreserveAlpha, 4));
-    QNGP_EngineLayer engine{};
-    ASSERT_EQ(layers.GetEngineLayer(frame.Layer(4), &engine), 0);
-    EXPECT_EQ(std::tuple(engine.isAVLayer, engine.samplingQuality), std::tuple(true, 2));
-    int32_t flags = 0;
-    EXPECT_EQ(layers.GetLayerFlags(nullptr, &flags), kErrBadHandle);
 }
 
 }  // namespace

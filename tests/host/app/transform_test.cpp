@@ -64,20 +64,6 @@ TEST(Transform, OrientationComesBeforeTheRotationsInXYZOrder) {
     }
 }
 
-TEST(Transform, ParentChainAppliesChildFirst) {
-    // Child origin → (10, 0, 0) in the parent; the parent turns it 90° about z to (0, 10, 0)
-    // and moves it to (100, 10, 0); the grandparent doubles that and adds (5, 5, 5).
-    Composition comp = Parse(R"(
-        {"name": "child", "kind": "null", "threeD": true, "parent": "parent",
-         "transform": {"position": [10, 0, 0]}},
-        {"name": "parent", "kind": "null", "threeD": true, "parent": "grandparent",
-         "transform": {"position": [100, 0, 0], "rotationZ": 90}},
-        {"name": "grandparent", "kind": "null", "threeD": true,
-         "transform": {"position": [5, 5, 5], "scale": [200, 200, 200]}})");
-    ExpectPoint(Apply(LayerToWorld(comp, 0, 0.0), {0, 0, 0}), {205, 25, 5});
-    ExpectPoint(Apply(LayerToWorld(comp, 1, 0.0), {0, 0, 0}), {205, 5, 5});
-}
-
 TEST(Transform, TwoNodeCameraAimsItsZAxisAtThePointOfInterest) {
     struct Case {
         const char* camera;

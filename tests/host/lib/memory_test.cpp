@@ -12,14 +12,6 @@ bool CountPurge() {
     return true;
 }
 
-TEST(Memory, AccountingReturnsToStart) {
-    int64_t start = U_AccountedBytes();
-    U_AccountAllocationEx(100, 1);
-    EXPECT_EQ(U_AccountedBytes(), start + 100);
-    U_AccountAllocationEx(100, 0);
-    EXPECT_EQ(U_AccountedBytes(), start);
-}
-
 TEST(Memory, ResizeKeepsContents) {
     void* block = nullptr;
     ASSERT_EQ(U_ResizePtr(0, 4, "test", &block), 0);
