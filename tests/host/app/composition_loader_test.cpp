@@ -106,25 +106,15 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
         {"{\n  \"width\": 10,\n  \"height\" 10\n}",
          "bad.json: malformed JSON: line 3, column 13: syntax error while parsing object "
          "separator"},
-        {R"([1, 2])", "bad.json: expected an object, got an array"},
         {R"({"width": "wide", "height": 10, "duration": 1})",
          "bad.json: width: expected a number, got a string"},
         {R"({"width": 0, "height": 10, "duration": 1})",
          "bad.json: width: must be between 1 and 30000, got 0"},
-        {R"({"width": 10.5, "height": 10, "duration": 1})",
-         "bad.json: width: expected a whole number, got 10.5"},
         {R"({"width": 10, "duration": 1})", "bad.json: height: is required"},
-        {R"({"width": 10, "height": 10, "duration": 0})", "bad.json: duration: must be above 0"},
         {R"({"width": 10, "height": 10, "duration": 1, "bitDepth": 12})",
          "bad.json: bitDepth: must be 8, 16 or 32, got 12"},
-        {R"({"width": 10, "height": 10, "duration": 1, "frameRate": 29.97})",
-         "bad.json: frameRate: give a fractional rate as [numerator, denominator]"},
         {R"({"width": 10, "height": 10, "duration": 1, "hieght": 5})",
          "bad.json: unknown key \"hieght\" (did you mean \"height\"?)"},
-        {R"({"width": 10, "height": 10, "duration": 1, "rendererOptions": "abc"})",
-         "bad.json: rendererOptions: expected an even number of hexadecimal digits"},
-        {R"({"width": 10, "height": 10, "duration": 1, "background": "#12345"})",
-         "bad.json: background: expected a colour as \"#rrggbb\""},
         {WithLayers(R"({"kind": "sprite"})"),
          "bad.json: layers[0].kind: unknown value \"sprite\"; expected one of \"image\", "
          "\"solid\""},
@@ -132,10 +122,6 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
          "bad.json: layers[1].transform: unknown key \"positon\" (did you mean \"position\"?)"},
         {WithLayers(R"({"kind": "null", "transform": {"position": [1, "2", 3]}})"),
          "bad.json: layers[0].transform.position[1]: expected a number, got a string"},
-        {WithLayers(R"({"kind": "null", "transform": {"position": [1]}})"),
-         "bad.json: layers[0].transform.position: expected [x, y] or [x, y, z], got an array of 1"},
-        {WithLayers(R"({"kind": "null", "transform": {"rotationX": 1e400}})"),
-         "bad.json: malformed JSON: number overflow parsing '1e400'"},
         {WithLayers("{" + solid + R"(, "transform": {"opacity": 120}})"),
          "bad.json: layers[0].transform.opacity: must be between 0 and 100, got 120"},
         {WithLayers(
@@ -143,30 +129,14 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
              R"(, "transform": {"opacity": {"keyframes": [{"time": 1, "value": 5}, {"time": 1, "value": 6}]}}})"),
          "bad.json: layers[0].transform.opacity.keyframes[1].time: keyframe times must increase, "
          "got 1 after 1"},
-        {WithLayers(
-             "{" + solid +
-             R"(, "transform": {"opacity": {"keyframes": [{"time": 0, "value": 5, "interpolation": "bezier"}]}}})"),
-         "bad.json: layers[0].transform.opacity.keyframes[0].interpolation: unknown value "
-         "\"bezier\""},
-        {WithLayers("{" + solid + R"(, "transform": {"opacity": {"keyframes": []}}})"),
-         "bad.json: layers[0].transform.opacity.keyframes: expected a non-empty array of "
-         "keyframes"},
         {WithLayers(R"({"kind": "solid", "source": {"color": [1, 1, 2]}})"),
          "bad.json: layers[0].source.color[2]: must be between 0 and 1, got 2"},
-        {WithLayers(R"({"kind": "solid"})"), "bad.json: layers[0].source: is required"},
         {WithLayers("{" + solid + R"(, "in": 2, "out": 1})"),
          "bad.json: layers[0].out: must be after the in time"},
-        {WithLayers("{" + solid + R"(, "transferMode": "Multiply"})"),
-         "bad.json: layers[0].transferMode: expected a mode name in lower case"},
         {WithLayers(R"({"kind": "camera", "material": {}})"),
          "bad.json: layers[0].material: does not apply to a camera layer"},
-        {WithLayers(
-             R"({"kind": "camera", "camera": {"type": "one-node", "pointOfInterest": [0, 0, 0]}})"),
-         "bad.json: layers[0].camera.pointOfInterest: a one-node camera has no point of interest"},
         {WithLayers(R"({"name": "a", "kind": "null"}, {"name": "a", "kind": "null"})"),
          "bad.json: layers[1].name: duplicate layer name \"a\" (layers[0] has it too)"},
-        {WithLayers(R"({"kind": "null", "parent": "ghost"})"),
-         "bad.json: layers[0].parent: no layer is named \"ghost\""},
         {WithLayers(
              R"({"name": "top", "kind": "null", "parent": "a"}, {"name": "a", "kind": "null", "parent": "b"}, {"name": "b", "kind": "null", "parent": "c"}, {"name": "c", "kind": "null", "parent": "a"})"),
          "bad.json: layers[1].parent: the parent chain loops: a → b → c → a"},
@@ -175,8 +145,6 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
          "from"},
         {WithLayers(R"({"name": "n", "kind": "null"}, {)" + solid + R"(, "trackMatte": "alpha"})"),
          "bad.json: layers[1].trackMatte: layer \"n\" has no pixels to make a matte from"},
-        {WithLayers("{" + solid + R"(, "trackMatte": {"type": "luma", "layer": "ghost"}})"),
-         "bad.json: layers[0].trackMatte.layer: no layer is named \"ghost\""},
         {WithLayers(R"({"kind": "image", "source": "missing.png"})"),
          "bad.json: layers[0].source: cannot read image '"},
 
@@ -197,10 +165,6 @@ TEST(CompositionLoader, UnboundedSolidsTakeTheCompsSizeAndNoOwn) {
         {R"({"color": "#336699", "unbounded": false, "width": 20})", false, 20, ""},
         {R"({"color": "#336699", "unbounded": true, "width": 20})", true, 0,
          "bad.json: layers[0].source.width: an unbounded solid has no size"},
-        {R"({"color": "#336699", "height": 20, "unbounded": true})", true, 0,
-         "bad.json: layers[0].source.height: an unbounded solid has no size"},
-        {R"({"color": "#336699", "unbounded": 1})", false, 0,
-         "bad.json: layers[0].source.unbounded: expected true or false, got a number"},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.source);
