@@ -29,31 +29,27 @@ protected:
     ImageCache cache_;
 };
 
-// One pixel read at a depth. 16 bits: 65535 → 32768; 32768 → 32768 × 32768 / 65535 =
-// 16384.25, rounded to 16384; no alpha channel means opaque. EXR stores colour premultiplied:
-// 0.25 under alpha 0.5 is 0.5 straight. Grey fills all three colours.
-TEST_F(ImageCacheTest, FilesBecomeStraightPixelsOfTheHostsDepth) {
-    struct Case {
-        std::filesystem::path file;
-        int16_t depth;
-        Channels want;
-    };
-    const Case kCases[] = {
-        {folder_.WriteImage<uint16_t>("deep.png", 1, 1, 3, {65535, 32768, 0}),
-         16,
-         {32768, 32768, 16384, 0}},
-        {folder_.WriteImage<float>("float.exr", 1, 1, 4, {0.25f, 0.1f, 0.0f, 0.5f}),
-         32,
-         {0.5, 0.5, 0.2, 0}},
-        {folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77}), 8, {255, 77, 77, 77}},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(c.file);
-        const Channels got =
-            ChannelsAt(*LayerSource(cache_, ImageLayer(c.file, 1, 1), c.depth, 1, 1), 0, 0);
-        for (int i = 0; i < 4; ++i)
-            EXPECT_NEAR(got[i], c.want[i], 1e-3);  // EXR keeps half floats by default
-    }
+TEST_F(ImageCacheTest, SixteenBitFileScalesToTheHostMaximum) {
+    // 65535 → 32768; 32768 → 32768 × 32768 / 65535 = 16384.25, rounded to 16384. No alpha
+    // channel means opaque.
+    auto file = folder_.WriteImage<uint16_t>("deep.png", 1, 1, 3, {65535, 32768, 0});
+    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 16, 1, 1);
+    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{32768, 32768, 16384, 0}));
+}
+
+TEST_F(ImageCacheTest, PremultipliedFloatFileBecomesStraight) {
+    // EXR stores colour premultiplied: 0.25 under alpha 0.5 is 0.5 straight.
+    auto file = folder_.WriteImage<float>("float.exr", 1, 1, 4, {0.25f, 0.1f, 0.0f, 0.5f});
+    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 32, 1, 1);
+    const Channels actual = ChannelsAt(*world, 0, 0), expected{0.5, 0.5, 0.2, 0};
+    for (int i = 0; i < 4; ++i)
+        EXPECT_NEAR(actual[i], expected[i], 1e-3);  // EXR keeps half floats by default
+}
+
+TEST_F(ImageCacheTest, GreyFileFillsAllThreeColors) {
+    auto file = folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77});
+    EXPECT_EQ(ChannelsAt(*LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1), 0, 0),
+              (Channels{255, 77, 77, 77}));
 }
 
 TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
