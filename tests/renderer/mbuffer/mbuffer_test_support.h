@@ -45,7 +45,6 @@ struct ThreadedFrame {
 // Fails the test when the accounted byte count is not back where it was at construction.
 struct AccountedBytesCheck {
     ~AccountedBytesCheck() { EXPECT_EQ(U_AccountedBytes(), start) << "memory left accounted"; }
-    int64_t Taken() const { return U_AccountedBytes() - start; }
 
     const int64_t start = U_AccountedBytes();
 };
