@@ -1,252 +1,251 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
+#include <cstring>
+#include <random>
 #include <string>
 #include <vector>
 
-#include "lighting_fixtures.h"
+#include "../scene/frame_test_support.h"
 #include "m_matrix.h"
+#include "renderer/raster/shader.h"
+#include "renderer/scene/render_context.h"
+#include "renderer/scene/renderable.h"
 #include "renderer/scene/specular_table.h"
 #include "u_memory.h"
-#include "u_report.h"
 
 namespace {
 
-using namespace lighting_test;
+// The layer lies in the plane z = 0 facing the eye at (0, 0, −1000): its normal is (0, 0, −1).
+constexpr double kFront[3] = {0, 0, -1};
 
-void ExpectTriple(const float actual[3], float r, float g, float b, const char* what) {
-    EXPECT_NEAR(actual[0], r, 1e-6) << what;
-    EXPECT_NEAR(actual[1], g, 1e-6) << what;
-    EXPECT_NEAR(actual[2], b, 1e-6) << what;
+// A white light: parallel ones shine from the unit direction (x, y, z) as seen from the lit
+// area, point and spot lights sit at (x, y, z), ambient ones ignore it.
+SY_LightState Light(int32_t type, double x = 0, double y = 0, double z = 0) {
+    SY_LightState light;
+    light.type = type;
+    std::fill(light.color, light.color + 4, 1.0);
+    double* where = type == kSY_LightParallel ? light.direction : light.position;
+    where[0] = x, where[1] = y, where[2] = z;
+    return light;
 }
 
-TEST(Lighting, AmbientOnly) {
-    SY_LightState ambient = Ambient(1, 0.5, 0.25);
-    auto shader = LitShader({&ambient});
-    shader->ambient = 0.8;
-    shader->diffuse = 1;
-    SY_Lighting out = LightAt(*shader, 10, 20, 0);
-    ExpectTriple(out.diffuse, 0.8f, 0.4f, 0.2f, "colour × ambient");
-    ExpectTriple(out.specular, 0, 0, 0, "no highlight");
-    shader->ambient = 0;
-    out = LightAt(*shader, 10, 20, 0);
-    ExpectTriple(out.diffuse, 0, 0, 0, "ambient coefficient 0");
+// A spot at (x, y, z) aimed along the negated unit axis (ax, ay, az).
+SY_LightState Spot(double x, double y, double z, double ax, double ay, double az, float cosOuter,
+                   float cosInner) {
+    SY_LightState light = Light(kSY_LightSpot, x, y, z);
+    light.direction[0] = ax, light.direction[1] = ay, light.direction[2] = az;
+    light.cosOuter = cosOuter;
+    light.cosInner = cosInner;
+    light.coneScale = cosInner == cosOuter ? 0.0f : 1.0f / (cosInner - cosOuter);
+    return light;
 }
 
-TEST(Lighting, FacingAndTransmission) {
-    // A point light 100 away, in front of, in the plane of, and behind the layer point (0, 0, 0).
+SY_LightState Falloff(SY_LightState light, int32_t type, double radius, double distance) {
+    light.falloffType = type;
+    light.falloffRadius = radius;
+    light.falloffDistance = distance;
+    light.radiusSquared = radius * radius;
+    light.outerSquared = (radius + distance) * (radius + distance);
+    light.inverseDistance = distance == 0 ? 1.0 : 1.0 / distance;
+    light.distanceSquared = distance * distance;
+    return light;
+}
+
+// A shadow map that lets through a fixed transmission, or one that varies with the point, and
+// counts the lookups asked of it.
+class FixedShadow : public SY_ShadowMap {
+public:
+    FixedShadow(float r, float g, float b) : t_{r, g, b} {}
+    void HardLookup(const double p[3], uint16_t receiver, float out[4]) const override {
+        Fill(p, receiver, out);
+        ++hardLookups;
+    }
+    void SoftLookup(const double p[3], uint16_t receiver, float out[4]) const override {
+        Fill(p, receiver, out);
+        ++softLookups;
+    }
+    bool varying = false;  // transmission from the point's x, so neighbouring pixels differ
+    mutable int hardLookups = 0, softLookups = 0, lastReceiver = -1;
+
+private:
+    void Fill(const double p[3], uint16_t receiver, float out[4]) const {
+        lastReceiver = receiver;
+        out[0] = 1;
+        for (int c = 0; c < 3; ++c) {
+            double x = p[0] * 0.01 + c * 0.3;
+            out[1 + c] = varying ? static_cast<float>(x - std::floor(x)) : t_[c];
+        }
+    }
+    float t_[3];
+};
+
+// A shader that takes light from `lights`, with no material terms but those the test sets.
+std::unique_ptr<SY_LayerShader> LitShader(std::initializer_list<const SY_LightState*> lights) {
+    auto shader = std::make_unique<SY_LayerShader>();
+    shader->acceptsLights = shader->shaded = shader->needsPoint = 1;
+    shader->eye[2] = -1000;
+    shader->lights.Allocate(static_cast<int32_t>(lights.size()));
+    std::copy(lights.begin(), lights.end(), shader->lights.begin());
+    return shader;
+}
+
+SY_Lighting LightAt(const SY_LayerShader& shader, double x, double y, double z) {
+    const double p[3] = {x, y, z};
+    SY_Lighting out{};
+    shader.LightOnePixel(p, kFront, &out);
+    return out;
+}
+
+// One light over the layer point (x, 0, 0) with diffuse 1: the diffuse term is the light's
+// colour times `lit`, which a reader gets from N·L, the cone and the falloff.
+TEST(Lighting, OneLightAtAKnownPlace) {
     struct Case {
-        double z;
-        double transmission;
-        float diffuse;
+        const char* what;
+        SY_LightState light;
+        double x, ambient, transmission;
+        float lit;
     };
+    SY_LightState coloured = Light(kSY_LightAmbient);
+    coloured.color[2] = 0.5, coloured.color[3] = 0.25;
     const Case cases[] = {
-        {-100, 0, 0.5f},    // in front: colour × diffuse × N·L
-        {-100, 0.5, 0.5f},  // transmission does not touch the front
-        {0, 0, 0},          // in the plane: behind, and without transmission skipped
-        {0, 1, 0},          // in the plane with transmission: N·L = 0 gives nothing
-        {100, 0, 0},        // behind without transmission
-        {100, 0.5, 0.25f},  // behind: k × transmission × diffuse × |N·L|
+        {"ambient: colour × coefficient", std::move(coloured), 0, 0.8, 0, 0.8f},
+        {"ambient coefficient 0", Light(kSY_LightAmbient), 0, 0, 0, 0},
+        {"point in front: N·L = 1", Light(kSY_LightPoint, 0, 0, -100), 0, 0, 0.5, 1},
+        {"point in the plane: N·L = 0", Light(kSY_LightPoint, 100, 0, 0), 0, 0, 1, 0},
+        {"point behind, no transmission", Light(kSY_LightPoint, 0, 0, 100), 0, 0, 0, 0},
+        {"point behind: transmission × |N·L|", Light(kSY_LightPoint, 0, 0, 100), 0, 0, 0.5, 0.5f},
+        // A spot 300 in front aimed at the origin: cosine 1 on the axis; the point (400, 0, 0)
+        // sees it at cosine 0.6 with N·L = 0.6.
+        {"on the outer cone: 0", Spot(0, 0, -300, 0, 0, -1, 1, 1), 0, 0, 0, 0},
+        {"on the inner cone: 1", Spot(0, 0, -300, 0, 0, -1, 0.5f, 1), 0, 0, 0, 1},
+        {"halfway: smoothstep ½ × N·L", Spot(0, 0, -300, 0, 0, -1, 0.5f, 0.7f), 400, 0, 0, 0.3f},
+        {"outside the outer cone", Spot(0, 0, -300, 0, 0, -1, 0.7f, 0.8f), 400, 0, 0, 0},
+        {"inside the inner cone: N·L", Spot(0, 0, -300, 0, 0, -1, 0.4f, 0.55f), 400, 0, 0, 0.6f},
+        // A point light at distance d straight in front, radius 100.
+        {"no falloff", Falloff(Light(kSY_LightPoint, 0, 0, -5000), 0, 100, 0), 0, 0, 0, 1},
+        {"inverse square at R", Falloff(Light(kSY_LightPoint, 0, 0, -100), 2, 100, 0), 0, 0, 0, 1},
+        {"(R/d)² at 2R", Falloff(Light(kSY_LightPoint, 0, 0, -200), 2, 100, 0), 0, 0, 0, 0.25f},
+        {"inside R", Falloff(Light(kSY_LightPoint, 0, 0, -50), 1, 100, 100), 0, 0, 0, 1},
+        {"smooth zone u = ½", Falloff(Light(kSY_LightPoint, 0, 0, -150), 1, 100, 100), 0, 0, 0,
+         0.5f},
+        {"smooth zone u = ¼: 0.0625 × 2.5", Falloff(Light(kSY_LightPoint, 0, 0, -175), 1, 100, 100),
+         0, 0, 0, 0.15625f},
+        {"zone's end", Falloff(Light(kSY_LightPoint, 0, 0, -200), 1, 100, 100), 0, 0, 0, 0},
+        {"zone of no width", Falloff(Light(kSY_LightPoint, 0, 0, -150), 1, 100, 0), 0, 0, 0, 0},
     };
     for (const Case& c : cases) {
-        SY_LightState light = Point(c.z == 0 ? 100 : 0, 0, c.z);
-        auto shader = LitShader({&light});
-        shader->diffuse = 0.5;
+        auto shader = LitShader({&c.light});
+        shader->ambient = c.ambient;
+        shader->diffuse = 1;
         shader->lightTransmission = c.transmission;
-        SY_Lighting out = LightAt(*shader, 0, 0, 0);
-        std::string what = "z " + std::to_string(c.z) + " t " + std::to_string(c.transmission);
-        ExpectTriple(out.diffuse, c.diffuse, c.diffuse, c.diffuse, what.c_str());
-    }
-}
-
-TEST(Lighting, SpotCone) {
-    // A spot 300 in front of the origin aimed at it. The point on the axis has cosine exactly 1;
-    // the point (400, 0, 0) sees the light at cosine 0.6 and N·L = 0.6.
-    struct Case {
-        double x;
-        float cosOuter, cosInner;
-        float diffuse;
-    };
-    const Case cases[] = {
-        {0, 1.0f, 1.0f, 0},        // exactly on the outer cone: spot 0, not skipped
-        {0, 0.5f, 1.0f, 1},        // exactly on the inner cone: spot 1
-        {0, 0.5f, 0.9f, 1},        // inside the inner cone
-        {400, 0.5f, 0.7f, 0.3f},   // half way: t = 0.5, smoothstep 0.5, × N·L 0.6
-        {400, 0.7f, 0.8f, 0},      // outside the outer cone
-        {400, 0.4f, 0.55f, 0.6f},  // inside the inner cone, × N·L
-    };
-    for (const Case& c : cases) {
-        SY_LightState spot = Spot(0, 0, -300, 0, 0, -1, c.cosOuter, c.cosInner);
-        auto shader = LitShader({&spot});
-        shader->diffuse = 1;
         SY_Lighting out = LightAt(*shader, c.x, 0, 0);
-        EXPECT_NEAR(out.diffuse[0], c.diffuse, 1e-6) << c.x << " " << c.cosOuter;
+        for (int k = 0; k < 3; ++k) {
+            EXPECT_NEAR(out.diffuse[k], c.lit * c.light.color[1 + k], 1e-6) << c.what;
+            EXPECT_EQ(out.specular[k], 0) << c.what;
+        }
     }
 }
 
-TEST(Lighting, DistanceFalloff) {
-    // A point light straight in front at distance d, radius 100: N·L = 1, so D = falloff.
-    struct Case {
-        int32_t type;
-        double distance;  // width of the smooth zone
-        double d;
-        float falloff;
-    };
-    const Case cases[] = {
-        {0, 0, 5000, 1},          // none
-        {2, 0, 50, 1},            // inverse square: full inside the radius
-        {2, 0, 100, 1},           // (R/d)² = 1 at the radius
-        {2, 0, 200, 0.25f},       // a quarter at twice the radius
-        {1, 100, 50, 1},          // smooth: full inside the radius
-        {1, 100, 150, 0.5f},      // half way through the zone: smoothstep 0.5
-        {1, 100, 175, 0.15625f},  // u = 0.25: 0.0625 × 2.5
-        {1, 100, 200, 0},         // the zone's end
-        {1, 100, 300, 0},         // beyond it
-        {1, 0, 150, 0},           // a zone of no width ends at the radius
-    };
-    for (const Case& c : cases) {
-        SY_LightState light = Point(0, 0, -c.d);
-        SetFalloff(&light, c.type, 100, c.distance);
-        auto shader = LitShader({&light});
-        shader->diffuse = 1;
-        SY_Lighting out = LightAt(*shader, 0, 0, 0);
-        EXPECT_NEAR(out.diffuse[1], c.falloff, 1e-6) << c.type << " at " << c.d;
-    }
-}
-
+// A parallel light from the eye's direction: the half vector is the normal, q = 1, and the
+// highlight is colour × specular. A red texel (1, 0, 0) shows texel × D + S; metal decides how
+// much of the highlight takes the texel's colour.
 TEST(Lighting, MetalDecidesTheHighlightColour) {
-    // A parallel light from the eye's direction: the half vector is the normal, q = 1, and the
-    // highlight is colour × specular. A red texel (1, 0, 0) shows texel × D + S.
     SY_SpecularTables tables;
-    SY_LightState light = Parallel(0, 0, -1);
-    light.color[1] = 1, light.color[2] = 0.8, light.color[3] = 0.6;
-    struct Case {
-        double metal;
-        float red, green, blue;
-    };
-    const Case cases[] = {
-        {1, 1, 0, 0},            // the highlight takes the texture's red
-        {0, 1, 0.8f, 0.6f},      // the highlight in the light's colour
-        {0.25, 1, 0.6f, 0.45f},  // a quarter through the texture, the rest added
-    };
-    for (const Case& c : cases) {
+    SY_LightState light = Light(kSY_LightParallel, 0, 0, -1);
+    light.color[2] = 0.8, light.color[3] = 0.6;
+    const double cases[][4] = {{1, 1, 0, 0}, {0, 1, 0.8, 0.6}, {0.25, 1, 0.6, 0.45}};
+    for (const auto& [metal, red, green, blue] : cases) {
         auto shader = LitShader({&light});
         shader->specular = 1;
-        shader->metal = c.metal;
+        shader->metal = metal;
         shader->specularTable = &tables.ForShininess(50);
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
-        const float texel[3] = {1, 0, 0};
-        float shown[3];
+        const double texel[3] = {1, 0, 0}, shown[3] = {red, green, blue};
         for (int k = 0; k < 3; ++k)
-            shown[k] = texel[k] * out.diffuse[k] + out.specular[k];
-        ExpectTriple(shown, c.red, c.green, c.blue, std::to_string(c.metal).c_str());
+            EXPECT_NEAR(texel[k] * out.diffuse[k] + out.specular[k], shown[k], 1e-6) << metal;
     }
 }
 
+// A light 0.005 above the plane (N·L = 0.005) fades the highlight by 100 × 0.005. With V = (0,
+// 0, −1): q = (N·H)² / |H|² = (1 + s)² / (c² + (1 + s)²) = (1 + s) / 2, on a table of cos¹.
 TEST(Lighting, GrazingLightFadesTheHighlight) {
-    // A light 0.005 above the plane (N·L = 0.005): the highlight is scaled by 100 × 0.005.
     SY_SpecularTables tables;
-    double s = 0.005, c = std::sqrt(1 - s * s);
-    SY_LightState light = Parallel(c, 0, -s);
+    const double s = 0.005;
+    SY_LightState light = Light(kSY_LightParallel, std::sqrt(1 - s * s), 0, -s);
     auto shader = LitShader({&light});
     shader->specular = 1;
-    shader->metal = 0;
-    shader->specularTable = &tables.ForShininess(0);  // cos¹ of the half-vector angle
-    SY_Lighting out = LightAt(*shader, 0, 0, 0);
-    // V = (0, 0, -1): q = (N·H)² / |H|² = (1 + s)² / ((c)² + (1 + s)²) = (1 + s) / 2.
-    double q = (1 + s) / 2;
-    EXPECT_NEAR(out.specular[0], 0.5 * std::sqrt(std::floor(q * 2048) / 2048), 1e-6);
+    shader->specularTable = &tables.ForShininess(0);
+    const double q = (1 + s) / 2;
+    EXPECT_NEAR(LightAt(*shader, 0, 0, 0).specular[0], 0.5 * std::sqrt(std::floor(q * 2048) / 2048),
+                1e-6);
 }
 
-TEST(Lighting, ShadowOnlyLayerWithoutLightsPassesItsTexture) {
-    SY_LayerShader shader;  // takes no light and has none
-    SY_Lighting out = LightAt(shader, 3, 4, 0);
-    ExpectTriple(out.diffuse, 1, 1, 1, "diffuse");
-    ExpectTriple(out.specular, 0, 0, 0, "specular");
-}
-
-TEST(Lighting, ShadowOnlyLayerIsDarkenedByShadows) {
+// A map letting through t (blue: 1 on the shadow-only path) at the given darkness. A lit layer
+// with diffuse 1 facing the light shows the light let through; a shadow-only layer shows
+// 1 − darkness × (1 − t), light without a map left out. Lookups follow the layer's
+// soft-shadow switch and name it; a layer taking no shadows is never looked up.
+TEST(Lighting, ShadowsLetThroughAKnownDarkness) {
     struct Case {
-        double darkness;
-        float t;
-        float diffuse;
-    };
-    const Case cases[] = {
-        {1, 0.25f, 0.25f},   // darkness 1: the transmission itself
-        {0.5, 0, 0.5f},      // a full shadow at half darkness lets half through
-        {0.5, 0.5f, 0.75f},  // 1 - (1 - 0.5) × 0.5
-        {0, 0, 1},           // no darkness: the light is left out
-    };
-    for (const Case& c : cases) {
-        SY_LightState light = Point(0, 0, -100);
-        light.shadowDarkness = c.darkness;
-        light.shadowMap = std::make_unique<FixedShadow>(c.t, c.t, 1);
-        SY_LightState lightWithoutMap = Point(0, 0, -100);
-        auto shader = LitShader({&light, &lightWithoutMap});
-        shader->acceptsLights = 0;
-        shader->acceptsShadows = 2;
-        SY_Lighting out = LightAt(*shader, 0, 0, 0);
-        ExpectTriple(out.diffuse, c.diffuse, c.diffuse, 1, std::to_string(c.darkness).c_str());
-        ExpectTriple(out.specular, 0, 0, 0, "no highlight");
-    }
-}
-
-TEST(Lighting, ShadowsAttenuateLitLight) {
-    struct Case {
+        bool lit;
         double darkness;
         float t;
         uint8_t soft;
-        float diffuse;
+        float shown;
     };
     const Case cases[] = {
-        {0.5, 0, 0, 0.5f},  // a full shadow at half darkness lets half of the light through
-        {1, 0, 0, 0},       // at full darkness the light is skipped
-        {1, 0.25f, 1, 0.25f},
+        {false, 1, 0.25f, 0, 0.25f}, {false, 0.5, 0, 0, 0.5f}, {false, 0.5, 0.5f, 1, 0.75f},
+        {false, 0, 0, 0, 1},         {true, 0.5, 0, 0, 0.5f},  {true, 1, 0, 0, 0},
+        {true, 1, 0.25f, 1, 0.25f},
     };
     for (const Case& c : cases) {
-        SY_LightState light = Parallel(0, 0, -1);
+        SCOPED_TRACE(testing::Message() << c.lit << " " << c.darkness << " " << c.t);
+        SY_LightState light = Light(kSY_LightParallel, 0, 0, -1);
+        SY_LightState withoutMap = Light(c.lit ? kSY_LightAmbient : kSY_LightPoint, 0, 0, -100);
         light.shadowDarkness = c.darkness;
-        auto map = std::make_unique<FixedShadow>(c.t, c.t, c.t);
+        auto map = std::make_unique<FixedShadow>(c.t, c.t, c.lit ? c.t : 1);
         const FixedShadow& lookups = *map;
         light.shadowMap = std::move(map);
-        auto shader = LitShader({&light});
+        auto shader = LitShader({&light, &withoutMap});
         shader->diffuse = 1;
-        shader->acceptsShadows = 1;
+        shader->acceptsLights = c.lit;
+        shader->acceptsShadows = c.lit ? 1 : 2;
         shader->softShadowLookup = c.soft;
         shader->layerId = 7;
         SY_Lighting out = LightAt(*shader, 0, 0, 0);
-        EXPECT_NEAR(out.diffuse[0], c.diffuse, 1e-6) << c.darkness << " " << c.t;
-        EXPECT_EQ(lookups.softLookups, c.soft ? 1 : 0);
-        EXPECT_EQ(lookups.hardLookups, c.soft ? 0 : 1);
+        EXPECT_NEAR(out.diffuse[0], c.shown, 1e-6);
+        EXPECT_NEAR(out.diffuse[2], c.lit ? c.shown : 1, 1e-6);
+        EXPECT_EQ(out.specular[0], 0);
+        if (!c.lit) continue;
+        EXPECT_EQ(lookups.softLookups, c.soft);
+        EXPECT_EQ(lookups.hardLookups, 1 - c.soft);
         EXPECT_EQ(lookups.lastReceiver, 7);
-        shader->acceptsShadows = 0;  // a layer that takes no shadows is never looked up
-        out = LightAt(*shader, 0, 0, 0);
-        EXPECT_NEAR(out.diffuse[0], 1, 1e-6);
+        shader->acceptsShadows = 0;
+        EXPECT_NEAR(LightAt(*shader, 0, 0, 0).diffuse[0], 1, 1e-6);
         EXPECT_EQ(lookups.hardLookups + lookups.softLookups, 1);
     }
 }
 
+// The same layer seen from the front and from behind, with the lights mirrored through its
+// plane: the normal comes turned toward the camera, so the back is lit as the front.
 TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
-    // The same layer seen from the front and from behind, with the lights mirrored through its
-    // plane. Upstream the normal is turned toward the camera, so the back is lit as the front.
     SY_SpecularTables tables;
-    auto lit = [&](double side, const double p[3]) {
+    auto lit = [&](double side) {
         SY_LightState spot = Spot(30, -20, side * 200, -0.1, 0.1, side * 0.99, 0.8f, 0.95f);
-        SY_LightState point = Point(-50, 10, side * 80);
-        SetFalloff(&point, 2, 60, 0);
+        SY_LightState point = Falloff(Light(kSY_LightPoint, -50, 10, side * 80), 2, 60, 0);
         auto shader = LitShader({&spot, &point});
         shader->eye[2] = side * 1000;
         shader->diffuse = 0.7;
         shader->specular = 0.6;
         shader->metal = 0.3;
         shader->specularTable = &tables.ForShininess(40);
-        const double n[3] = {0, 0, side};
+        const double p[3] = {12, 7, 0}, n[3] = {0, 0, side};
         SY_Lighting out{};
         shader->LightOnePixel(p, n, &out);
         return out;
     };
-    const double p[3] = {12, 7, 0};
-    SY_Lighting front = lit(-1, p), back = lit(1, p);
+    SY_Lighting front = lit(-1), back = lit(1);
     for (int c = 0; c < 3; ++c) {
         EXPECT_GT(front.diffuse[c], 0);
         EXPECT_GT(front.specular[c], 0);
@@ -255,47 +254,210 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
     }
 }
 
-struct Reports {
-    static std::vector<U_Report>& All() {
-        static std::vector<U_Report> all;
-        return all;
-    }
-    static void Collect(const U_Report& report) { All().push_back(report); }
-};
-
-TEST(Lighting, EyeOnTheSurfaceIsReportedAndThrown) {
-    SY_LightState light = Point(0, 0, -100);
-    auto shader = LitShader({&light});
+// A light on the surface point has no direction and is left out silently; an eye on it ends
+// the frame with the math library's zero-length code, reported once, from either lane of a pair.
+TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
+    SY_LightState ambient = Light(kSY_LightAmbient), onSurface = Light(kSY_LightPoint, 5, 5, 0);
+    ambient.color[1] = ambient.color[2] = ambient.color[3] = 0.2;
+    auto shader = LitShader({&ambient, &onSurface});
+    shader->ambient = 1;
     shader->diffuse = 1;
+    ostrel_test::ReportCapture capture;
+    EXPECT_NEAR(LightAt(*shader, 5, 5, 0).diffuse[0], 0.2, 1e-6);
+    EXPECT_TRUE(capture.reports().empty());
     shader->eye[2] = 0;
-    Reports::All().clear();
-    U_Reporter previous = U_SetReporter(&Reports::Collect);
     int32_t thrown = 0;
     try {
         LightAt(*shader, 0, 0, 0);
     } catch (int32_t code) {
         thrown = code;
     }
-    U_SetReporter(previous);
     EXPECT_EQ(thrown, 0x110B);
-    ASSERT_EQ(Reports::All().size(), 1u);
-    EXPECT_EQ(Reports::All()[0].code, 1114164);
-    EXPECT_EQ(Reports::All()[0].severity, 8);
-    EXPECT_STREQ(Reports::All()[0].text, M_ErrorMessage(kM_ErrZeroLengthVector));
+    ASSERT_EQ(capture.reports().size(), 1u);
+    EXPECT_EQ(capture.reports()[0].code, 1114164);
+    EXPECT_EQ(capture.reports()[0].text, M_ErrorMessage(kM_ErrZeroLengthVector));
+    const double onEye[3] = {0, 0, 0}, elsewhere[3] = {1, 2, 0};
+    SY_Lighting a, b;
+    EXPECT_THROW(shader->LightTwoPixels(onEye, elsewhere, kFront, &a, &b), int32_t);
+    EXPECT_THROW(shader->LightTwoPixels(elsewhere, onEye, kFront, &a, &b), int32_t);
 }
 
-TEST(Lighting, LightOnTheSurfaceIsSkippedSilently) {
-    SY_LightState ambient = Ambient(0.2, 0.2, 0.2);
-    SY_LightState onSurface = Point(5, 5, 0);
-    auto shader = LitShader({&ambient, &onSurface});
-    shader->ambient = 1;
-    shader->diffuse = 1;
-    Reports::All().clear();
-    U_Reporter previous = U_SetReporter(&Reports::Collect);
-    SY_Lighting out = LightAt(*shader, 5, 5, 0);
-    U_SetReporter(previous);
-    EXPECT_TRUE(Reports::All().empty());
-    ExpectTriple(out.diffuse, 0.2f, 0.2f, 0.2f, "ambient only");
+// Random light set-ups over every path of the lighting: each light type, cones, both falloffs,
+// transmission, metal, shadow maps whose transmission differs from pixel to pixel, and the
+// shadow-only path. Lights sit among the points, so pairs often have one pixel lit and the other
+// skipped, and some pixels lie exactly on a light.
+struct RandomScene {
+    explicit RandomScene(std::mt19937& random) {
+        std::uniform_real_distribution<double> coordinate(-300, 300), unit(0, 1);
+        std::uniform_int_distribution<int> count(1, 5), type(0, 3), falloff(0, 2);
+        auto normalize = [](double v[3]) {
+            const double length = std::sqrt(v[0] * v[0] + v[1] * v[1] + v[2] * v[2]);
+            for (int k = 0; k < 3; ++k)
+                v[k] /= length;
+        };
+        lights.resize(count(random));
+        for (SY_LightState& light : lights) {
+            light.type = type(random);
+            for (int k = 0; k < 3; ++k) {
+                light.position[k] = coordinate(random);
+                light.direction[k] = coordinate(random);
+                light.color[1 + k] = unit(random) * 1.5;
+            }
+            normalize(light.direction);
+            light.cosOuter = static_cast<float>(unit(random) * 0.9);
+            light.cosInner = light.cosOuter + static_cast<float>(unit(random) * 0.1);
+            light.coneScale = 1.0f / (light.cosInner - light.cosOuter);
+            light = Falloff(std::move(light), falloff(random), unit(random) * 200,
+                            unit(random) < 0.2 ? 0 : 150);
+            light.shadowDarkness = unit(random) < 0.3 ? 1.0 : unit(random);
+            if (light.type != kSY_LightAmbient && unit(random) < 0.4) {
+                auto map = std::make_unique<FixedShadow>(0, 0, 0);
+                map->varying = true;
+                light.shadowMap = std::move(map);
+            }
+        }
+        shader.lights.Allocate(static_cast<int32_t>(lights.size()));
+        for (size_t i = 0; i < lights.size(); ++i)
+            shader.lights[static_cast<int32_t>(i)] = &lights[i];
+        shader.acceptsLights = unit(random) < 0.8;
+        shader.acceptsShadows = static_cast<uint8_t>(unit(random) * 3);
+        shader.softShadowLookup = unit(random) < 0.5;
+        shader.needsPoint = 1;
+        shader.ambient = unit(random);
+        shader.diffuse = unit(random) < 0.2 ? 0 : unit(random);
+        shader.specular = unit(random) < 0.2 ? 0 : unit(random);
+        shader.lightTransmission = unit(random) < 0.5 ? 0 : unit(random);
+        const double metals[] = {0, 1, unit(random)};
+        shader.metal = metals[static_cast<int>(unit(random) * 3)];
+        shader.specularTable = &tables.ForShininess(unit(random) * 100);
+        shader.eye[0] = coordinate(random);
+        shader.eye[1] = coordinate(random);
+        shader.eye[2] = -2000;
+        for (double& c : normal)
+            c = coordinate(random);
+        normalize(normal);
+    }
+
+    SY_SpecularTables tables;
+    std::vector<SY_LightState> lights;
+    SY_LayerShader shader;
+    double normal[3];
+};
+
+bool Same(const SY_Lighting& a, const SY_Lighting& b) {
+    return std::memcmp(&a, &b, sizeof a) == 0;
+}
+
+TEST(Lighting, PairsLightBitForBitAsSinglePixels) {
+    std::mt19937 random(20261206);
+    std::uniform_real_distribution<double> coordinate(-400, 400);
+    std::uniform_int_distribution<int> pick(0, 9);
+    int highlights = 0, shadowed = 0, pairsThatDiffer = 0;
+    for (int scene = 0; scene < 300; ++scene) {
+        RandomScene setup(random);
+        for (int pair = 0; pair < 60; ++pair) {
+            double p[2][3];
+            for (auto& point : p) {
+                for (double& c : point)
+                    c = coordinate(random);
+                // Now and then a pixel exactly on a light, whose vector is then degenerate.
+                if (pick(random) == 0) {
+                    const SY_LightState& light = setup.lights[pick(random) % setup.lights.size()];
+                    std::copy(light.position, light.position + 3, point);
+                }
+            }
+            SY_Lighting one[2], two[2];
+            setup.shader.LightOnePixel(p[0], setup.normal, &one[0]);
+            setup.shader.LightOnePixel(p[1], setup.normal, &one[1]);
+            setup.shader.LightTwoPixels(p[0], p[1], setup.normal, &two[0], &two[1]);
+            ASSERT_TRUE(Same(one[0], two[0]) && Same(one[1], two[1]))
+                << "scene " << scene << " pair " << pair;
+            for (const SY_Lighting& out : one) {
+                highlights += out.specular[0] != 0;
+                shadowed += !setup.shader.acceptsLights && out.diffuse[0] != 1;
+            }
+            pairsThatDiffer += !Same(one[0], one[1]);
+        }
+    }
+    // The set-ups reach the highlights and the shadows, and pairs are not trivially alike.
+    EXPECT_GT(highlights, 1000);
+    EXPECT_GT(shadowed, 200);
+    EXPECT_GT(pairsThatDiffer, 10000);
+}
+
+SY_TRLayer Renderable(const SY_LayerDesc& layer, std::vector<const SY_LightState*> lights) {
+    SY_TRLayer renderable(layer);
+    renderable.lights.Allocate(static_cast<int32_t>(lights.size()));
+    std::copy(lights.begin(), lights.end(), renderable.lights.begin());
+    return renderable;
+}
+
+// What a layer's shader takes beyond its material: the camera as the eye, a depth offset that
+// puts later layers behind, filtered shadow edges for best quality, and the shininess's table.
+TEST(LayerShader, WhatTheFrameAndTheQualityAdd) {
+    SY_RenderContext context;
+    context.cameraPosition[0] = 1, context.cameraPosition[1] = 2, context.cameraPosition[2] = -3;
+    SY_LayerDesc layer;
+    layer.renderIndex = layer.depthIndex = 4;
+    layer.specular = 0.3;
+    layer.acceptsShadows = 1;
+    layer.bestQuality = true;
+    SY_LightState point = Light(kSY_LightPoint, 0, 0, -100);
+    auto shader = SY_MakeLayerShader(&context, Renderable(layer, {&point}));
+    EXPECT_EQ(shader->layerId, 4);
+    EXPECT_EQ(std::vector<double>(shader->eye, shader->eye + 3), (std::vector<double>{1, 2, -3}));
+    EXPECT_FLOAT_EQ(shader->depthOffset, -4e-7f);
+    EXPECT_EQ(shader->softShadowLookup, 1);
+    ASSERT_NE(shader->specularTable, nullptr);
+    EXPECT_FLOAT_EQ(shader->specularTable->exponent, 0.5 * SY_SpecularExponent(5));
+}
+
+// Which work a layer's pixels need, by its switches and lights; each shader leaves nothing
+// allocated once gone.
+TEST(LayerShader, WhichWorkThePixelsNeed) {
+    SY_LightState ambient = Light(kSY_LightAmbient), parallel = Light(kSY_LightParallel, 0, 0, -1);
+    SY_LightState parallelFalloff = Falloff(Light(kSY_LightParallel, 0, 0, -1), 1, 100, 10);
+    SY_LightState point = Light(kSY_LightPoint, 0, 0, -100);
+    SY_LightState shadowing = Light(kSY_LightParallel, 0, 0, -1);
+    shadowing.shadowMap = std::make_unique<FixedShadow>(0, 0, 0);
+    struct Case {
+        const char* what;
+        bool acceptsLights;
+        uint8_t acceptsShadows;
+        double specular;
+        std::vector<const SY_LightState*> lights;
+        bool shaded, needsPoint, table;
+    };
+    const Case cases[] = {
+        {"no lights", true, 1, 0.5, {}, false, false, false},
+        {"lights disabled", false, 0, 0.5, {&point}, false, false, false},
+        {"lights disabled, shadows off", false, 0, 0.5, {&shadowing}, false, false, false},
+        {"shadow-only without maps", false, 2, 0.5, {&point}, false, false, false},
+        {"shadow-only with a map", false, 2, 0.5, {&point, &shadowing}, true, true, false},
+        {"ambient only", true, 0, 0.5, {&ambient}, true, false, false},
+        {"parallel, no highlight", true, 0, 0, {&ambient, &parallel}, true, false, false},
+        {"parallel with a highlight", true, 0, 0.5, {&parallel}, true, true, true},
+        {"parallel with falloff", true, 0, 0, {&parallelFalloff}, true, true, false},
+        {"parallel with a shadow", true, 1, 0, {&shadowing}, true, true, false},
+        {"parallel, shadows not taken", true, 0, 0, {&shadowing}, true, false, false},
+        {"point", true, 0, 0, {&point}, true, true, false},
+    };
+    for (const Case& c : cases) {
+        const int64_t start = U_AccountedBytes();
+        {
+            SY_RenderContext context;
+            SY_LayerDesc layer;
+            layer.acceptsLights = c.acceptsLights;
+            layer.acceptsShadows = c.acceptsShadows;
+            layer.specular = c.specular;
+            auto shader = SY_MakeLayerShader(&context, Renderable(layer, c.lights));
+            EXPECT_EQ(shader->shaded, c.shaded) << c.what;
+            EXPECT_EQ(shader->NeedsSurfacePoint(), c.needsPoint) << c.what;
+            EXPECT_EQ(shader->specularTable != nullptr, c.table) << c.what;
+            EXPECT_EQ(context.specularTables.Count(), c.table ? 1u : 0u) << c.what;
+        }
+        EXPECT_EQ(U_AccountedBytes(), start) << c.what;
+    }
 }
 
 }  // namespace
