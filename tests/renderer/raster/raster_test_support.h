@@ -2,6 +2,8 @@
 // reader can recompute, layers placed in front of the default camera, and a frame runner.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <cstdint>
 #include <memory>
 #include <vector>
@@ -14,6 +16,8 @@
 #include "renderer/scene/frame_driver.h"
 
 namespace raster_test {
+
+using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
 
 // A channel value given as an 8-bit code, in the range of P.
 template <class P>

@@ -1,0 +1,292 @@
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <vector>
+
+#include "raster_test_support.h"
+#include "renderer/mbuffer/mbuffer.h"
+#include "renderer/mbuffer/shadow_fragments.h"
+#include "renderer/raster/image_span.h"
+#include "renderer/raster/shader.h"
+#include "renderer/raster/span_render.h"
+#include "renderer/raster/span_routine.h"
+#include "renderer/scene/screen_geometry.h"
+
+namespace {
+
+using raster_test::Code;
+using raster_test::Equal;
+using raster_test::IsClear;
+using raster_test::Opaque;
+using raster_test::PatternTexel;
+
+constexpr int32_t kWidth = 16, kHeight = 8;
+
+// W = w0 + x·dx + y·dy, with texel (i, j) under output pixel (i, j).
+M_Matrix3 Plane(double w0, double dx = 0, double dy = 0) {
+    M_Matrix3 m{};
+    m.mat[0][0] = m.mat[1][1] = 1;
+    m.mat[0][2] = dx;
+    m.mat[1][2] = dy;
+    m.mat[2][2] = w0;
+    return m;
+}
+
+// A 16 × 8 pattern drawn by a textured layer's routine or, as an image in output coordinates,
+// by the image spans; orthographic at W = 1 unless a test moves the plane.
+template <class P>
+class Span : public ::testing::Test {
+protected:
+    Span() : texture_(raster_test::PatternTexture<P>(kWidth, kHeight)) {
+        geometry_.textureFetcher = &fetcher_;
+        geometry_.texture = texture_.get();
+        SetPlane(Plane(1), false);
+    }
+    void SetPlane(const M_Matrix3& m, bool perspective) {
+        geometry_.screenToTexture.Allocate(1);
+        geometry_.screenToTexture[0] = m;
+        geometry_.firstValid = geometry_.lastValid = 0;
+        geometry_.perspective = perspective;
+    }
+    void Draw(bool image, const SY_RenderTarget& target, int32_t x, int32_t count, int32_t y,
+              const PF_World* matte = nullptr) {
+        if (image)
+            SY_RenderLayerSpanFromImage_SwitchDepth(blend_, geometry_, matte, x, count, y, nullptr,
+                                                    target, 0);
+        else
+            SY_RenderLayerSpan_SwitchDepth(geometry_, &shader_, matte, x, count, y, nullptr, target,
+                                           0);
+    }
+
+    ostrel_test::MemoryTextureFetcher fetcher_;
+    std::unique_ptr<PF_WorldX<P>> texture_;
+    SY_ScreenGeometry geometry_;
+    SY_LayerShader shader_;
+    SY_SpanBlend blend_;
+};
+
+TYPED_TEST_SUITE(Span, raster_test::PixelTypes);
+
+// A span draws exactly its pixels, each showing the texel under it; an image span only those
+// the image has. Targets a dispatcher has no routine for receive nothing.
+TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
+    using P = TypeParam;
+    struct Case {
+        bool image;
+        int32_t mode, x, count, y, from, to;
+    };
+    const Case cases[] = {
+        {false, kSY_TargetDestination, 3, 0, 2, 0, 0},  // nothing
+        {false, kSY_TargetDestination, 3, -2, 2, 0, 0},
+        {false, kSY_TargetDestination, 5, 1, 2, 5, 6},  // the single-pixel tail only
+        {false, kSY_TargetDestination, 5, 2, 2, 5, 7},  // a pair
+        {false, kSY_TargetDestination, 2, 7, 2, 2, 9},  // pairs and a tail
+        {false, kSY_TargetShadowArray, 0, 16, 2, 0, 0},
+        {true, kSY_TargetDestination, 3, 5, 2, 3, 8},
+        {true, kSY_TargetDestination, -4, 30, 5, 0, 16},  // clipped to the image
+        {true, kSY_TargetDestination, 0, 16, 8, 0, 0},    // the row below the image
+        {true, kSY_TargetDepthOfField, 0, 16, 2, 0, 0},
+        {true, kSY_TargetShadowArray, 0, 16, 2, 0, 0},
+    };
+    for (const Case& c : cases) {
+        PF_WorldX<P> destination(kWidth + 4, kHeight + 2);
+        SY_SpanImageRecord store{&destination, 0, 0};
+        SY_ShadowFragmentArray occluders({0, 0, kWidth, kHeight});
+        void* objects[] = {nullptr, &destination, nullptr, &store, &occluders};
+        this->Draw(c.image, {c.mode, objects[c.mode]}, c.x, c.count, c.y);
+        EXPECT_EQ(occluders.fragmentCount.load(), 0u);
+        for (int32_t y = 0; y < destination.height; ++y) {
+            for (int32_t x = 0; x < destination.width; ++x) {
+                const bool drawn = y == c.y && x >= c.from && x < c.to;
+                const P& got = destination.At(x, y);
+                ASSERT_TRUE(drawn ? Equal(got, PatternTexel<P>(x, y)) : IsClear(got))
+                    << "case " << &c - cases << " at " << x << "," << y;
+            }
+        }
+    }
+}
+
+// A store target writes the span's pixels at the image's origin, unblended.
+TYPED_TEST(Span, StoreTargetWritesAtTheImageOrigin) {
+    using P = TypeParam;
+    PF_WorldX<P> image(10, 4);
+    SY_SpanImageRecord record{&image, 3, 1};
+    this->Draw(false, {kSY_TargetDepthOfField, &record}, 4, 5, 2);
+    for (int32_t i = 0; i < 10; ++i)
+        EXPECT_EQ(i >= 1 && i < 6, Equal(image.At(i, 1), PatternTexel<P>(i + 3, 2))) << i;
+    EXPECT_TRUE(IsClear(image.At(1, 0)));
+}
+
+// With bit 7 of the mode set, the destination's alpha survives every transfer mode.
+TYPED_TEST(Span, KeepAlphaLeavesTheDestinationAlpha) {
+    using P = TypeParam;
+    const P under = {Code<P>(100), Code<P>(60), Code<P>(120), Code<P>(180)};
+    for (int32_t mode : {kPF_XferNormal, 4, kPF_XferMultiply, 6}) {  // also add and screen
+        this->blend_.mode = static_cast<uint8_t>(mode | 128);
+        auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, under);
+        this->Draw(true, {kSY_TargetDestination, destination.get()}, 0, kWidth, 3);
+        for (int32_t x = 0; x < kWidth; ++x) {
+            EXPECT_EQ(destination->At(x, 3).alpha, under.alpha) << mode << " at " << x;
+            EXPECT_FALSE(Equal(destination->At(x, 3), under)) << mode << " at " << x;
+        }
+    }
+}
+
+// A matte of alpha 0 hides the pixel; half the matte alpha at half the opacity blends the
+// pixel over transparent black at a quarter, through either dispatcher.
+TYPED_TEST(Span, MatteAndOpacityScaleTheCoverage) {
+    using P = TypeParam;
+    using Traits = PF_PixelTraits<P>;
+    this->blend_.opacity = this->shader_.opacity = 0.5;
+    PF_WorldX<P> matte(kWidth, kHeight);
+    for (int32_t x = 0; x < kWidth; ++x)
+        matte.At(x, 4).alpha = x < 8 ? 0 : static_cast<typename Traits::Channel>(Traits::kMax / 2);
+    for (bool image : {false, true}) {
+        PF_WorldX<P> destination(kWidth, kHeight);
+        this->Draw(image, {kSY_TargetDestination, &destination}, 0, kWidth, 4, &matte);
+        for (int32_t x = 0; x < kWidth; ++x) {
+            const double alpha = double(destination.At(x, 4).alpha) / Traits::kMax;
+            EXPECT_NEAR(alpha, x < 8 ? 0 : 0.25, 1.0 / 255) << x << " image " << image;
+        }
+    }
+}
+
+// Ambient light of half strength halves every colour channel: c·½ + ½, truncated for integer
+// channels; the shadows-only layer lights the channel maximum instead of the texel's colour.
+TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
+    using P = TypeParam;
+    SY_LightState ambient;
+    ambient.type = kSY_LightAmbient;
+    ambient.color[1] = ambient.color[2] = ambient.color[3] = 0.5;
+    SY_LayerShader& shader = this->shader_;
+    shader.lights.Allocate(1);
+    shader.lights[0] = &ambient;
+    shader.ambient = shader.acceptsLights = shader.shaded = 1;
+    auto half = [](double c) {
+        return PF_PixelTraits<P>::kIsFloat ? c / 2 : std::floor(c / 2 + 0.5);
+    };
+    for (uint8_t acceptsShadows : {0, 2}) {
+        shader.acceptsShadows = acceptsShadows;
+        PF_WorldX<P> destination(kWidth, kHeight);
+        this->Draw(false, {kSY_TargetDestination, &destination}, 1, 3, 4);  // a pair and the tail
+        for (int32_t i = 1; i < 4; ++i) {
+            const P texel = acceptsShadows ? Opaque<P>(255, 255, 255) : PatternTexel<P>(i, 4);
+            const P& got = destination.At(i, 4);
+            EXPECT_EQ(got.alpha, texel.alpha);
+            EXPECT_FLOAT_EQ(got.red, half(texel.red)) << i;
+            EXPECT_FLOAT_EQ(got.green, half(texel.green)) << i;
+            EXPECT_FLOAT_EQ(got.blue, half(texel.blue)) << i;
+        }
+    }
+}
+
+// Under a perspective camera W = 1 − x/8 falls to 0 at x = 8: the plane lies behind the camera
+// from there on and the image span draws nothing.
+TYPED_TEST(Span, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
+    using P = TypeParam;
+    this->SetPlane(Plane(1, -0.125), true);
+    PF_WorldX<P> destination(kWidth, kHeight);
+    this->Draw(true, {kSY_TargetDestination, &destination}, 0, kWidth, 0);
+    for (int32_t x = 0; x < kWidth; ++x)
+        EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
+}
+
+// A delivery that keeps the depth of every pixel, as a fragment buffer's would.
+struct RecordingDelivery {
+    static constexpr bool kUsesDepth = true;
+    void Deliver(int32_t x, const PF_Pixel8&, SY_Coverage<PF_Pixel8>, const SY_FragmentDepth& d,
+                 int32_t) {
+        xs.push_back(x);
+        depths.push_back(d);
+    }
+    std::vector<int32_t> xs;
+    std::vector<SY_FragmentDepth> depths;
+};
+
+// W = 10 + x/4 + y/2: a fragment's key is W at its pixel's top-left corner less one W extent
+// (¼ + ½), plus the layer's offset. Two subsamples whose W differ by −2 over the shutter start
+// from the smaller W with half the extent of one sample, and hand the travel on.
+TEST(SpanDepth, KeysLieOneExtentBelowThePixelsCorner) {
+    auto texture = raster_test::PatternTexture<PF_Pixel8>(8, 8);
+    SY_SpanSampleState<PF_Pixel8> one;
+    SY_SpanSubsampleState<PF_Pixel8> two;
+    for (SY_SpanTexture* t : {&one.texture, &two.texture}) {
+        t->world = t->sampling.src = texture.get();
+        t->perspective = false;
+    }
+    one.mapping.Start(Plane(10, 0.25, 0.5), 2.5, 3.5, false, 1.0f);
+    two.count = 2;
+    two.last = 1;
+    two.mappings[0].Start(Plane(10, 0.25, 0.5), 2.5, 3.5, false, 0.5f);
+    two.mappings[1].Start(Plane(8, 0.25, 0.5), 2.5, 3.5, false, 0.5f);
+    SY_SpanRayState ray{};
+    SY_LayerShader shader;
+    shader.depthOffset = -0.125f;
+    RecordingDelivery delivery, travel;
+    const PF_Pixel8* noMatte = nullptr;
+    SY_DrawSpan(shader, false, one, ray, noMatte, 2, 3, delivery, 0);
+    ASSERT_EQ(delivery.xs, (std::vector<int32_t>{2, 3, 4}));
+    for (int i = 0; i < 3; ++i) {
+        const double corner = 10 + (2 + i) * 0.25 + 3 * 0.5;
+        EXPECT_FLOAT_EQ(delivery.depths[i].depth, corner - 0.75 - 0.125) << i;
+        EXPECT_EQ(delivery.depths[i].dzdx, 0.25f);
+        EXPECT_EQ(delivery.depths[i].dzdy, 0.5f);
+        EXPECT_EQ(delivery.depths[i].dzdt, 0.0f);
+    }
+    shader.depthOffset = 0;
+    SY_DrawSpan(shader, false, two, ray, noMatte, 2, 1, travel, 0);
+    ASSERT_EQ(travel.depths.size(), 1u);
+    EXPECT_FLOAT_EQ(travel.depths[0].depth, 10 + 2.5 * 0.25 + 3.5 * 0.5 - 0.375 - 2 - 0.375);
+    EXPECT_EQ(travel.depths[0].dzdt, -2.0f);
+}
+
+// Image spans key their fragments the same way; a transparent image pixel adds no fragment.
+TYPED_TEST(Span, ImageFragmentsTakeTheirDepthFromThePlane) {
+    using P = TypeParam;
+    this->SetPlane(Plane(2, 0.25), false);
+    this->blend_.depthOffset = -0.125f;
+    this->texture_->At(5, 1) = P{};
+    auto buffer =
+        SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
+    this->Draw(true, {kSY_TargetFragmentBuffer, buffer.get()}, 2, 6, 1);
+    auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
+    for (int32_t x = 0; x < kWidth; ++x) {
+        const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
+        ASSERT_EQ(f != nullptr, x >= 2 && x < 8 && x != 5) << x;
+        if (!f) continue;
+        EXPECT_EQ(f->next, nullptr);
+        EXPECT_FLOAT_EQ(f->depth, 2 + x * 0.25f - 0.25f - 0.125f) << x;
+        EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
+    }
+}
+
+// Both dispatchers refuse a texture whose depth differs from the target's.
+TEST(SpanDepth, TextureOfAnotherDepthIsReportedAndThrowsThree) {
+    ostrel_test::MemoryTextureFetcher fetcher;
+    PF_WorldX<PF_Pixel8> texture(4, 4);
+    SY_ScreenGeometry geometry;
+    geometry.textureFetcher = &fetcher;
+    geometry.texture = &texture;
+    geometry.screenToTexture.Allocate(1);
+    SY_LayerShader shader;
+    PF_WorldX<PF_Pixel16> destination(4, 4);
+    const SY_RenderTarget target{kSY_TargetDestination, &destination};
+    for (bool image : {false, true}) {
+        ostrel_test::ReportCapture capture;
+        int32_t thrown = 0;
+        try {
+            if (image)
+                SY_RenderLayerSpanFromImage_SwitchDepth({}, geometry, nullptr, 0, 4, 0, nullptr,
+                                                        target, 0);
+            else
+                SY_RenderLayerSpan_SwitchDepth(geometry, &shader, nullptr, 0, 4, 0, nullptr, target,
+                                               0);
+        } catch (int32_t code) {
+            thrown = code;
+        }
+        EXPECT_EQ(thrown, 3) << image;
+        EXPECT_EQ(capture.reports().size(), 1u) << image;
+    }
+}
+
+}  // namespace
