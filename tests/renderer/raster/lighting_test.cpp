@@ -277,27 +277,10 @@ SY_TRLayer Renderable(const SY_LayerDesc& layer, std::vector<const SY_LightState
     return renderable;
 }
 
-// What a layer's shader takes beyond its material: the camera as the eye, a depth offset that
-// puts later layers behind, filtered shadow edges for best quality, and the shininess's table.
-TEST(LayerShader, WhatTheFrameAndTheQualityAdd) {
-    SY_RenderContext context;
-    context.cameraPosition[0] = 1, context.cameraPosition[1] = 2, context.cameraPosition[2] = -3;
-    SY_LayerDesc layer;
-    layer.renderIndex = layer.depthIndex = 4;
-    layer.specular = 0.3;
-    layer.acceptsShadows = 1;
-    layer.bestQuality = true;
-    SY_LightState point = Light(kSY_LightPoint, 0, 0, -100);
-    auto shader = SY_MakeLayerShader(&context, Renderable(layer, {&point}));
-    EXPECT_EQ(std::vector<double>(shader->eye, shader->eye + 3), (std::vector<double>{1, 2, -3}));
-    EXPECT_FLOAT_EQ(shader->depthOffset, -4e-7f);
-    EXPECT_EQ(shader->softShadowLookup, 1);
-    ASSERT_NE(shader->specularTable, nullptr);
-    EXPECT_FLOAT_EQ(shader->specularTable->exponent, 0.5 * SY_SpecularExponent(5));
-}
-
-// Which work a layer's pixels need, by its switches and lights; each shader leaves nothing
-// allocated once gone.
+// Which work a layer's pixels need, by its switches and lights, and what the frame adds to
+// its material: the camera as the eye, a depth offset that puts later layers (here the fifth)
+// behind, filtered shadow edges for best quality (every other case), and the table of the
+// shininess (5 by default). Each shader leaves nothing allocated once gone.
 TEST(LayerShader, WhichWorkThePixelsNeed) {
     SY_LightState ambient = Light(kSY_LightAmbient), parallel = Light(kSY_LightParallel, 0, 0, -1);
     SY_LightState parallelFalloff = Falloff(Light(kSY_LightParallel, 0, 0, -1), 1, 100, 10);
@@ -330,7 +313,10 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
         const int64_t start = U_AccountedBytes();
         {
             SY_RenderContext context;
+            std::fill(context.cameraPosition, context.cameraPosition + 3, -3.0);
             SY_LayerDesc layer;
+            layer.renderIndex = layer.depthIndex = 4;
+            layer.bestQuality = (&c - cases) % 2;
             layer.acceptsLights = c.acceptsLights;
             layer.acceptsShadows = c.acceptsShadows;
             layer.specular = c.specular;
@@ -339,6 +325,11 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
             EXPECT_EQ(shader->NeedsSurfacePoint(), c.needsPoint) << c.what;
             EXPECT_EQ(shader->specularTable != nullptr, c.table) << c.what;
             EXPECT_EQ(context.specularTables.Count(), c.table ? 1u : 0u) << c.what;
+            const double exponent = c.table ? shader->specularTable->exponent : 0;
+            EXPECT_FLOAT_EQ(exponent, c.table ? 0.5 * SY_SpecularExponent(5) : 0) << c.what;
+            EXPECT_EQ(shader->eye[1], -3.0) << c.what;
+            EXPECT_FLOAT_EQ(shader->depthOffset, -4e-7f) << c.what;
+            EXPECT_EQ(shader->softShadowLookup, c.acceptsShadows && layer.bestQuality) << c.what;
         }
         EXPECT_EQ(U_AccountedBytes(), start) << c.what;
     }

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <type_traits>
 #include <vector>
 
 #include "raster_test_support.h"
@@ -68,7 +69,8 @@ protected:
 TYPED_TEST_SUITE(Span, raster_test::PixelTypes);
 
 // A span draws exactly its pixels, each showing the texel under it; an image span only those
-// the image has. Targets a dispatcher has no routine for receive nothing.
+// the image has. A store target takes them at its image's origin (3, 1), unblended; targets a
+// dispatcher has no routine for receive nothing.
 TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
     using P = TypeParam;
     struct Case {
@@ -81,6 +83,7 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
         {false, kSY_TargetDestination, 5, 1, 2, 5, 6},  // the single-pixel tail only
         {false, kSY_TargetDestination, 5, 2, 2, 5, 7},  // a pair
         {false, kSY_TargetDestination, 2, 7, 2, 2, 9},  // pairs and a tail
+        {false, kSY_TargetDepthOfField, 4, 5, 2, 4, 9},
         {false, kSY_TargetShadowArray, 0, 16, 2, 0, 0},
         {true, kSY_TargetDestination, 3, 5, 2, 3, 8},
         {true, kSY_TargetDestination, -4, 30, 5, 0, 16},  // clipped to the image
@@ -90,31 +93,22 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
     };
     for (const Case& c : cases) {
         PF_WorldX<P> destination(kWidth + 4, kHeight + 2);
-        SY_SpanImageRecord store{&destination, 0, 0};
+        SY_SpanImageRecord store{&destination, 3, 1};
         SY_ShadowFragmentArray occluders({0, 0, kWidth, kHeight});
         void* objects[] = {nullptr, &destination, nullptr, &store, &occluders};
         this->Draw(c.image, {c.mode, objects[c.mode]}, c.x, c.count, c.y);
         EXPECT_EQ(occluders.fragmentCount.load(), 0u);
-        for (int32_t y = 0; y < destination.height; ++y) {
-            for (int32_t x = 0; x < destination.width; ++x) {
+        const bool stored = c.mode == kSY_TargetDepthOfField;
+        for (int32_t j = 0; j < destination.height; ++j) {
+            for (int32_t i = 0; i < destination.width; ++i) {
+                const int32_t x = stored ? i + 3 : i, y = stored ? j + 1 : j;
                 const bool drawn = y == c.y && x >= c.from && x < c.to;
-                const P& got = destination.At(x, y);
+                const P& got = destination.At(i, j);
                 ASSERT_TRUE(drawn ? Equal(got, PatternTexel<P>(x, y)) : IsClear(got))
-                    << "case " << &c - cases << " at " << x << "," << y;
+                    << "case " << &c - cases << " at " << i << "," << j;
             }
         }
     }
-}
-
-// A store target writes the span's pixels at the image's origin, unblended.
-TYPED_TEST(Span, StoreTargetWritesAtTheImageOrigin) {
-    using P = TypeParam;
-    PF_WorldX<P> image(10, 4);
-    SY_SpanImageRecord record{&image, 3, 1};
-    this->Draw(false, {kSY_TargetDepthOfField, &record}, 4, 5, 2);
-    for (int32_t i = 0; i < 10; ++i)
-        EXPECT_EQ(i >= 1 && i < 6, Equal(image.At(i, 1), PatternTexel<P>(i + 3, 2))) << i;
-    EXPECT_TRUE(IsClear(image.At(1, 0)));
 }
 
 // With bit 7 of the mode set, the destination's alpha survives every transfer mode.
@@ -260,27 +254,15 @@ TYPED_TEST(Span, ImageFragmentsTakeTheirDepthFromThePlane) {
     }
 }
 
-// Both dispatchers refuse a texture whose depth differs from the target's.
-TEST(SpanDepth, TextureOfAnotherDepthIsReportedAndThrowsThree) {
-    ostrel_test::MemoryTextureFetcher fetcher;
-    PF_WorldX<PF_Pixel8> texture(4, 4);
-    SY_ScreenGeometry geometry;
-    geometry.textureFetcher = &fetcher;
-    geometry.texture = &texture;
-    geometry.screenToTexture.Allocate(1);
-    SY_LayerShader shader;
-    PF_WorldX<PF_Pixel16> destination(4, 4);
-    const SY_RenderTarget target{kSY_TargetDestination, &destination};
+// Both dispatchers refuse a texture whose depth differs from the target's: reported, thrown 3.
+TYPED_TEST(Span, TextureOfAnotherDepthIsReportedAndThrowsThree) {
+    using Other = std::conditional_t<std::is_same_v<TypeParam, PF_Pixel8>, PF_Pixel16, PF_Pixel8>;
+    PF_WorldX<Other> destination(kWidth, kHeight);
     for (bool image : {false, true}) {
         ostrel_test::ReportCapture capture;
         int32_t thrown = 0;
         try {
-            if (image)
-                SY_RenderLayerSpanFromImage_SwitchDepth({}, geometry, nullptr, 0, 4, 0, nullptr,
-                                                        target, 0);
-            else
-                SY_RenderLayerSpan_SwitchDepth(geometry, &shader, nullptr, 0, 4, 0, nullptr, target,
-                                               0);
+            this->Draw(image, {kSY_TargetDestination, &destination}, 0, 4, 0);
         } catch (int32_t code) {
             thrown = code;
         }
