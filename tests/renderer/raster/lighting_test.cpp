@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
+#include <tuple>
 #include <vector>
 
 #include "../scene/frame_test_support.h"
@@ -110,7 +111,6 @@ TEST(Lighting, OneLightAtAKnownPlace) {
     coloured.color[2] = 0.5, coloured.color[3] = 0.25;
     const Case cases[] = {
         {"ambient: colour × coefficient", std::move(coloured), 0, 0.8, 0, 0.8f},
-        {"ambient coefficient 0", Light(kSY_LightAmbient), 0, 0, 0, 0},
         {"point in front: N·L = 1", Light(kSY_LightPoint, 0, 0, -100), 0, 0, 0.5, 1},
         {"point in the plane: N·L = 0", Light(kSY_LightPoint, 100, 0, 0), 0, 0, 1, 0},
         {"point behind, no transmission", Light(kSY_LightPoint, 0, 0, 100), 0, 0, 0, 0},
@@ -179,40 +179,34 @@ TEST(Lighting, HighlightsByMetalAndAtGrazingLight) {
 // 1 − darkness × (1 − t), light without a map left out. Lookups follow the layer's
 // soft-shadow switch and name the layer; a layer taking no shadows is never looked up.
 TEST(Lighting, ShadowsLetThroughAKnownDarkness) {
-    struct Case {
-        bool lit;
-        double darkness;
-        float t;
-        uint8_t soft;
-        float shown;
-    };
-    const Case cases[] = {
+    const std::tuple<bool, double, float, uint8_t, float> cases[] = {
+        // lit, darkness, t, soft lookups, shown
         {false, 1, 0.25f, 0, 0.25f}, {false, 0.5, 0, 0, 0.5f}, {false, 0.5, 0.5f, 1, 0.75f},
         {false, 0, 0, 0, 1},         {true, 0.5, 0, 0, 0.5f},  {true, 1, 0, 0, 0},
         {true, 1, 0.25f, 1, 0.25f},
     };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(testing::Message() << c.lit << " " << c.darkness << " " << c.t);
+    for (const auto& [lit, darkness, t, soft, shown] : cases) {
+        SCOPED_TRACE(testing::Message() << lit << " " << darkness << " " << t);
         SY_LightState light =
-            c.lit ? Spot(0, 0, -100, 0, 0, -1, 0.9f, 0.95f) : Light(kSY_LightParallel, 0, 0, -1);
-        SY_LightState withoutMap = Light(c.lit ? kSY_LightAmbient : kSY_LightPoint, 0, 0, -100);
-        light.shadowDarkness = c.darkness;
-        auto map = std::make_unique<FixedShadow>(c.t, c.t, c.lit ? c.t : 1);
+            lit ? Spot(0, 0, -100, 0, 0, -1, 0.9f, 0.95f) : Light(kSY_LightParallel, 0, 0, -1);
+        SY_LightState withoutMap = Light(lit ? kSY_LightAmbient : kSY_LightPoint, 0, 0, -100);
+        light.shadowDarkness = darkness;
+        auto map = std::make_unique<FixedShadow>(t, t, lit ? t : 1);
         const FixedShadow& lookups = *map;
         light.shadowMap = std::move(map);
         auto shader = LitShader({&light, &withoutMap});
         shader->diffuse = 1;
-        shader->acceptsLights = c.lit;
-        shader->acceptsShadows = c.lit ? 1 : 2;
-        shader->softShadowLookup = c.soft;
+        shader->acceptsLights = lit;
+        shader->acceptsShadows = lit ? 1 : 2;
+        shader->softShadowLookup = soft;
         shader->layerId = 7;
         SY_Lighting out = LightAt(*shader, 0, 0);
-        EXPECT_NEAR(out.diffuse[0], c.shown, 1e-6);
-        EXPECT_NEAR(out.diffuse[2], c.lit ? c.shown : 1, 1e-6);
+        EXPECT_NEAR(out.diffuse[0], shown, 1e-6);
+        EXPECT_NEAR(out.diffuse[2], lit ? shown : 1, 1e-6);
         EXPECT_EQ(out.specular[0], 0);
-        if (!c.lit) continue;
-        EXPECT_EQ(lookups.softLookups, 2 * c.soft);  // the point alone and in the pair
-        EXPECT_EQ(lookups.hardLookups, 2 - 2 * c.soft);
+        if (!lit) continue;
+        EXPECT_EQ(lookups.softLookups, 2 * soft);  // the point alone and in the pair
+        EXPECT_EQ(lookups.hardLookups, 2 - 2 * soft);
         EXPECT_EQ(lookups.lastReceiver, 7);
         shader->acceptsShadows = 0;
         EXPECT_NEAR(LightAt(*shader, 0, 0).diffuse[0], 1, 1e-6);

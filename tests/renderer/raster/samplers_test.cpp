@@ -52,14 +52,13 @@ TYPED_TEST_SUITE(Samplers, raster_test::PixelTypes);
 TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
     using P = TypeParam;
     auto texture = raster_test::PatternTexture<P>(8, 4);
-    const double inside[][2] = {{0.5, 0.5}, {7.99, 3.99}, {3.0, 2.0}};
-    for (const auto& [x, y] : inside) {
-        const P expected = PatternTexel<P>(int32_t(x), int32_t(y));
-        EXPECT_TRUE(Equal(Sample<P>(*texture, 0, Scaled(1), x, y), expected)) << x << "," << y;
+    const double cases[][3] = {{0.5, 0.5, 1}, {7.99, 3.99, 1}, {3.0, 2.0, 1},
+                               {8.0, 1.5, 0}, {1.5, 4.0, 0},   {-0.25, 1.5, 0}};
+    for (const auto& [x, y, inside] : cases) {
+        const P got = Sample<P>(*texture, 0, Scaled(1), x, y);
+        EXPECT_TRUE(inside ? Equal(got, PatternTexel<P>(int32_t(x), int32_t(y))) : IsClear(got))
+            << x << "," << y;
     }
-    const double outside[][2] = {{8.0, 1.5}, {1.5, 4.0}, {-0.25, 1.5}};
-    for (const auto& [x, y] : outside)
-        EXPECT_TRUE(IsClear(Sample<P>(*texture, 0, Scaled(1), x, y))) << x << "," << y;
 }
 
 // Filtered at a texel centre with one texel to a pixel (a footprint of half a texel, still

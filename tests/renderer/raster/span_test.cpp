@@ -10,12 +10,10 @@
 #include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_render.h"
-#include "renderer/raster/span_routine.h"
 #include "renderer/scene/screen_geometry.h"
 
 namespace {
 
-using raster_test::Code;
 using raster_test::Equal;
 using raster_test::IsClear;
 using raster_test::Opaque;
@@ -114,7 +112,8 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
 // With bit 7 of the mode set, the destination's alpha survives every transfer mode.
 TYPED_TEST(Span, KeepAlphaLeavesTheDestinationAlpha) {
     using P = TypeParam;
-    const P under = {Code<P>(100), Code<P>(60), Code<P>(120), Code<P>(180)};
+    P under = Opaque<P>(60, 120, 180);
+    under.alpha = under.alpha * 100 / 255;
     for (int32_t mode : {kPF_XferNormal, 4, kPF_XferMultiply, 6}) {  // also add and screen
         this->blend_.mode = static_cast<uint8_t>(mode | 128);
         auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, under);
@@ -185,72 +184,41 @@ TYPED_TEST(Span, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
         EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
 }
 
-// A delivery that keeps the depth of every pixel, as a fragment buffer's would.
-struct RecordingDelivery {
-    static constexpr bool kUsesDepth = true;
-    void Deliver(int32_t x, const PF_Pixel8&, SY_Coverage<PF_Pixel8>, const SY_FragmentDepth& d,
-                 int32_t) {
-        xs.push_back(x);
-        depths.push_back(d);
-    }
-    std::vector<int32_t> xs;
-    std::vector<SY_FragmentDepth> depths;
-};
-
-// W = 10 + x/4 + y/2: a fragment's key is W at its pixel's top-left corner less one W extent
-// (¼ + ½), plus the layer's offset. Two subsamples whose W differ by −2 over the shutter start
-// from the smaller W with half the extent of one sample, and hand the travel on.
-TEST(SpanDepth, KeysLieOneExtentBelowThePixelsCorner) {
-    auto texture = raster_test::PatternTexture<PF_Pixel8>(8, 8);
-    SY_SpanSampleState<PF_Pixel8> one;
-    SY_SpanSubsampleState<PF_Pixel8> two;
-    for (SY_SpanTexture* t : {&one.texture, &two.texture}) {
-        t->world = t->sampling.src = texture.get();
-        t->perspective = false;
-    }
-    one.mapping.Start(Plane(10, 0.25, 0.5), 2.5, 3.5, false, 1.0f);
-    two.count = 2;
-    two.last = 1;
-    two.mappings[0].Start(Plane(10, 0.25, 0.5), 2.5, 3.5, false, 0.5f);
-    two.mappings[1].Start(Plane(8, 0.25, 0.5), 2.5, 3.5, false, 0.5f);
-    SY_SpanRayState ray{};
-    SY_LayerShader shader;
-    shader.depthOffset = -0.125f;
-    RecordingDelivery delivery, travel;
-    const PF_Pixel8* noMatte = nullptr;
-    SY_DrawSpan(shader, false, one, ray, noMatte, 2, 3, delivery, 0);
-    ASSERT_EQ(delivery.xs, (std::vector<int32_t>{2, 3, 4}));
-    for (int i = 0; i < 3; ++i) {
-        const double corner = 10 + (2 + i) * 0.25 + 3 * 0.5;
-        EXPECT_FLOAT_EQ(delivery.depths[i].depth, corner - 0.75 - 0.125) << i;
-        EXPECT_EQ(delivery.depths[i].dzdx, 0.25f);
-        EXPECT_EQ(delivery.depths[i].dzdy, 0.5f);
-        EXPECT_EQ(delivery.depths[i].dzdt, 0.0f);
-    }
-    shader.depthOffset = 0;
-    SY_DrawSpan(shader, false, two, ray, noMatte, 2, 1, travel, 0);
-    ASSERT_EQ(travel.depths.size(), 1u);
-    EXPECT_FLOAT_EQ(travel.depths[0].depth, 10 + 2.5 * 0.25 + 3.5 * 0.5 - 0.375 - 2 - 0.375);
-    EXPECT_EQ(travel.depths[0].dzdt, -2.0f);
-}
-
-// Image spans key their fragments the same way; a transparent image pixel adds no fragment.
-TYPED_TEST(Span, ImageFragmentsTakeTheirDepthFromThePlane) {
+// W = 2 + x/4: a fragment's key is W at its pixel's top-left corner less one W extent (¼),
+// plus the layer's offset (−⅛), from either dispatcher; a transparent image pixel adds none.
+// Two subsamples whose W differ by −2 over the shutter key from the smaller W at the pixel
+// centre (⅛ at x = 0), less the extent.
+TYPED_TEST(Span, FragmentKeysLieOneExtentBelowThePixelsCorner) {
     using P = TypeParam;
-    this->SetPlane(Plane(2, 0.25), false);
-    this->blend_.depthOffset = -0.125f;
     this->texture_->At(5, 1) = P{};
-    auto buffer =
-        SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
-    this->Draw(true, {kSY_TargetFragmentBuffer, buffer.get()}, 2, 6, 1);
-    auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
-    for (int32_t x = 0; x < kWidth; ++x) {
-        const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
-        ASSERT_EQ(f != nullptr, x >= 2 && x < 8 && x != 5) << x;
-        if (!f) continue;
-        EXPECT_EQ(f->next, nullptr);
-        EXPECT_FLOAT_EQ(f->depth, 2 + x * 0.25f - 0.25f - 0.125f) << x;
-        EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
+    const struct {
+        bool image;
+        int32_t samples;
+        double keyAtZero;
+    } cases[] = {{false, 1, 2 - 0.25 - 0.125},
+                 {true, 1, 2 - 0.25 - 0.125},
+                 {false, 2, 2 + 0.125 - 0.125 - 2 - 0.125 - 0.125}};
+    for (const auto& c : cases) {
+        this->SetPlane(Plane(2, 0.25), false);
+        if (c.samples == 2) {
+            this->geometry_.screenToTexture.Allocate(2);
+            this->geometry_.screenToTexture[0] = Plane(2, 0.25);
+            this->geometry_.screenToTexture[1] = Plane(0, 0.25);
+            this->geometry_.lastValid = 1;
+        }
+        this->blend_.depthOffset = this->shader_.depthOffset = -0.125f;
+        auto buffer =
+            SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
+        this->Draw(c.image, {kSY_TargetFragmentBuffer, buffer.get()}, 2, 6, 1);
+        auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
+        for (int32_t x = 0; x < kWidth; ++x) {
+            const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
+            ASSERT_EQ(f != nullptr, x >= 2 && x < 8 && x != 5) << x << " case " << &c - cases;
+            if (!f) continue;
+            EXPECT_EQ(f->next, nullptr);
+            EXPECT_FLOAT_EQ(f->depth, c.keyAtZero + x * 0.25) << x << " case " << &c - cases;
+            EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
+        }
     }
 }
 
