@@ -206,42 +206,37 @@ TEST(FrameRender, FailuresFreeWhatTheFrameTook) {
     EXPECT_EQ(U_AccountedBytes(), start);
 }
 
-// Layers of every kind the span routines know (plain, turned bilinear, bicubic multiplied at
-// 70 %, moving), drawn over three threads and over one: the frames are equal byte for byte.
-template <class P>
-void RenderMixedFrame(PF_World* plain, PF_World* large, PF_WorldX<P>* destination,
-                      const QNGP_IterateSuite1* iterate) {
-    Frame frame(kWidth, kHeight, 4);
-    frame.Layer(0, plain, Translation(2, 3, 0));
-    SY_LayerDesc& turned = frame.Layer(
-        1, large, scene_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
-    turned.bestQuality = true;
-    turned.engineFlag = 1;
-    SY_LayerDesc& bicubic = frame.Layer(2, plain, scene_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
-    bicubic.bestQuality = true;
-    bicubic.engineFlag = 2;
-    bicubic.opacity = 0.7;
-    bicubic.mode = kPF_XferMultiply;
-    SY_LayerDesc& moving = frame.Layer(3, plain, Translation(30, 5, 0));
-    scene_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
-    moving.motionBlur = true;
-    moving.bestQuality = true;
-    moving.engineFlag = 1;
-    frame.Render(destination, iterate);
-}
-
 template <class P>
 class FrameRenderThreads : public ::testing::Test {};
 TYPED_TEST_SUITE(FrameRenderThreads, raster_test::PixelTypes);
 
+// Layers of every kind the span routines know (plain, turned bilinear, bicubic multiplied at
+// 70 %, moving), drawn over three threads and over one: the frames are equal byte for byte.
 TYPED_TEST(FrameRenderThreads, ThreadedFrameEqualsSingleThreadedFrame) {
     using P = TypeParam;
-    auto plain = PatternTexture<P>(30, 20);
-    auto large = PatternTexture<P>(64, 64);
+    auto plain = PatternTexture<P>(30, 20), large = PatternTexture<P>(64, 64);
+    auto render = [&](PF_WorldX<P>* destination, const QNGP_IterateSuite1* iterate) {
+        Frame frame(kWidth, kHeight, 4);
+        frame.Layer(0, plain.get(), Translation(2, 3, 0));
+        SY_LayerDesc& turned = frame.Layer(
+            1, large.get(), scene_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
+        turned.bestQuality = true;
+        turned.engineFlag = 1;
+        SY_LayerDesc& bicubic =
+            frame.Layer(2, plain.get(), scene_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
+        bicubic.bestQuality = true;
+        bicubic.engineFlag = 2;
+        bicubic.opacity = 0.7;
+        bicubic.mode = kPF_XferMultiply;
+        SY_LayerDesc& moving = frame.Layer(3, plain.get(), Translation(30, 5, 0));
+        scene_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
+        moving.motionBlur = moving.bestQuality = true;
+        moving.engineFlag = 1;
+        frame.Render(destination, iterate);
+    };
     PF_WorldX<P> single(kWidth, kHeight), threaded(kWidth, kHeight);
-    RenderMixedFrame(plain.get(), large.get(), &single, nullptr);
-    RenderMixedFrame(plain.get(), large.get(), &threaded,
-                     ostrel_test::ThreadedIterateSuite<3>::Suite());
+    render(&single, nullptr);
+    render(&threaded, ostrel_test::ThreadedIterateSuite<3>::Suite());
     int32_t drawn = 0;
     for (int32_t y = 0; y < kHeight; ++y) {
         ASSERT_EQ(std::memcmp(single.Row(y), threaded.Row(y), sizeof(P) * kWidth), 0) << y;

@@ -53,26 +53,23 @@ SY_LightState Falloff(SY_LightState light, int32_t type, double radius, double d
 }
 
 // A shadow map that lets through a fixed transmission and counts the lookups asked of it.
-class FixedShadow : public SY_ShadowMap {
-public:
-    FixedShadow(float r, float g, float b) : t_{r, g, b} {}
-    void HardLookup(const double p[3], uint16_t receiver, float out[4]) const override {
-        Fill(p, receiver, out);
-        ++hardLookups;
+struct FixedShadow : SY_ShadowMap {
+    FixedShadow(float r, float g, float b) : t{r, g, b} {}
+    void HardLookup(const double*, uint16_t receiver, float out[4]) const override {
+        Fill(receiver, out, &hardLookups);
     }
-    void SoftLookup(const double p[3], uint16_t receiver, float out[4]) const override {
-        Fill(p, receiver, out);
-        ++softLookups;
+    void SoftLookup(const double*, uint16_t receiver, float out[4]) const override {
+        Fill(receiver, out, &softLookups);
     }
-    mutable int hardLookups = 0, softLookups = 0, lastReceiver = -1;
-
-private:
-    void Fill(const double*, uint16_t receiver, float out[4]) const {
+    void Fill(uint16_t receiver, float out[4], int* lookups) const {
         lastReceiver = receiver;
+        ++*lookups;
         out[0] = 1;
-        std::copy(t_, t_ + 3, out + 1);
+        std::copy(t, t + 3, out + 1);
     }
-    float t_[3];
+
+    float t[3];
+    mutable int hardLookups = 0, softLookups = 0, lastReceiver = -1;
 };
 
 // A shader that takes light from `lights`, with no material terms but those the test sets.
@@ -122,15 +119,14 @@ TEST(Lighting, OneLightAtAKnownPlace) {
         {"halfway: smoothstep ½ × N·L", Spot(0, 0, -300, 0, 0, -1, 0.5f, 0.7f), 400, 0, 0, 0.3f},
         {"outside the outer cone", Spot(0, 0, -300, 0, 0, -1, 0.7f, 0.8f), 400, 0, 0, 0},
         {"inside the inner cone: N·L", Spot(0, 0, -300, 0, 0, -1, 0.4f, 0.55f), 400, 0, 0, 0.6f},
-        // A point light at distance d straight in front, radius 100.
+        // A point light at distance d straight in front, radius 100. A smooth zone of 100 beyond
+        // it gives 3u² − 2u³, u the share of the zone still ahead: ½ at u = ½, 0.15625 at u = ¼.
         {"no falloff", Falloff(Light(kSY_LightPoint, 0, 0, -5000), 0, 100, 0), 0, 0, 0, 1},
         {"inverse square at R", Falloff(Light(kSY_LightPoint, 0, 0, -100), 2, 100, 0), 0, 0, 0, 1},
         {"(R/d)² at 2R", Falloff(Light(kSY_LightPoint, 0, 0, -200), 2, 100, 0), 0, 0, 0, 0.25f},
         {"inside R", Falloff(Light(kSY_LightPoint, 0, 0, -50), 1, 100, 100), 0, 0, 0, 1},
-        {"smooth zone u = ½", Falloff(Light(kSY_LightPoint, 0, 0, -150), 1, 100, 100), 0, 0, 0,
-         0.5f},
-        {"smooth zone u = ¼: 0.0625 × 2.5", Falloff(Light(kSY_LightPoint, 0, 0, -175), 1, 100, 100),
-         0, 0, 0, 0.15625f},
+        {"zone u = ½", Falloff(Light(kSY_LightPoint, 0, 0, -150), 1, 100, 100), 0, 0, 0, 0.5f},
+        {"zone u = ¼", Falloff(Light(kSY_LightPoint, 0, 0, -175), 1, 100, 100), 0, 0, 0, 0.15625f},
         {"zone's end", Falloff(Light(kSY_LightPoint, 0, 0, -200), 1, 100, 100), 0, 0, 0, 0},
         {"zone of no width", Falloff(Light(kSY_LightPoint, 0, 0, -150), 1, 100, 0), 0, 0, 0, 0},
     };
