@@ -17,7 +17,7 @@
 #include "m_matrix.h"
 #include "pf_world.h"
 #include "renderer/scene/fetchers.h"
-#include "renderer/scene/frame_driver.h"
+#include "renderer/frame/frame_driver.h"
 #include "renderer/scene/scene_desc.h"
 
 #ifdef OSTREL_HAVE_OPENCV

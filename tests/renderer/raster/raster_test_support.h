@@ -12,7 +12,7 @@
 #include "../scene/scene_fixtures.h"
 #include "pf_world.h"
 #include "pf_xfer.h"
-#include "renderer/scene/frame_driver.h"
+#include "renderer/frame/frame_driver.h"
 
 namespace raster_test {
 

@@ -6,7 +6,7 @@
 #include "frame_test_support.h"
 #include "memory_texture_fetcher.h"
 #include "pf_world.h"
-#include "renderer/scene/frame_driver.h"
+#include "renderer/frame/frame_driver.h"
 #include "renderer/scene/render_context.h"
 #include "scene_fixtures.h"
 #include "u_memory.h"

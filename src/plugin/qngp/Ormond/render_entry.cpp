@@ -3,7 +3,7 @@
 #include "entry_guard.h"
 #include "progress_abort.h"
 #include "render_context.h"
-#include "renderer/scene/frame_driver.h"
+#include "renderer/frame/frame_driver.h"
 #include "renderer/scene/scene_desc.h"
 #include "scene_assembly.h"
 #include "texture_fetcher.h"

@@ -1,4 +1,4 @@
-#include "renderer/scene/frame_driver.h"
+#include "renderer/frame/frame_driver.h"
 
 #include <algorithm>
 #include <climits>
