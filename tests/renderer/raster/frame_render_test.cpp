@@ -83,21 +83,18 @@ TYPED_TEST(FrameRender, EachPixelShowsTheTexelItsRayMeets) {
 }
 
 // A matte the test holds; outside it the layer is hidden unless the matte is an inverted one.
-class WorldMatte : public SY_TImageFetcher {
-public:
-    WorldMatte(PF_World* world, bool outsideIsClear) : world_(world), outside_(outsideIsClear) {}
+struct WorldMatte : SY_TImageFetcher {
+    WorldMatte(PF_World* matte, bool clear) : world(matte), outsideIsClear(clear) {}
     PF_World* Fetch() override {
         ++fetches;
-        return world_;
+        return world;
     }
     void Release() override { ++releases; }
-    bool OutsideIsClear() const override { return outside_; }
+    bool OutsideIsClear() const override { return outsideIsClear; }
 
+    PF_World* world;
+    bool outsideIsClear;
     int32_t fetches = 0, releases = 0;
-
-private:
-    PF_World* world_;
-    bool outside_;
 };
 
 // A matte smaller than the output, with alpha only from column 9 on (odd, so the pair loop

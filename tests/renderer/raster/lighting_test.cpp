@@ -35,20 +35,17 @@ SY_LightState Spot(double x, double y, double z, double ax, double ay, double az
                    float cosInner) {
     SY_LightState light = Light(kSY_LightSpot, x, y, z);
     light.direction[0] = ax, light.direction[1] = ay, light.direction[2] = az;
-    light.cosOuter = cosOuter;
-    light.cosInner = cosInner;
+    light.cosOuter = cosOuter, light.cosInner = cosInner;
     light.coneScale = cosInner == cosOuter ? 0.0f : 1.0f / (cosInner - cosOuter);
     return light;
 }
 
 SY_LightState Falloff(SY_LightState light, int32_t type, double radius, double distance) {
-    light.falloffType = type;
-    light.falloffRadius = radius;
-    light.falloffDistance = distance;
-    light.radiusSquared = radius * radius;
+    light.falloffType = type, light.falloffRadius = radius, light.falloffDistance = distance;
+    // What preparing a light derives from them.
+    light.radiusSquared = radius * radius, light.distanceSquared = distance * distance;
     light.outerSquared = (radius + distance) * (radius + distance);
     light.inverseDistance = distance == 0 ? 1.0 : 1.0 / distance;
-    light.distanceSquared = distance * distance;
     return light;
 }
 

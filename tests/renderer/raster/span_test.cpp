@@ -21,12 +21,11 @@ using raster_test::PatternTexel;
 
 constexpr int32_t kWidth = 16, kHeight = 8;
 
-// W = w0 + x·dx + y·dy, with texel (i, j) under output pixel (i, j).
-M_Matrix3 Plane(double w0, double dx = 0, double dy = 0) {
+// W = w0 + x·dx, with texel (i, j) under output pixel (i, j).
+M_Matrix3 Plane(double w0, double dx = 0) {
     M_Matrix3 m{};
     m.mat[0][0] = m.mat[1][1] = 1;
     m.mat[0][2] = dx;
-    m.mat[1][2] = dy;
     m.mat[2][2] = w0;
     return m;
 }
