@@ -101,10 +101,10 @@ TEST(Lighting, OneLightAtAKnownPlace) {
         double x, ambient, transmission;
         float lit;
     };
-    SY_LightState coloured = Light(kSY_LightAmbient);
-    coloured.color[2] = 0.5, coloured.color[3] = 0.25;
+    SY_LightState tinted = Light(kSY_LightAmbient);
+    tinted.color[2] = 0.5, tinted.color[3] = 0.25;
     const Case cases[] = {
-        {"ambient: colour × coefficient", std::move(coloured), 0, 0.8, 0, 0.8f},
+        {"ambient: colour × coefficient", std::move(tinted), 0, 0.8, 0, 0.8f},
         {"point in front: N·L = 1", Light(kSY_LightPoint, 0, 0, -100), 0, 0, 0.5, 1},
         {"point in the plane: N·L = 0", Light(kSY_LightPoint, 100, 0, 0), 0, 0, 1, 0},
         {"point behind, no transmission", Light(kSY_LightPoint, 0, 0, 100), 0, 0, 0, 0},
