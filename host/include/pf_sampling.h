@@ -38,7 +38,8 @@ public:
 };
 
 // Builds the area table of a world of the given bit depth (8, 16 or 32); the first caller
-// builds it, concurrent callers wait for it. Throws std::bad_alloc when memory runs out.
+// builds it, concurrent callers wait for it. Throws std::bad_alloc when memory runs out and
+// PF_UnexpectedBitDepth for any other depth.
 const PF_AreaTable& PF_BuildAreaTable(const PF_World& world, int16_t bitDepth);
 
 // The area table of a world of pixel type P, built on first use.

@@ -15,7 +15,8 @@
 // Premultiplied sums over a world of any depth, normalised: alpha in 0..1 and alpha × colour
 // with colour in 0..1. Sums(x, y), (Width() + 1) per row and Height() + 1 rows, holds the sum
 // over pixels [0, x) × [0, y), as PF_PixelDouble when built with doubleSums, else as
-// PF_PixelFloat (enough for small worlds only). Throws std::bad_alloc without memory.
+// PF_PixelFloat (enough for small worlds only). Throws std::bad_alloc without memory and
+// PF_UnexpectedBitDepth for a world of a depth other than 8, 16 and 32.
 class PF_SummedAreaTable : public U_MemTrackedObject {
 public:
     PF_SummedAreaTable(const PF_World& world, bool doubleSums);

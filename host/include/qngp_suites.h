@@ -8,6 +8,7 @@
 #include "m_matrix.h"
 #include "pf_iterate.h"
 #include "pf_world.h"
+#include "pf_xfer.h"
 #include "t_time.h"
 
 // Opaque host objects.
@@ -256,9 +257,10 @@ struct QNGP_StreamSuite7 {
 // ---- "PF Color Settings Suite" 1 and "QN ZEL Suite" 1 -----------------------------------
 
 struct PF_ColorSettingsSuite1 {
-    // The frame's colour settings, passed unchanged to the renderer's resolve: the address of
-    // the frame's PF_LinearBlendingTables, or 0 when blending is not linear.
-    int32_t (*GetColorSettings)(QNGP_RenderContextH context, uint64_t* settings);
+    // The frame's colour settings, passed unchanged to the renderer: the frame's blending
+    // tables, or null when blending is not linear.
+    int32_t (*GetColorSettings)(QNGP_RenderContextH context,
+                                const PF_LinearBlendingTables** settings);
 };
 
 struct QN_ZELSuite1 {

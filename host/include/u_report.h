@@ -3,9 +3,13 @@
 #pragma once
 
 #include <cstdint>
+#include <source_location>
 
 // Returned for an exception that is not about memory.
 inline constexpr int32_t kU_ErrInternal = 0x13A80003;
+
+// Thrown by the plug-in and the renderer for pixels of a depth other than 8, 16 or 32.
+inline constexpr int32_t kU_ErrUnexpectedBitDepth = 3;
 
 struct U_Report {
     enum class Kind { kErrorString, kFailedVerification, kException, kMath };
@@ -26,3 +30,18 @@ void U_ReportFailedVerification(int32_t code, int32_t line, int32_t reserved, co
 // Reports the exception in flight (call it from a catch block) and returns the error
 // code the caller should hand back: 4 for memory, kU_ErrInternal for anything else.
 int32_t U_TranslateAndReportException();
+
+// The answer of plug-in and renderer code to an unknown depth in PF_DispatchBitDepth: the
+// failed check is reported with message and the caller's line, then kU_ErrUnexpectedBitDepth
+// is thrown.
+class U_BitDepthVerification {
+public:
+    explicit U_BitDepthVerification(const char* message,
+                                    std::source_location where = std::source_location::current())
+        : message_(message), line_(static_cast<int32_t>(where.line())) {}
+    [[noreturn]] void operator()(int32_t bitDepth) const;
+
+private:
+    const char* message_;
+    int32_t line_;
+};

@@ -101,12 +101,10 @@ void DrawThroughFragmentBuffer(SY_RenderContext* context, const SY_RenderableGro
     std::unique_ptr<SY_MBuffer> buffer =
         SY_MBuffer::New(GroupRect(group, *context->destination),
                         context->destination->GetBitDepth(), anyBest, anyMotion);
-    SY_RenderTarget target{kSY_TargetFragmentBuffer, buffer.get()};
+    const SY_RenderTarget target(*buffer);
     for (SY_TRLayer* renderable : group)
         DrawRenderable(context, renderable, target);
-    buffer->Resolve(context->progress,
-                    reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
-                    *context->destination);
+    buffer->Resolve(context->progress, context->scene->colorSettings, *context->destination);
 }
 
 void DrawGroup(SY_RenderContext* context, const SY_RenderableGroup& group) {
@@ -114,7 +112,7 @@ void DrawGroup(SY_RenderContext* context, const SY_RenderableGroup& group) {
         DrawThroughFragmentBuffer(context, group);
         return;
     }
-    DrawRenderable(context, group.front(), {kSY_TargetDestination, context->destination});
+    DrawRenderable(context, group.front(), SY_RenderTarget(*context->destination));
 }
 
 }  // namespace

@@ -138,21 +138,20 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
     if (!geometry.Empty()) {
         MatteHold matteHold;
         PF_World* matte = nullptr;
-        bool matteApplies = target.mode != kSY_TargetDepthOfField &&
-                            target.mode != kSY_TargetShadowArray && trackMatte;
+        bool matteApplies = target.mode() != kSY_TargetDepthOfField &&
+                            target.mode() != kSY_TargetShadowArray && trackMatte;
         if (matteApplies) matte = matteHold.Fetch(trackMatte);
         if (!matteApplies || matte || !trackMatte->OutsideIsClear()) {
             SY_SpanTable table;
-            RowClosure closure{
-                &geometry,
-                shader,
-                matte,
-                matte && trackMatte->OutsideIsClear(),
-                &table,
-                &target,
-                reinterpret_cast<const PF_LinearBlendingTables*>(context->scene->colorSettings),
-                ImageBlend(material),
-                context->destination->width};
+            RowClosure closure{&geometry,
+                               shader,
+                               matte,
+                               matte && trackMatte->OutsideIsClear(),
+                               &table,
+                               &target,
+                               context->scene->colorSettings,
+                               ImageBlend(material),
+                               context->destination->width};
             if (simplePath)
                 DrawSimplePath(context, closure, fieldMode);
             else

@@ -2,8 +2,10 @@
 
 #include <new>
 
+#include "pf_bit_depth.h"
 #include "renderer/mbuffer/record_apply.h"
 #include "u_memory.h"
+#include "u_report.h"
 
 namespace {
 
@@ -26,29 +28,25 @@ SY_MBuffer* NewOfQuality(SY_MBufferQuality quality, const M_LRect& bounds) {
 
 }  // namespace
 
-SY_MBufferKind SY_MBufferKindFor(int16_t bitDepth, bool antialias, bool motionBlur) {
-    const int16_t depth = bitDepth == 16 || bitDepth == 32 ? bitDepth : int16_t{8};
-    if (motionBlur) return {SY_MBufferQuality::kMotionBlur, depth};
-    if (antialias) return {SY_MBufferQuality::kAntialiased, depth};
-    return {SY_MBufferQuality::kDraft, depth};
+SY_MBufferQuality SY_MBufferQualityFor(bool antialias, bool motionBlur) {
+    if (motionBlur) return SY_MBufferQuality::kMotionBlur;
+    if (antialias) return SY_MBufferQuality::kAntialiased;
+    return SY_MBufferQuality::kDraft;
 }
 
 std::unique_ptr<SY_MBuffer> SY_MBuffer::New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
                                             bool motionBlur) {
-    const SY_MBufferKind kind = SY_MBufferKindFor(bitDepth, antialias, motionBlur);
-    try {
-        switch (kind.bitDepth) {
-            case 16:
-                return std::unique_ptr<SY_MBuffer>(NewOfQuality<PF_Pixel16>(kind.quality, bounds));
-            case 32:
-                return std::unique_ptr<SY_MBuffer>(
-                    NewOfQuality<PF_PixelFloat>(kind.quality, bounds));
-            default:
-                return std::unique_ptr<SY_MBuffer>(NewOfQuality<PF_Pixel8>(kind.quality, bounds));
-        }
-    } catch (const std::bad_alloc&) {
-        throw kU_ErrOutOfMemory;  // the object itself could not be had
-    }
+    const SY_MBufferQuality quality = SY_MBufferQualityFor(antialias, motionBlur);
+    return PF_DispatchBitDepth(
+        bitDepth,
+        [&]<class P>() {
+            try {
+                return std::unique_ptr<SY_MBuffer>(NewOfQuality<P>(quality, bounds));
+            } catch (const std::bad_alloc&) {
+                throw kU_ErrOutOfMemory;  // the object itself could not be had
+            }
+        },
+        U_BitDepthVerification("Unexpected bitdepth in SY_MBuffer::New()"));
 }
 
 template <class P>

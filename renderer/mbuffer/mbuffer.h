@@ -26,9 +26,9 @@
 
 class SY_MBuffer {
 public:
-    // A buffer for the pixels of bounds, of the depth bitDepth (16 and 32 as such, anything
-    // else as 8) and the class the flags ask for; motion blur implies anti-aliasing. Throws 4
-    // when memory runs out, with nothing left allocated; never gives null.
+    // A buffer for the pixels of bounds, of the depth bitDepth (8, 16 or 32) and the class the
+    // flags ask for; motion blur implies anti-aliasing. Throws 4 when memory runs out, with
+    // nothing left allocated; any other depth is reported and throws 3. Never gives null.
     static std::unique_ptr<SY_MBuffer> New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
                                            bool motionBlur);
 
@@ -46,13 +46,8 @@ public:
 
 enum class SY_MBufferQuality : uint8_t { kDraft, kAntialiased, kMotionBlur };
 
-struct SY_MBufferKind {
-    SY_MBufferQuality quality;
-    int16_t bitDepth;  // 8, 16 or 32
-};
-
-// The class New chooses for a request.
-SY_MBufferKind SY_MBufferKindFor(int16_t bitDepth, bool antialias, bool motionBlur);
+// The class New chooses for the flags of a request.
+SY_MBufferQuality SY_MBufferQualityFor(bool antialias, bool motionBlur);
 
 template <class P>
 class SY_MBufferDraftX;

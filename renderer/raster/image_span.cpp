@@ -2,14 +2,13 @@
 
 #include <algorithm>
 
+#include "pf_bit_depth.h"
 #include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_state.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_report.h"
 
 namespace {
-
-constexpr int32_t kErrUnexpectedBitDepth = 3;
 
 // The span's pixels, clipped to the image, and the plane's depth at the first of them.
 struct ImageSpan {
@@ -48,17 +47,19 @@ void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
                  const PF_LinearBlendingTables* tables, const SY_RenderTarget& target,
                  int32_t thread) {
     const P* matte = matteWorld ? matteWorld->PixelAt<P>(span.x, y) : nullptr;
-    if (target.mode == kSY_TargetDestination) {
-        auto* world = static_cast<PF_World*>(target.object);
-        SY_CompositeDelivery<P> delivery(world->Row<P>(y), blend.mode, tables);
+    auto draw = [&](auto delivery) {
         DrawFromImage(blend, *layer.texture, span, matte, y, delivery, thread);
-        return;
-    }
-    auto* buffer = static_cast<SY_MBuffer*>(target.object);
-    if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
-    SY_DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
-                                         blend.mode);
-    DrawFromImage(blend, *layer.texture, span, matte, y, delivery, thread);
+    };
+    target.Visit(
+        [&](PF_World* world) {
+            draw(SY_CompositeDelivery<P>(world->Row<P>(y), blend.mode, tables));
+        },
+        [&](SY_MBuffer* buffer) {
+            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
+            draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
+                                             blend.mode));
+        },
+        [](const auto&) {});  // the other kinds are turned away before the depth is chosen
 }
 
 }  // namespace
@@ -69,33 +70,23 @@ void SY_RenderLayerSpanFromImage_SwitchDepth(const SY_SpanBlend& blend,
                                              const PF_LinearBlendingTables* tables,
                                              const SY_RenderTarget& target, int32_t thread) {
     if (count <= 0) return;
-    if (target.mode != kSY_TargetDestination && target.mode != kSY_TargetFragmentBuffer) return;
+    if (target.mode() != kSY_TargetDestination && target.mode() != kSY_TargetFragmentBuffer) return;
+    // An image of another depth than the target's is refused as an unknown depth is.
     int16_t depth = SY_TargetBitDepth(target);
     if (layer.texture->GetBitDepth() != depth) depth = 0;
-    if (depth != 8 && depth != 16 && depth != 32) {
-        U_ReportFailedVerification(
-            0, __LINE__, 0, "Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()");
-        throw kErrUnexpectedBitDepth;
-    }
-
-    const PF_World& image = *layer.texture;
-    if (y < 0 || y >= image.height) return;
-    ImageSpan span;
-    span.x = std::max(x, 0);
-    span.count = std::min(x + count, image.width) - span.x;
-    if (span.count <= 0) return;
-    span.perspective = layer.perspective;
-    span.depth.Start(layer.screenToTexture[layer.firstValid], span.x + 0.5, y + 0.5,
-                     layer.perspective, 1.0f);
-    switch (depth) {
-        case 8:
-            DrawAtDepth<PF_Pixel8>(blend, layer, matte, span, y, tables, target, thread);
-            break;
-        case 16:
-            DrawAtDepth<PF_Pixel16>(blend, layer, matte, span, y, tables, target, thread);
-            break;
-        default:
-            DrawAtDepth<PF_PixelFloat>(blend, layer, matte, span, y, tables, target, thread);
-            break;
-    }
+    PF_DispatchBitDepth(
+        depth,
+        [&]<class P>() {
+            const PF_World& image = *layer.texture;
+            if (y < 0 || y >= image.height) return;
+            ImageSpan span;
+            span.x = std::max(x, 0);
+            span.count = std::min(x + count, image.width) - span.x;
+            if (span.count <= 0) return;
+            span.perspective = layer.perspective;
+            span.depth.Start(layer.screenToTexture[layer.firstValid], span.x + 0.5, y + 0.5,
+                             layer.perspective, 1.0f);
+            DrawAtDepth<P>(blend, layer, matte, span, y, tables, target, thread);
+        },
+        U_BitDepthVerification("Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()"));
 }

@@ -77,11 +77,12 @@ struct SY_DraftFragmentDelivery {
     uint8_t mode;
 };
 
-// The pixel depth of a target of kind 1, 2 or 3.
+// The pixel depth of a target of kind 1, 2 or 3. Occluders (kind 4) are not pixels of the
+// frame's depth: 0, which no dispatch takes.
 inline int16_t SY_TargetBitDepth(const SY_RenderTarget& target) {
-    if (target.mode == kSY_TargetDestination)
-        return static_cast<const PF_World*>(target.object)->GetBitDepth();
-    if (target.mode == kSY_TargetFragmentBuffer)
-        return static_cast<const SY_MBuffer*>(target.object)->GetBitDepth();
-    return static_cast<const SY_SpanImageRecord*>(target.object)->image->GetBitDepth();
+    return target.Visit(
+        [](const PF_World* world) { return world->GetBitDepth(); },
+        [](const SY_MBuffer* buffer) { return buffer->GetBitDepth(); },
+        [](const SY_SpanImageRecord& record) { return record.image->GetBitDepth(); },
+        [](const SY_ShadowFragmentArray*) { return int16_t{0}; });
 }

@@ -1,5 +1,6 @@
 #include "renderer/raster/span_render.h"
 
+#include "pf_bit_depth.h"
 #include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_routine.h"
@@ -8,8 +9,6 @@
 #include "u_report.h"
 
 namespace {
-
-constexpr int32_t kErrUnexpectedBitDepth = 3;
 
 SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
     SY_SpanRayState ray;
@@ -34,30 +33,22 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
              int32_t x, int32_t count, int32_t y, const PF_LinearBlendingTables* tables,
              const SY_RenderTarget& target, int32_t thread) {
     bool pairLighting = U_G_CPU_DataP()->hasVectorUnits != 0;
-    switch (target.mode) {
-        case kSY_TargetDestination: {
-            auto* world = static_cast<PF_World*>(target.object);
-            SY_CompositeDelivery<P> delivery(world->Row<P>(y), shader.mode, tables);
-            SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
-            break;
-        }
-        case kSY_TargetFragmentBuffer: {
-            auto* buffer = static_cast<SY_MBuffer*>(target.object);
-            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) break;
-            SY_DraftFragmentDelivery<P> delivery(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                                 shader.mode);
-            SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
-            break;
-        }
-        case kSY_TargetDepthOfField: {
-            auto* record = static_cast<SY_SpanImageRecord*>(target.object);
-            SY_StoreDelivery<P> delivery{record->image->Row<P>(y - record->y0) - record->x0};
-            SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
-            break;
-        }
-        default:
-            break;
-    }
+    auto draw = [&](auto delivery) {
+        SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
+    };
+    target.Visit(
+        [&](PF_World* world) {
+            draw(SY_CompositeDelivery<P>(world->Row<P>(y), shader.mode, tables));
+        },
+        [&](SY_MBuffer* buffer) {
+            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
+            draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
+                                             shader.mode));
+        },
+        [&](const SY_SpanImageRecord& record) {
+            draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});
+        },
+        [](SY_ShadowFragmentArray*) {});
 }
 
 template <class P>
@@ -97,30 +88,15 @@ void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_
                                     const PF_World* matte, int32_t x, int32_t count, int32_t y,
                                     const PF_LinearBlendingTables* tables,
                                     const SY_RenderTarget& target, int32_t thread) {
-    if (count <= 0) return;
-    if (target.mode != kSY_TargetDestination && target.mode != kSY_TargetFragmentBuffer &&
-        target.mode != kSY_TargetDepthOfField) {
-        return;
-    }
+    if (count <= 0 || target.mode() == kSY_TargetShadowArray) return;
+    // A texture of another depth than the target's is refused as an unknown depth is.
     int16_t depth = SY_TargetBitDepth(target);
     if (geometry.texture->GetBitDepth() != depth) depth = 0;
     const auto& layerShader = static_cast<const SY_LayerShader&>(*shader);
-    switch (depth) {
-        case 8:
-            RenderAtDepth<PF_Pixel8>(geometry, layerShader, matte, x, count, y, tables, target,
-                                     thread);
-            break;
-        case 16:
-            RenderAtDepth<PF_Pixel16>(geometry, layerShader, matte, x, count, y, tables, target,
-                                      thread);
-            break;
-        case 32:
-            RenderAtDepth<PF_PixelFloat>(geometry, layerShader, matte, x, count, y, tables, target,
-                                         thread);
-            break;
-        default:
-            U_ReportFailedVerification(0, __LINE__, 0,
-                                       "Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()");
-            throw kErrUnexpectedBitDepth;
-    }
+    PF_DispatchBitDepth(
+        depth,
+        [&]<class P>() {
+            RenderAtDepth<P>(geometry, layerShader, matte, x, count, y, tables, target, thread);
+        },
+        U_BitDepthVerification("Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()"));
 }

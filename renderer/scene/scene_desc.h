@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "m_matrix.h"
+#include "pf_xfer.h"
 #include "renderer/scene/fetchers.h"
 #include "renderer/scene/owned_array.h"
 
@@ -96,5 +97,7 @@ struct SY_SceneDesc {
     SY_OwnedArray<SY_LayerDesc> layers;
     SY_OwnedArray<SY_LightDesc> lights;
     bool lightsEnabled = false;
-    uint64_t colorSettings = 0;  // the host's, handed unchanged to the resolve
+    // The host's blending tables for the frame, handed unchanged to the spans and the resolve;
+    // null blends the stored values.
+    const PF_LinearBlendingTables* colorSettings = nullptr;
 };

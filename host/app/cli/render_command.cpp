@@ -15,6 +15,7 @@
 #include "suites/iterate_suite.h"
 #include "suites/persistent_data_suite.h"
 #include "suites/suite_errors.h"
+#include "u_report.h"
 
 namespace ostrel {
 namespace {
@@ -76,6 +77,7 @@ std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_
     std::ostringstream text;
     text << where << "the renderer \"" << artisan.displayName << "\" failed with error " << code
          << " (0x" << std::hex << code << ")";
+    if (code == kU_ErrUnexpectedBitDepth) text << ": pixels of a depth other than 8, 16 or 32 bits";
     return text.str();
 }
 

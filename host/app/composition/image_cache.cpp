@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <stdexcept>
 
+#include "pf_bit_depth.h"
+
 namespace ostrel {
 namespace {
 
@@ -116,16 +118,8 @@ std::unique_ptr<PF_World> LayerSource(ImageCache& cache, const Layer& layer, int
         throw std::invalid_argument("layer \"" + layer.name + "\" has no pixels");
     }
     if (downsampleX < 1 || downsampleY < 1) throw std::invalid_argument("downsample below 1");
-    switch (bitDepth) {
-        case 8:
-            return Deliver<PF_Pixel8>(cache, layer, downsampleX, downsampleY);
-        case 16:
-            return Deliver<PF_Pixel16>(cache, layer, downsampleX, downsampleY);
-        case 32:
-            return Deliver<PF_PixelFloat>(cache, layer, downsampleX, downsampleY);
-        default:
-            throw std::invalid_argument("bit depth " + std::to_string(bitDepth));
-    }
+    return PF_DispatchBitDepth(
+        bitDepth, [&]<class P>() { return Deliver<P>(cache, layer, downsampleX, downsampleY); });
 }
 
 std::shared_ptr<PF_World> ImageCache::SharedSource(const Layer& layer, int16_t bitDepth,
@@ -144,16 +138,8 @@ std::shared_ptr<PF_World> ImageCache::SharedSource(const Layer& layer, int16_t b
 
 std::unique_ptr<PF_World> SolidPixels(const Color& color, int16_t bitDepth, int32_t width,
                                       int32_t height) {
-    switch (bitDepth) {
-        case 8:
-            return FromSolid<PF_Pixel8>(color, width, height);
-        case 16:
-            return FromSolid<PF_Pixel16>(color, width, height);
-        case 32:
-            return FromSolid<PF_PixelFloat>(color, width, height);
-        default:
-            throw std::invalid_argument("bit depth " + std::to_string(bitDepth));
-    }
+    return PF_DispatchBitDepth(bitDepth,
+                               [&]<class P>() { return FromSolid<P>(color, width, height); });
 }
 
 }  // namespace ostrel

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "host_error.h"
+#include "pf_bit_depth.h"
 
 namespace ostrel {
 namespace {
@@ -73,16 +74,8 @@ Pixels Convert(const PF_World& world, const std::string& format) {
 }
 
 Pixels Convert(const PF_World& world, const std::string& format) {
-    switch (world.bitDepth) {
-        case 8:
-            return Convert<PF_Pixel8>(world, format);
-        case 16:
-            return Convert<PF_Pixel16>(world, format);
-        case 32:
-            return Convert<PF_PixelFloat>(world, format);
-        default:
-            throw HostError("cannot write a world of " + std::to_string(world.bitDepth) + " bits");
-    }
+    return PF_DispatchBitDepth(world.bitDepth,
+                               [&]<class P>() { return Convert<P>(world, format); });
 }
 
 // The writer of the file's kind, chosen by its extension.

@@ -93,7 +93,7 @@ int32_t GetLightType(QNGP_LayerH light, int32_t* type) {
     });
 }
 
-int32_t GetColorSettings(QNGP_RenderContextH context, uint64_t* settings) {
+int32_t GetColorSettings(QNGP_RenderContextH context, const PF_LinearBlendingTables** settings) {
     return Serve(context, [&](FrameSession& session) {
         if (!settings) return kErrBadArgument;
         *settings = session.ColorSettings();

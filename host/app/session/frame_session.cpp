@@ -5,22 +5,15 @@
 #include <stdexcept>
 
 #include "composition/render_order.h"
+#include "pf_bit_depth.h"
 
 namespace ostrel {
 namespace {
 
 std::unique_ptr<PF_World> MakeWorld(int16_t bitDepth, int32_t width, int32_t height) {
-    switch (bitDepth) {
-        case 8:
-            return std::make_unique<PF_WorldX<PF_Pixel8>>(width, height);
-        case 16:
-            return std::make_unique<PF_WorldX<PF_Pixel16>>(width, height);
-        case 32:
-            return std::make_unique<PF_WorldX<PF_PixelFloat>>(width, height);
-        default:
-            throw std::invalid_argument("a bit depth of " + std::to_string(bitDepth) +
-                                        " (expected 8, 16 or 32)");
-    }
+    return PF_DispatchBitDepth(bitDepth, [&]<class P>() -> std::unique_ptr<PF_World> {
+        return std::make_unique<PF_WorldX<P>>(width, height);
+    });
 }
 
 QNGP_ShortRect RegionOf(const Composition& comp, const RenderSettings& settings) {
@@ -153,8 +146,8 @@ bool FrameSession::TakeBack(PF_World* world) {
     return true;
 }
 
-uint64_t FrameSession::ColorSettings() const {
-    return reinterpret_cast<uint64_t>(blending_.get());
+const PF_LinearBlendingTables* FrameSession::ColorSettings() const {
+    return blending_.get();
 }
 
 void FrameSession::NoteFailure(const std::string& message) {

@@ -122,7 +122,7 @@ public:
     bool TakeBack(PF_World* world);
 
     // The frame's colour settings as "PF Color Settings Suite" reports them.
-    uint64_t ColorSettings() const;
+    const PF_LinearBlendingTables* ColorSettings() const;
 
     void SetProgress(FrameProgress* progress) { progress_ = progress; }
     FrameProgress* Progress() const { return progress_; }

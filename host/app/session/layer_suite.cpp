@@ -4,9 +4,9 @@
 #include "composition/host_codes.h"
 #include "composition/streams.h"
 #include "composition/transform.h"
+#include "pf_xfer.h"
 #include "session/frame_suites.h"
 #include "session/suite_guard.h"
-#include "pf_xfer.h"
 
 namespace ostrel {
 namespace {

@@ -5,6 +5,7 @@
 #include <mutex>
 #include <new>
 
+#include "pf_bit_depth.h"
 #include "pf_sampling.h"
 #include "u_memory.h"
 
@@ -88,18 +89,8 @@ const PF_AreaTable& PF_BuildAreaTable(const PF_World& world, int16_t bitDepth) {
     std::lock_guard<std::mutex> lock(BuildLockFor(world));
     std::atomic<const PF_AreaTable*>& slot = world.samplingTables.area;
     if (const PF_AreaTable* built = slot.load(std::memory_order_acquire)) return *built;
-    std::unique_ptr<PF_AreaTable> table;
-    switch (bitDepth) {
-        case 8:
-            table = Build<PF_Pixel8>(world);
-            break;
-        case 16:
-            table = Build<PF_Pixel16>(world);
-            break;
-        default:
-            table = Build<PF_PixelFloat>(world);
-            break;
-    }
+    std::unique_ptr<PF_AreaTable> table =
+        PF_DispatchBitDepth(bitDepth, [&]<class P>() { return Build<P>(world); });
     slot.store(table.get(), std::memory_order_release);
     return *table.release();
 }

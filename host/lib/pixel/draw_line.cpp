@@ -5,6 +5,7 @@
 #include <cmath>
 #include <utility>
 
+#include "pf_bit_depth.h"
 #include "pf_draw.h"
 #include "pf_xfer.h"
 
@@ -89,14 +90,5 @@ void PF_DrawLine(const PF_World& world, double x0, double y0, double x1, double 
                  const PF_PixelFloat& color) {
     if (!std::isfinite(x0) || !std::isfinite(y0) || !std::isfinite(x1) || !std::isfinite(y1))
         return;
-    switch (world.bitDepth) {
-        case 8:
-            return Draw<PF_Pixel8>(world, x0, y0, x1, y1, color);
-        case 16:
-            return Draw<PF_Pixel16>(world, x0, y0, x1, y1, color);
-        case 32:
-            return Draw<PF_PixelFloat>(world, x0, y0, x1, y1, color);
-        default:
-            return;
-    }
+    PF_DispatchBitDepth(world.bitDepth, [&]<class P>() { Draw<P>(world, x0, y0, x1, y1, color); });
 }

@@ -1,7 +1,7 @@
 #include <cmath>
 #include <new>
-#include <stdexcept>
 
+#include "pf_bit_depth.h"
 #include "pf_tables.h"
 
 namespace {
@@ -39,33 +39,22 @@ void Fill(const PF_World& world, S* sums) {
     }
 }
 
-template <class S>
-void FillAnyDepth(const PF_World& world, S* sums) {
-    switch (world.bitDepth) {
-        case 8:
-            return Fill<PF_Pixel8>(world, sums);
-        case 16:
-            return Fill<PF_Pixel16>(world, sums);
-        default:
-            return Fill<PF_PixelFloat>(world, sums);
-    }
-}
-
 }  // namespace
 
 PF_SummedAreaTable::PF_SummedAreaTable(const PF_World& world, bool doubleSums)
     : width_(world.width), height_(world.height), doubleSums_(doubleSums) {
-    if (world.bitDepth != 8 && world.bitDepth != 16 && world.bitDepth != 32)
-        throw std::invalid_argument("PF_SummedAreaTable: unexpected bit depth");
-    size_t cell = doubleSums ? sizeof(PF_PixelDouble) : sizeof(PF_PixelFloat);
-    bytes_ = cell * (size_t(width_) + 1) * (size_t(height_) + 1);
-    sums_ = U_AllocatePtr(0, "summed-area table", bytes_);
-    if (!sums_) throw std::bad_alloc();
-    U_AccountAllocationEx(bytes_, 1);
-    if (doubleSums)
-        FillAnyDepth(world, static_cast<PF_PixelDouble*>(sums_));
-    else
-        FillAnyDepth(world, static_cast<PF_PixelFloat*>(sums_));
+    // The depth is known good before anything is allocated.
+    PF_DispatchBitDepth(world.bitDepth, [&]<class P>() {
+        size_t cell = doubleSums ? sizeof(PF_PixelDouble) : sizeof(PF_PixelFloat);
+        bytes_ = cell * (size_t(width_) + 1) * (size_t(height_) + 1);
+        sums_ = U_AllocatePtr(0, "summed-area table", bytes_);
+        if (!sums_) throw std::bad_alloc();
+        U_AccountAllocationEx(bytes_, 1);
+        if (doubleSums)
+            Fill<P>(world, static_cast<PF_PixelDouble*>(sums_));
+        else
+            Fill<P>(world, static_cast<PF_PixelFloat*>(sums_));
+    });
 }
 
 PF_SummedAreaTable::~PF_SummedAreaTable() {

@@ -42,6 +42,11 @@ void U_ReportFailedVerification(int32_t code, int32_t line, int32_t, const char*
     Report(U_Report::Kind::kFailedVerification, code, line, message);
 }
 
+void U_BitDepthVerification::operator()(int32_t) const {
+    U_ReportFailedVerification(0, line_, 0, message_);
+    throw kU_ErrUnexpectedBitDepth;
+}
+
 int32_t U_TranslateAndReportException() {
     try {
         throw;

@@ -406,9 +406,10 @@ TEST(CompSuites, CompItemCameraAndLight) {
     EXPECT_EQ(type, 1);  // spot
     EXPECT_EQ(LightSuite()->GetLightType(frame.Layer(0), &type), kErrWrongLayerKind);
 
-    uint64_t colorSettings = 1;
+    PF_LinearBlendingTables unused;
+    const PF_LinearBlendingTables* colorSettings = &unused;
     ASSERT_EQ(ColorSettingsSuite()->GetColorSettings(frame.Render(), &colorSettings), 0);
-    EXPECT_EQ(colorSettings, 0u);
+    EXPECT_EQ(colorSettings, nullptr);
 }
 
 TEST(CompSuites, NoCameraMeansNone) {

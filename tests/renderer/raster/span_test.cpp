@@ -92,8 +92,11 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
         PF_WorldX<P> destination(kWidth + 4, kHeight + 2);
         SY_SpanImageRecord store{&destination, 3, 1};
         SY_ShadowFragmentArray occluders({0, 0, kWidth, kHeight});
-        void* objects[] = {nullptr, &destination, nullptr, &store, &occluders};
-        this->Draw(c.image, {c.mode, objects[c.mode]}, c.x, c.count, c.y);
+        const SY_RenderTarget targets[] = {SY_RenderTarget(destination), SY_RenderTarget(store),
+                                           SY_RenderTarget(occluders)};
+        for (const SY_RenderTarget& target : targets) {
+            if (target.mode() == c.mode) this->Draw(c.image, target, c.x, c.count, c.y);
+        }
         EXPECT_EQ(occluders.fragmentCount.load(), 0u);
         const bool stored = c.mode == kSY_TargetDepthOfField;
         for (int32_t j = 0; j < destination.height; ++j) {
@@ -116,7 +119,7 @@ TYPED_TEST(Span, KeepAlphaLeavesTheDestinationAlpha) {
     for (int32_t mode : {kPF_XferNormal, 4, kPF_XferMultiply, 6}) {  // also add and screen
         this->blend_.mode = static_cast<uint8_t>(mode | 128);
         auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, under);
-        this->Draw(true, {kSY_TargetDestination, destination.get()}, 0, kWidth, 3);
+        this->Draw(true, SY_RenderTarget(*destination), 0, kWidth, 3);
         for (int32_t x = 0; x < kWidth; ++x) {
             EXPECT_EQ(destination->At(x, 3).alpha, under.alpha) << mode << " at " << x;
             EXPECT_FALSE(Equal(destination->At(x, 3), under)) << mode << " at " << x;
@@ -135,7 +138,7 @@ TYPED_TEST(Span, MatteAndOpacityScaleTheCoverage) {
         matte.At(x, 4).alpha = x < 8 ? 0 : static_cast<typename Traits::Channel>(Traits::kMax / 2);
     for (bool image : {false, true}) {
         PF_WorldX<P> destination(kWidth, kHeight);
-        this->Draw(image, {kSY_TargetDestination, &destination}, 0, kWidth, 4, &matte);
+        this->Draw(image, SY_RenderTarget(destination), 0, kWidth, 4, &matte);
         for (int32_t x = 0; x < kWidth; ++x) {
             const double alpha = double(destination.At(x, 4).alpha) / Traits::kMax;
             EXPECT_NEAR(alpha, x < 8 ? 0 : 0.25, 1.0 / 255) << x << " image " << image;
@@ -160,7 +163,7 @@ TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     for (uint8_t acceptsShadows : {0, 2}) {
         shader.acceptsShadows = acceptsShadows;
         PF_WorldX<P> destination(kWidth, kHeight);
-        this->Draw(false, {kSY_TargetDestination, &destination}, 1, 3, 4);  // a pair and the tail
+        this->Draw(false, SY_RenderTarget(destination), 1, 3, 4);  // a pair and the tail
         for (int32_t i = 1; i < 4; ++i) {
             const P texel = acceptsShadows ? Opaque<P>(255, 255, 255) : PatternTexel<P>(i, 4);
             const P& got = destination.At(i, 4);
@@ -178,7 +181,7 @@ TYPED_TEST(Span, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
     using P = TypeParam;
     this->SetPlane(Plane(1, -0.125), true);
     PF_WorldX<P> destination(kWidth, kHeight);
-    this->Draw(true, {kSY_TargetDestination, &destination}, 0, kWidth, 0);
+    this->Draw(true, SY_RenderTarget(destination), 0, kWidth, 0);
     for (int32_t x = 0; x < kWidth; ++x)
         EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
 }
@@ -208,7 +211,7 @@ TYPED_TEST(Span, FragmentKeysLieOneExtentBelowThePixelsCorner) {
         this->blend_.depthOffset = this->shader_.depthOffset = -0.125f;
         auto buffer =
             SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
-        this->Draw(c.image, {kSY_TargetFragmentBuffer, buffer.get()}, 2, 6, 1);
+        this->Draw(c.image, SY_RenderTarget(*buffer), 2, 6, 1);
         auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
         for (int32_t x = 0; x < kWidth; ++x) {
             const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
@@ -229,7 +232,7 @@ TYPED_TEST(Span, TextureOfAnotherDepthIsReportedAndThrowsThree) {
         ostrel_test::ReportCapture capture;
         int32_t thrown = 0;
         try {
-            this->Draw(image, {kSY_TargetDestination, &destination}, 0, 4, 0);
+            this->Draw(image, SY_RenderTarget(destination), 0, 4, 0);
         } catch (int32_t code) {
             thrown = code;
         }

@@ -1,22 +1,12 @@
 #include "track_matte_fetcher.h"
 
+#include "pf_bit_depth.h"
 #include "u_report.h"
 
 void ORM_ConvertMatteWorld(const PF_World& world, ORM_MatteType type) {
-    switch (world.GetBitDepth()) {
-        case 8:
-            ORM_ConvertMatte<PF_Pixel8>(world, type);
-            break;
-        case 16:
-            ORM_ConvertMatte<PF_Pixel16>(world, type);
-            break;
-        case 32:
-            ORM_ConvertMatte<PF_PixelFloat>(world, type);
-            break;
-        default:
-            U_ReportFailedVerification(0, __LINE__, 0, "Unexpected bitdepth in PF_IteratePixels()");
-            throw kORM_ErrBitDepth;
-    }
+    PF_DispatchBitDepth(
+        world.GetBitDepth(), [&]<class P>() { ORM_ConvertMatte<P>(world, type); },
+        U_BitDepthVerification("Unexpected bitdepth in PF_IteratePixels()"));
 }
 
 PF_World* ORM_TTrackMatteFetcher::Fetch() {

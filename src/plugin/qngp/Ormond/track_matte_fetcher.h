@@ -9,10 +9,8 @@
 #include "renderer/scene/fetchers.h"
 #include "u_memory.h"
 
-// Thrown, after a verification report, for a matte world of a depth other than 8, 16 or 32.
-inline constexpr int32_t kORM_ErrBitDepth = 3;
-
-// Turns the rendered matte layer into the alpha matte of its type, in place.
+// Turns the rendered matte layer into the alpha matte of its type, in place. A world of a depth
+// other than 8, 16 or 32 is reported and throws kU_ErrUnexpectedBitDepth.
 void ORM_ConvertMatteWorld(const PF_World& world, ORM_MatteType type);
 
 class ORM_TTrackMatteFetcher : public SY_TImageFetcher, public U_MemTrackedObject {
