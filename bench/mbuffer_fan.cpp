@@ -35,7 +35,7 @@ float SlopeOf(int32_t card) {
 }
 
 template <class P>
-P ColourOf(int32_t card) {
+P ColorOf(int32_t card) {
     using C = typename PF_PixelTraits<P>::Channel;
     constexpr float kMax = PF_PixelTraits<P>::kMax;
     auto c = [&](float v) { return static_cast<C>(v * kMax); };
@@ -61,7 +61,7 @@ int64_t ThreadCpuNs() {
 template <class P>
 void DrawCard(SY_MBufferDraftX<P>* buffer, int32_t card, int32_t threads,
               std::atomic<int64_t>* cpuNs) {
-    const P colour = ColourOf<P>(card);
+    const P color = ColorOf<P>(card);
     const float slope = SlopeOf(card);
     const float keyAtLeft = 1000.0f + (0.5f - kWidth / 2) * slope;
     std::atomic<int32_t> nextRow{0};
@@ -71,7 +71,7 @@ void DrawCard(SY_MBufferDraftX<P>* buffer, int32_t card, int32_t threads,
             auto** head = buffer->HeadAt(0, y);
             float key = keyAtLeft;
             for (int32_t x = 0; x < kWidth; ++x, ++head, key += slope)
-                buffer->AddFragment(&colour, FullCoverage<P>(), 2, key, head, thread);
+                buffer->AddFragment(&color, FullCoverage<P>(), 2, key, head, thread);
         }
         cpuNs->fetch_add(ThreadCpuNs() - start);
     };

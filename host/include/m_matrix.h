@@ -5,11 +5,13 @@
 
 #include <cstdint>
 
+// The math library's error codes.
 inline constexpr int32_t kM_ErrSingularMatrix = 0x1101;
 inline constexpr int32_t kM_ErrNotFinite = 0x1102;
 inline constexpr int32_t kM_ErrBadArgument = 0x1103;
 inline constexpr int32_t kM_ErrZeroLengthVector = 0x110B;
 
+// A 4×4 transform: placements map object to world, projections eye to screen.
 struct M_Matrix4 {
     double mat[4][4];
 
@@ -21,9 +23,11 @@ struct M_Matrix4 {
     void Project(double zoom);
 };
 
+// A 3×3 homography of a plane: screen pixels to texture pixels and back.
 struct M_Matrix3 {
     double mat[3][3];
 
+    // True when every element lies within epsilon of 0.
     bool IsZeroWithinEpsilon(double epsilon) const;
     // This = m without row 2 and column 2 (the z row and column): a homography of the plane z = 0.
     void AssignFromByDroppingZ(const M_Matrix4& m);
@@ -36,10 +40,12 @@ struct M_LRect {
     int32_t left, top, right, bottom;
 };
 
+// A point of the plane, for convex hulls.
 struct M_Point2 {
     double x, y;
 };
 
+// Sets m to the identity.
 int32_t M_IdentityMatrix4(M_Matrix4* m);
 void M_SetIdentityMatrix(M_Matrix3* m);
 
@@ -53,6 +59,7 @@ int32_t M_InverseMatrix4(const M_Matrix4* m, M_Matrix4* out);
 int32_t M_InverseMatrix4Quiet(const M_Matrix4* m, M_Matrix4* out);
 int32_t M_InverseMatrix(const M_Matrix3* m, M_Matrix3* out);
 
+// out = the transpose of m; out may alias m.
 int32_t M_TransposeMatrix4(const M_Matrix4* m, M_Matrix4* out);
 
 // Each of these appends a transformation to m: m = m·S, m·T, m·R.
@@ -63,6 +70,7 @@ int32_t M_RotateMatrix4XYZ(double rx, double ry, double rz, M_Matrix4* m);
 // For a 3×3 homography of the plane: m = m·T, moving every mapped point by (tx, ty).
 int32_t M_TranslateMatrix(M_Matrix3* m, double tx, double ty);
 
+// Embeds a plane homography in a 4×4 matrix that leaves z as it is.
 void M_Matrix3ToMatrix4(const M_Matrix3* m, M_Matrix4* out);
 
 // out = in·m, without the division by w.

@@ -16,5 +16,6 @@ int32_t PF_IterateGeneric_Static(int32_t count, void* closure, PF_IterateCallbac
 struct QNGP_IterateSuite1 {
     // Number of threads the iterator runs items on.
     int32_t (*GetThreadCount)(int32_t* count);
+    // Runs the items on the worker threads.
     PF_IterateFunction Iterate;
 };

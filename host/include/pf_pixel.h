@@ -13,14 +13,17 @@ struct PF_Pixel16 {
     uint16_t alpha, red, green, blue;
 };
 
+// Float channels are nominally 0..1; colour may run above 1.
 struct PF_PixelFloat {
     float alpha, red, green, blue;
 };
 
+// Double channels, for sums that must not lose precision.
 struct PF_PixelDouble {
     double alpha, red, green, blue;
 };
 
+// What differs between the three pixel types, for templates written once over them.
 template <class P>
 struct PF_PixelTraits;
 

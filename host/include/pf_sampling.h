@@ -51,6 +51,7 @@ inline const PF_AreaTable& PF_AreaTableOf(const PF_World& world) {
 
 namespace pf_sampling {
 
+// Sample positions and radii are 16.16 fixed point texels.
 inline constexpr float kFixedToTexels = 1.0f / 65536.0f;
 // Area radii are capped at 100 texels: the renderer asks no more, and the integer sums of a
 // box that size stay exact.
@@ -105,6 +106,7 @@ inline PF_Float4 CubicWeights(float t) {
            PF_Float4{0.0f, 1.0f, 0.0f, 0.0f};
 }
 
+// Lane i of v in all four lanes.
 template <int i>
 inline PF_Float4 Broadcast(PF_Float4 v) {
     return __builtin_shufflevector(v, v, i, i, i, i);

@@ -11,6 +11,7 @@
 
 #include "pf_pixel.h"
 
+// Four float lanes and four unsigned 32-bit lanes, one per channel.
 typedef float PF_Float4 __attribute__((vector_size(16)));
 typedef uint32_t PF_Uint4 __attribute__((vector_size(16)));
 

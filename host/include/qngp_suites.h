@@ -11,7 +11,7 @@
 #include "pf_xfer.h"
 #include "t_time.h"
 
-// Opaque host objects.
+// Opaque handles of host objects; only the host looks inside.
 using QNGP_CompH = struct QNGP_Comp*;
 using QNGP_ItemH = struct QNGP_Item*;
 using QNGP_LayerH = struct QNGP_Layer*;
@@ -19,11 +19,20 @@ using QNGP_RenderContextH = struct QNGP_RenderContext*;
 using QNGP_LayerContextH = struct QNGP_LayerContext*;
 using QNGP_MemHandle = struct QNGP_Memory*;
 using QNGP_PersistentBlobH = struct QNGP_PersistentBlob*;
-using QNGP_HostHandle = void*;
+using QNGP_HostHandle = void*;  // any other host handle an entry point receives
 
-// An error code the host returns for a suite it does not have.
-inline constexpr int32_t kQNGP_ErrMissingSuite = 0x13A80001;
+// Error codes the host's suites answer with (0 is success; memory the host cannot have is
+// kU_ErrOutOfMemory). A plug-in hands any of them back unchanged from the entry point.
+inline constexpr int32_t kQNGP_ErrMissingSuite = 0x13A80001;  // no suite of that name and version
+inline constexpr int32_t kQNGP_ErrBadHandle = 0x13A80020;     // a null or foreign handle
+inline constexpr int32_t kQNGP_ErrBadIndex = 0x13A80021;      // an index past the end of a list
+inline constexpr int32_t kQNGP_ErrBadArgument = 0x13A80022;   // a null out-pointer or unknown mode
+inline constexpr int32_t kQNGP_ErrNoSuchStream = 0x13A80023;  // a stream the layer does not have
+inline constexpr int32_t kQNGP_ErrWrongLayerKind = 0x13A80024;  // a camera call on a non-camera, …
+inline constexpr int32_t kQNGP_ErrHostFailure = 0x13A80025;     // the host could not deliver
+inline constexpr int32_t kQNGP_ErrUserCancel = 0x13A80026;      // the user interrupted the render
 
+// The suite through which every other suite is acquired and released.
 struct QNGP_BasicSuite {
     int32_t (*AcquireSuite)(const char* name, int32_t version, const void** suite);
     int32_t (*ReleaseSuite)(const char* name, int32_t version);
@@ -35,16 +44,19 @@ struct QNGP_InData {
     int32_t pluginId;
 };
 
+// An exact ratio, such as a pixel aspect.
 struct QNGP_Ratio {
     int32_t num, den;
 };
 
 // ---- "QNGP Register Suite" 6 ------------------------------------------------------------
 
+// A version as major and minor number.
 struct QNGP_Version16 {
     int16_t major, minor;
 };
 
+// The entry points an artisan registers: about box, instance life, options dialog, render.
 using QNGP_AboutEntry = int32_t (*)(const QNGP_InData* in);
 using QNGP_InstanceSetUpEntry = int32_t (*)(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHandle,
                                             QNGP_HostHandle, QNGP_HostHandle,
@@ -78,8 +90,10 @@ struct QNGP_ArtisanEntryPoints {
     void* slot10;
 };
 
+// Called once when the host unloads the plug-in.
 using QNGP_DeathHook = int32_t (*)(int32_t pluginId, int64_t reference);
 
+// Registers the artisan and its death hook, from the plug-in's main entry.
 struct QNGP_RegisterSuite6 {
     int32_t (*RegisterArtisan)(QNGP_Version16 api, QNGP_Version16 artisan, int32_t pluginId,
                                int64_t reference, const char* matchName, const char* displayName,
@@ -89,6 +103,7 @@ struct QNGP_RegisterSuite6 {
 
 // ---- "QNGP Memory Suite" 1 --------------------------------------------------------------
 
+// Relocatable memory the host keeps, such as an instance's options.
 struct QNGP_MemorySuite1 {
     int32_t (*NewHandle)(int32_t pluginId, const char* name, uint32_t size, int32_t flags,
                          QNGP_MemHandle* handle);
@@ -100,6 +115,7 @@ struct QNGP_MemorySuite1 {
 
 // ---- "QNGP Persistent Data Suite" 3 -----------------------------------------------------
 
+// The application's settings, by section and key.
 struct QNGP_PersistentDataSuite3 {
     int32_t (*GetApplicationBlob)(QNGP_PersistentBlobH* blob);
     int32_t (*GetLong)(QNGP_PersistentBlobH blob, const char* section, const char* key,
@@ -117,6 +133,7 @@ struct QNGP_ShortRect {
 inline constexpr int32_t kQNGP_RenderMatte = 0;
 inline constexpr int32_t kQNGP_RenderWholeLayer = 2;
 
+// What the host tells an artisan about the frame it renders and its layers.
 struct QNGP_CanvasSuite10 {
     int32_t (*GetCompToRender)(QNGP_RenderContextH context, QNGP_CompH* comp);
     int32_t (*GetRenderTime)(QNGP_RenderContextH context, T_Time* time, T_Time* timeStep);
@@ -160,26 +177,31 @@ struct QNGP_CanvasSuite10 {
     int32_t (*ReportRowProgress)(QNGP_RenderContextH context, int32_t count, int32_t total);
 };
 
+// Adds the comp's shutter interval.
 struct QNGP_CanvasSuite13 : QNGP_CanvasSuite10 {
     int32_t (*GetShutterInterval)(QNGP_RenderContextH context, T_Time* start, T_Time* duration);
 };
 
 // ---- "QNGP Comp Suite" 9 and 14 ---------------------------------------------------------
 
+// Comp flag bits: motion blur is on; lights and depth of field are switched off.
 inline constexpr int32_t kQNGP_CompFlagMotionBlur = 0x8;
 inline constexpr int32_t kQNGP_CompFlagNoLightsOrDepthOfField = 0x100;
 
+// A comp's flags and the item that holds it.
 struct QNGP_CompSuite9 {
     int32_t (*GetCompFlags)(QNGP_CompH comp, int32_t* flags);
     int32_t (*GetItemFromComp)(QNGP_CompH comp, QNGP_ItemH* item);
 };
 
+// Adds the comp's motion-blur sample count.
 struct QNGP_CompSuite14 : QNGP_CompSuite9 {
     int32_t (*GetCompMotionBlurSamples)(QNGP_CompH comp, int32_t* samples);
 };
 
 // ---- "QNGP Item Suite" 7 ----------------------------------------------------------------
 
+// An item's pixel aspect and size.
 struct QNGP_ItemSuite7 {
     int32_t (*GetItemPixelAspectRatio)(QNGP_ItemH item, QNGP_Ratio* ratio);
     int32_t (*GetItemDimensions)(QNGP_ItemH item, int32_t* width, int32_t* height);
@@ -187,8 +209,11 @@ struct QNGP_ItemSuite7 {
 
 // ---- "QNGP Camera Suite" 2 and "QNGP Light Suite" 1 -------------------------------------
 
+// Camera types.
+inline constexpr int32_t kQNGP_CameraPerspective = 0;
 inline constexpr int32_t kQNGP_CameraOrthographic = 1;
 
+// The comp's camera.
 struct QNGP_CameraSuite2 {
     // The comp's camera at that time, or null when it has none.
     int32_t (*GetCamera)(QNGP_RenderContextH context, const T_Time* time, QNGP_LayerH* camera);
@@ -196,36 +221,66 @@ struct QNGP_CameraSuite2 {
     int32_t (*GetDefaultCameraDistanceToImagePlane)(QNGP_CompH comp, double* distance);
 };
 
+// Light types as GetLightType reports them.
+inline constexpr int32_t kQNGP_LightParallel = 0;
+inline constexpr int32_t kQNGP_LightSpot = 1;
+inline constexpr int32_t kQNGP_LightPoint = 2;
+inline constexpr int32_t kQNGP_LightAmbient = 3;
+
+// A light layer's type.
 struct QNGP_LightSuite1 {
     int32_t (*GetLightType)(QNGP_LayerH light, int32_t* type);
 };
 
 // ---- "QNGP Layer Suite" 10 --------------------------------------------------------------
 
+// Layer flag bits. On a light the adjustment switch limits its light to the layers below it.
 inline constexpr int32_t kQNGP_LayerFlagMotionBlur = 0x8;
 inline constexpr int32_t kQNGP_LayerFlagCollapse = 0x80;
 inline constexpr int32_t kQNGP_LayerFlagAdjustment = 0x200;
 
+// Layer object types: image, solid and null layers are visual.
+inline constexpr int32_t kQNGP_ObjectTypeVisual = 0;
 inline constexpr int32_t kQNGP_ObjectTypeLight = 1;
+inline constexpr int32_t kQNGP_ObjectTypeCamera = 2;
+
+// Layer quality as GetLayerQuality reports it.
+inline constexpr int16_t kQNGP_QualityWireframe = 0;
+inline constexpr int16_t kQNGP_QualityDraft = 1;
+inline constexpr int16_t kQNGP_QualityBest = 2;
+
+// Texture sampling filter of an engine layer at best quality.
+inline constexpr uint8_t kQNGP_SamplingNearest = 0;
+inline constexpr uint8_t kQNGP_SamplingBilinear = 1;
+inline constexpr uint8_t kQNGP_SamplingBicubic = 2;
 
 // Transfer flag: keep the alpha of what lies below.
 inline constexpr int32_t kQNGP_TransferPreserveAlpha = 0x1;
 
+// How a layer uses the layer above it as its track matte.
+inline constexpr int32_t kQNGP_TrackMatteNone = 0;
+inline constexpr int32_t kQNGP_TrackMatteAlpha = 1;
+inline constexpr int32_t kQNGP_TrackMatteInvertedAlpha = 2;
+inline constexpr int32_t kQNGP_TrackMatteLuma = 3;
+inline constexpr int32_t kQNGP_TrackMatteInvertedLuma = 4;
+
+// A layer's transfer mode, its kQNGP_Transfer… flags and its kQNGP_TrackMatte… type.
 struct QNGP_LayerTransferMode {
     int32_t mode;
     int32_t flags;
-    int32_t trackMatte;  // 0 none, 1 alpha, 2 inverted alpha, 3 luma, 4 inverted luma
+    int32_t trackMatte;
 };
 
 // The host engine's view of a layer: whether it is an audio/visual layer, and that layer's
 // answers to the two queries the renderer makes (it ignores the keep-alpha flag; its texture
-// sampling quality: 0 nearest, 1 bilinear, 2 bicubic).
+// sampling filter, one of kQNGP_Sampling…).
 struct QNGP_EngineLayer {
     bool isAVLayer;
     bool ignoresPreserveAlpha;
     uint8_t samplingQuality;
 };
 
+// A comp's layers and each layer's switches, transfer mode and placement.
 struct QNGP_LayerSuite10 {
     int32_t (*GetCompNumLayers)(QNGP_CompH comp, int32_t* count);
     int32_t (*GetCompLayerByIndex)(QNGP_CompH comp, int32_t index, QNGP_LayerH* layer);
@@ -242,13 +297,66 @@ struct QNGP_LayerSuite10 {
 
 // ---- "QNGP Stream Suite" 7 --------------------------------------------------------------
 
+// Time mode of a stream query: the time is in the layer's own time.
 inline constexpr int32_t kQNGP_TimeModeLayer = 1;
+
+// Layer streams by number. Units are the host's: percent, degrees or pixels as noted.
+enum QNGP_Stream : int32_t {
+    // Transform, on every layer (anchor point, scale and opacity only on layers with pixels
+    // and nulls).
+    kQNGP_StreamAnchorPoint = 0,
+    kQNGP_StreamPosition = 1,
+    kQNGP_StreamScale = 2,        // x, y, z; percent
+    kQNGP_StreamOrientation = 3,  // degrees
+    kQNGP_StreamRotationX = 4,
+    kQNGP_StreamRotationY = 5,
+    kQNGP_StreamRotationZ = 6,
+    kQNGP_StreamOpacity = 7,  // percent
+    kQNGP_StreamPointOfInterest = 8,
+    // Camera.
+    kQNGP_StreamZoom = 11,          // pixels
+    kQNGP_StreamDepthOfField = 12,  // 0 or 1
+    kQNGP_StreamFocusDistance = 13,
+    kQNGP_StreamAperture = 14,
+    kQNGP_StreamBlurLevel = 15,  // percent
+    // Light.
+    kQNGP_StreamIntensity = 16,        // percent
+    kQNGP_StreamColor = 17,            // alpha 1, red, green, blue
+    kQNGP_StreamConeAngle = 18,        // degrees
+    kQNGP_StreamConeFeather = 19,      // percent
+    kQNGP_StreamShadowDarkness = 20,   // percent
+    kQNGP_StreamShadowDiffusion = 21,  // pixels
+    // Material, on image and solid layers.
+    kQNGP_StreamAcceptsShadows = 22,  // 0 off, 1 on, 2 only
+    kQNGP_StreamAcceptsLights = 23,   // 0 or 1
+    kQNGP_StreamAmbient = 24,         // percent, like the two after it
+    kQNGP_StreamDiffuse = 25,
+    kQNGP_StreamSpecularIntensity = 26,
+    kQNGP_StreamShininess = 27,          // percent
+    kQNGP_StreamCastsShadows = 28,       // layers: 0 off, 1 on, 2 only; lights: 0 or 1
+    kQNGP_StreamLightTransmission = 29,  // percent
+    kQNGP_StreamMetal = 30,              // percent
+    // Camera iris and highlights.
+    kQNGP_StreamIrisShape = 32,      // 1 fast rectangle, 3 and up the sides of a polygon
+    kQNGP_StreamIrisRotation = 33,   // degrees
+    kQNGP_StreamIrisRoundness = 34,  // percent
+    kQNGP_StreamIrisAspect = 35,
+    kQNGP_StreamDiffractionFringe = 36,    // percent
+    kQNGP_StreamHighlightGain = 37,        // percent
+    kQNGP_StreamHighlightThreshold = 38,   // 8-bit levels
+    kQNGP_StreamHighlightSaturation = 39,  // percent
+    // Light falloff.
+    kQNGP_StreamFalloff = 40,          // 1 none, 2 smooth, 3 inverse square
+    kQNGP_StreamFalloffRadius = 41,    // pixels
+    kQNGP_StreamFalloffDistance = 42,  // pixels
+};
 
 // A stream's value: one number in v[0], a pair in v[0..1], a colour as alpha, red, green, blue.
 struct QNGP_StreamValue {
     double v[4];
 };
 
+// A layer's stream values over time.
 struct QNGP_StreamSuite7 {
     int32_t (*GetLayerStreamValue)(QNGP_LayerH layer, int32_t stream, int32_t timeMode,
                                    const T_Time* time, int32_t flags, QNGP_StreamValue* value);
@@ -256,6 +364,7 @@ struct QNGP_StreamSuite7 {
 
 // ---- "PF Color Settings Suite" 1 and "QN ZEL Suite" 1 -----------------------------------
 
+// How the frame blends: linear light or not.
 struct PF_ColorSettingsSuite1 {
     // The frame's colour settings, passed unchanged to the renderer: the frame's blending
     // tables, or null when blending is not linear.
@@ -263,6 +372,7 @@ struct PF_ColorSettingsSuite1 {
                                 const PF_LinearBlendingTables** settings);
 };
 
+// What a dialog needs from the host's UI framework.
 struct QN_ZELSuite1 {
     int32_t (*GetDrawingSupplier)(void** supplier);
     int32_t (*GetParentNode)(void** node);

@@ -3,12 +3,13 @@
 
 #include <cstdint>
 
-// seconds = value / scale
+// A time as an exact fraction: seconds = value / scale.
 struct T_Time {
     int32_t value;
     uint32_t scale;
 };
 
+// The time library's error codes.
 inline constexpr int32_t kT_ErrOverflow = 0x1201;
 inline constexpr int32_t kT_ErrZeroScale = 0x1202;
 
@@ -21,4 +22,5 @@ int32_t T_DivideTime(const T_Time* t, int32_t divisor, T_Time* quotient);
 // Compares two times exactly: negative, 0 or positive.
 int32_t T_CompareTimes(const T_Time* a, const T_Time* b);
 
+// The time in seconds, for display and for interpolating keyframes.
 double T_Seconds(const T_Time& t);

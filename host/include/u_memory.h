@@ -15,6 +15,7 @@ void* U_AllocatePtr(uint32_t tag, const char* name, size_t bytes);
 // with the old block left as it was.
 int32_t U_ResizePtr(uint32_t tag, size_t bytes, const char* name, void** address);
 
+// Frees a block of U_AllocatePtr, U_ResizePtr or U_PurgeLoop; null is allowed.
 void U_FreePtr(void* block);
 
 // Runs over one element of a freshly allocated array.

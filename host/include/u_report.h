@@ -11,6 +11,7 @@ inline constexpr int32_t kU_ErrInternal = 0x13A80003;
 // Thrown by the plug-in and the renderer for pixels of a depth other than 8, 16 or 32.
 inline constexpr int32_t kU_ErrUnexpectedBitDepth = 3;
 
+// One report as the installed reporter receives it.
 struct U_Report {
     enum class Kind { kErrorString, kFailedVerification, kException, kMath };
     Kind kind;
@@ -19,12 +20,15 @@ struct U_Report {
     const char* text;
 };
 
+// Receives every report of the process, from any thread.
 using U_Reporter = void (*)(const U_Report& report);
 
 // Installs the reporter and returns the previous one; null restores the default.
 U_Reporter U_SetReporter(U_Reporter reporter);
 
+// Reports a message for the user with the error code it explains.
 void Up_ReportErrString(int32_t code, int32_t severity, const char* text);
+// Reports an internal check that failed, with the source line.
 void U_ReportFailedVerification(int32_t code, int32_t line, int32_t reserved, const char* message);
 
 // Reports the exception in flight (call it from a catch block) and returns the error

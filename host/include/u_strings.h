@@ -11,6 +11,7 @@ struct U_LStrTable {
     int32_t count;
 };
 
+// A registered table's handle.
 using U_LStrCache = const struct U_LStrCacheRecord*;
 
 // Registers a table; *cache receives the handle. 0 or an error code.
@@ -29,11 +30,12 @@ int32_t U_ZUnregisterLStrCache(U_LStrCache cache);
 void U_SubString(char* buffer, size_t capacity, const char* format, const char* first,
                  const char* second);
 
+// UTF-8 text as UTF-16, for the UI framework.
 std::u16string U_MBToUTF16String(const char* text);
 
 // The localised text of a "key=default text" string: the part after the first '=' (the whole
 // string when there is none).
 std::string U_ZStringToMBString(const char* zstring);
 
-// Error codes of the string cache.
+// The string caches' error code: a cache that is not registered.
 inline constexpr int32_t kU_ErrUnknownCache = 0x13A80010;

@@ -40,7 +40,7 @@ struct SY_ChannelMath<PF_Pixel8> {
         return static_cast<uint8_t>(from + SY_DivideBy255Rounded((int32_t{to} - from) * w));
     }
     static uint8_t AlphaFromSum(float sum) { return SY_RoundAccumulated<uint8_t>(sum); }
-    static uint8_t ColourFromSum(float sum) { return SY_RoundAccumulated<uint8_t>(sum); }
+    static uint8_t ColorFromSum(float sum) { return SY_RoundAccumulated<uint8_t>(sum); }
 };
 
 template <>
@@ -54,7 +54,7 @@ struct SY_ChannelMath<PF_Pixel16> {
         return static_cast<uint16_t>(from + (((int32_t{to} - from) * w) >> 15));
     }
     static uint16_t AlphaFromSum(float sum) { return SY_RoundAccumulated<uint16_t>(sum); }
-    static uint16_t ColourFromSum(float sum) { return SY_RoundAccumulated<uint16_t>(sum); }
+    static uint16_t ColorFromSum(float sum) { return SY_RoundAccumulated<uint16_t>(sum); }
 };
 
 template <>
@@ -67,5 +67,5 @@ struct SY_ChannelMath<PF_PixelFloat> {
         if (sum > 1.0f) return 1.0f;
         return sum < 1e-16f ? 0.0f : sum;
     }
-    static float ColourFromSum(float sum) { return sum; }
+    static float ColorFromSum(float sum) { return sum; }
 };

@@ -38,8 +38,8 @@ public:
             return;
         }
         using M = SY_ChannelMath<P>;
-        *d = {M::AlphaFromSum(sum_[0]), M::ColourFromSum(sum_[1]), M::ColourFromSum(sum_[2]),
-              M::ColourFromSum(sum_[3])};
+        *d = {M::AlphaFromSum(sum_[0]), M::ColorFromSum(sum_[1]), M::ColorFromSum(sum_[2]),
+              M::ColorFromSum(sum_[3])};
     }
 
 private:

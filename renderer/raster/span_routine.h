@@ -103,7 +103,7 @@ struct SpanSetup {
     SY_Coverage<P> coverage0;
     float offset0;  // moves the depth key from the pixel centre to its top-left corner
     bool filtered;
-    bool colourOnly;  // shadows only: the texel's colour is replaced by the channel maximum
+    bool colorOnly;  // shadows only: the texel's colour is replaced by the channel maximum
     bool shaded;
     bool needsPoint;
     bool pairLighting;
@@ -129,7 +129,7 @@ template <bool kDepth, class P, class State>
         SY_SampleFiltered(state, &out->texel);
     else
         SY_SampleNearest(state, &out->texel);
-    if (setup.colourOnly) {
+    if (setup.colorOnly) {
         constexpr C kMax = static_cast<C>(Traits::kMax);
         out->texel.red = out->texel.green = out->texel.blue = kMax;
     }
@@ -170,7 +170,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     setup.coverage0 = LayerCoverage<P>(shader.opacity);
     setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
     setup.filtered = state.texture.quality != 0;
-    setup.colourOnly = shader.acceptsShadows == 2;
+    setup.colorOnly = shader.acceptsShadows == 2;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
     setup.pairLighting = pairLighting;

@@ -11,10 +11,10 @@
 #include "composition/composition_loader.h"
 #include "host_error.h"
 #include "output/frame_writer.h"
+#include "qngp_suites.h"
 #include "session/frame_suites.h"
 #include "suites/iterate_suite.h"
 #include "suites/persistent_data_suite.h"
-#include "suites/suite_errors.h"
 #include "u_report.h"
 
 namespace ostrel {
@@ -72,7 +72,7 @@ auto Checked(const Composition& comp, const std::string& option, Parse&& parse) 
 std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_t frame,
                          int32_t code, const std::string& hostFailure) {
     std::string where = comp.file.string() + ": frame " + std::to_string(frame) + ": ";
-    if (code == kErrUserCancel) return where + "interrupted";
+    if (code == kQNGP_ErrUserCancel) return where + "interrupted";
     if (!hostFailure.empty()) return hostFailure + " (frame " + std::to_string(frame) + ")";
     std::ostringstream text;
     text << where << "the renderer \"" << artisan.displayName << "\" failed with error " << code

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "composition/keyframes.h"
+#include "qngp_suites.h"
 #include "t_time.h"
 
 namespace ostrel {
@@ -19,25 +20,34 @@ using Color = std::array<double, 3>;  // red, green, blue; 0 to 1
 enum class LayerKind { kImage, kSolid, kNull, kCamera, kLight };
 
 // The values are the host's quality codes.
-enum class Quality : int16_t { kWireframe = 0, kDraft = 1, kBest = 2 };
+enum class Quality : int16_t {
+    kWireframe = kQNGP_QualityWireframe,
+    kDraft = kQNGP_QualityDraft,
+    kBest = kQNGP_QualityBest,
+};
 
 // Texture sampling at best quality.
 enum class Sampling { kBilinear, kBicubic };
 
 // The values are the host's track matte types; the matte comes from another layer's pixels.
 enum class TrackMatte : int32_t {
-    kNone = 0,
-    kAlpha = 1,
-    kAlphaInverted = 2,
-    kLuma = 3,
-    kLumaInverted = 4,
+    kNone = kQNGP_TrackMatteNone,
+    kAlpha = kQNGP_TrackMatteAlpha,
+    kAlphaInverted = kQNGP_TrackMatteInvertedAlpha,
+    kLuma = kQNGP_TrackMatteLuma,
+    kLumaInverted = kQNGP_TrackMatteInvertedLuma,
 };
 
 // Shadow casting and accepting; the values are the host's stream values (2: only shadows).
 enum class ShadowMode : int32_t { kOff = 0, kOn = 1, kOnly = 2 };
 
 // The values are the host's light types.
-enum class LightType : int32_t { kParallel = 0, kSpot = 1, kPoint = 2, kAmbient = 3 };
+enum class LightType : int32_t {
+    kParallel = kQNGP_LightParallel,
+    kSpot = kQNGP_LightSpot,
+    kPoint = kQNGP_LightPoint,
+    kAmbient = kQNGP_LightAmbient,
+};
 
 // The values are the host's falloff stream values (one more than the renderer's type).
 enum class Falloff : int32_t { kNone = 1, kSmooth = 2, kInverseSquare = 3 };

@@ -21,17 +21,17 @@ std::optional<StreamVector> TransformStream(const Layer& layer, int32_t stream, 
     const Transform& x = layer.transform;
     bool hasPixelSpace = layer.kind != LayerKind::kCamera && layer.kind != LayerKind::kLight;
     switch (stream) {
-        case kStreamPosition:
+        case kQNGP_StreamPosition:
             return Three(x.position.At(t));
-        case kStreamOrientation:
+        case kQNGP_StreamOrientation:
             return Three(x.orientation.At(t));
-        case kStreamRotationX:
+        case kQNGP_StreamRotationX:
             return One(x.rotationX.ValueAt(t));
-        case kStreamRotationY:
+        case kQNGP_StreamRotationY:
             return One(x.rotationY.ValueAt(t));
-        case kStreamRotationZ:
+        case kQNGP_StreamRotationZ:
             return One(x.rotationZ.ValueAt(t));
-        case kStreamPointOfInterest:
+        case kQNGP_StreamPointOfInterest:
             if (layer.hasPointOfInterest) return Three(layer.pointOfInterest.At(t));
             return std::nullopt;
         default:
@@ -39,11 +39,11 @@ std::optional<StreamVector> TransformStream(const Layer& layer, int32_t stream, 
     }
     if (!hasPixelSpace) return std::nullopt;
     switch (stream) {
-        case kStreamAnchorPoint:
+        case kQNGP_StreamAnchorPoint:
             return Three(x.anchorPoint.At(t));
-        case kStreamScale:
+        case kQNGP_StreamScale:
             return Three(x.scale.At(t));
-        case kStreamOpacity:
+        case kQNGP_StreamOpacity:
             return One(x.opacity.ValueAt(t));
         default:
             return std::nullopt;
@@ -52,23 +52,23 @@ std::optional<StreamVector> TransformStream(const Layer& layer, int32_t stream, 
 
 std::optional<StreamVector> MaterialStream(const Material& m, int32_t stream, double t) {
     switch (stream) {
-        case kStreamAcceptsShadows:
+        case kQNGP_StreamAcceptsShadows:
             return One(static_cast<double>(m.acceptsShadows));
-        case kStreamAcceptsLights:
+        case kQNGP_StreamAcceptsLights:
             return Switch(m.acceptsLights);
-        case kStreamAmbient:
+        case kQNGP_StreamAmbient:
             return One(m.ambient.ValueAt(t));
-        case kStreamDiffuse:
+        case kQNGP_StreamDiffuse:
             return One(m.diffuse.ValueAt(t));
-        case kStreamSpecularIntensity:
+        case kQNGP_StreamSpecularIntensity:
             return One(m.specularIntensity.ValueAt(t));
-        case kStreamShininess:
+        case kQNGP_StreamShininess:
             return One(m.shininess.ValueAt(t));
-        case kStreamCastsShadows:
+        case kQNGP_StreamCastsShadows:
             return One(static_cast<double>(m.castsShadows));
-        case kStreamLightTransmission:
+        case kQNGP_StreamLightTransmission:
             return One(m.lightTransmission.ValueAt(t));
-        case kStreamMetal:
+        case kQNGP_StreamMetal:
             return One(m.metal.ValueAt(t));
         default:
             return std::nullopt;
@@ -78,31 +78,31 @@ std::optional<StreamVector> MaterialStream(const Material& m, int32_t stream, do
 std::optional<StreamVector> CameraStream(const CameraSettings& c, int32_t stream, double t) {
     const DepthOfField& d = c.depthOfField;
     switch (stream) {
-        case kStreamZoom:
+        case kQNGP_StreamZoom:
             return One(c.zoom.ValueAt(t));
-        case kStreamDepthOfField:
+        case kQNGP_StreamDepthOfField:
             return Switch(d.enabled);
-        case kStreamFocusDistance:
+        case kQNGP_StreamFocusDistance:
             return One(d.focusDistance.ValueAt(t));
-        case kStreamAperture:
+        case kQNGP_StreamAperture:
             return One(d.aperture.ValueAt(t));
-        case kStreamBlurLevel:
+        case kQNGP_StreamBlurLevel:
             return One(d.blurLevel.ValueAt(t));
-        case kStreamIrisShape:
+        case kQNGP_StreamIrisShape:
             return One(d.irisShape);
-        case kStreamIrisRotation:
+        case kQNGP_StreamIrisRotation:
             return One(d.irisRotation.ValueAt(t));
-        case kStreamIrisRoundness:
+        case kQNGP_StreamIrisRoundness:
             return One(d.irisRoundness.ValueAt(t));
-        case kStreamIrisAspect:
+        case kQNGP_StreamIrisAspect:
             return One(d.irisAspect.ValueAt(t));
-        case kStreamDiffractionFringe:
+        case kQNGP_StreamDiffractionFringe:
             return One(d.diffractionFringe.ValueAt(t));
-        case kStreamHighlightGain:
+        case kQNGP_StreamHighlightGain:
             return One(d.highlightGain.ValueAt(t));
-        case kStreamHighlightThreshold:
+        case kQNGP_StreamHighlightThreshold:
             return One(d.highlightThreshold.ValueAt(t));
-        case kStreamHighlightSaturation:
+        case kQNGP_StreamHighlightSaturation:
             return One(d.highlightSaturation.ValueAt(t));
         default:
             return std::nullopt;
@@ -111,27 +111,27 @@ std::optional<StreamVector> CameraStream(const CameraSettings& c, int32_t stream
 
 std::optional<StreamVector> LightStream(const LightSettings& l, int32_t stream, double t) {
     switch (stream) {
-        case kStreamIntensity:
+        case kQNGP_StreamIntensity:
             return One(l.intensity.ValueAt(t));
-        case kStreamColor: {
+        case kQNGP_StreamColor: {
             Vec<3> rgb = l.color.At(t);
             return StreamVector{{1.0, rgb[0], rgb[1], rgb[2]}, 4};
         }
-        case kStreamConeAngle:
+        case kQNGP_StreamConeAngle:
             return One(l.coneAngle.ValueAt(t));
-        case kStreamConeFeather:
+        case kQNGP_StreamConeFeather:
             return One(l.coneFeather.ValueAt(t));
-        case kStreamShadowDarkness:
+        case kQNGP_StreamShadowDarkness:
             return One(l.shadowDarkness.ValueAt(t));
-        case kStreamShadowDiffusion:
+        case kQNGP_StreamShadowDiffusion:
             return One(l.shadowDiffusion.ValueAt(t));
-        case kStreamCastsShadows:
+        case kQNGP_StreamCastsShadows:
             return Switch(l.castsShadows);
-        case kStreamFalloff:
+        case kQNGP_StreamFalloff:
             return One(static_cast<double>(l.falloff));
-        case kStreamFalloffRadius:
+        case kQNGP_StreamFalloffRadius:
             return One(l.radius.ValueAt(t));
-        case kStreamFalloffDistance:
+        case kQNGP_StreamFalloffDistance:
             return One(l.distance.ValueAt(t));
         default:
             return std::nullopt;

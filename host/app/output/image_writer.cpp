@@ -43,10 +43,10 @@ Pixels Interleave(const PF_World& world, bool premultiply, OIIO::TypeDesc type, 
         const P* row = world.Row<P>(y);
         for (int32_t x = 0; x < world.width; ++x, o += 4) {
             float a = static_cast<float>(row[x].alpha) * kScale;
-            float colour = premultiply ? a * kScale : kScale;
-            o[0] = encode(static_cast<float>(row[x].red) * colour);
-            o[1] = encode(static_cast<float>(row[x].green) * colour);
-            o[2] = encode(static_cast<float>(row[x].blue) * colour);
+            float color = premultiply ? a * kScale : kScale;
+            o[0] = encode(static_cast<float>(row[x].red) * color);
+            o[1] = encode(static_cast<float>(row[x].green) * color);
+            o[2] = encode(static_cast<float>(row[x].blue) * color);
             o[3] = encode(a);
         }
     }

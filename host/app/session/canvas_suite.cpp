@@ -16,7 +16,7 @@ bool Owns(FrameSession& session, QNGP_LayerContextH context) {
 
 int32_t GetCompToRender(QNGP_RenderContextH context, QNGP_CompH* comp) {
     return Serve(context, [&](FrameSession& session) {
-        if (!comp) return kErrBadArgument;
+        if (!comp) return kQNGP_ErrBadArgument;
         *comp = session.CompHandle();
         return 0;
     });
@@ -24,7 +24,7 @@ int32_t GetCompToRender(QNGP_RenderContextH context, QNGP_CompH* comp) {
 
 int32_t GetRenderTime(QNGP_RenderContextH context, T_Time* time, T_Time* timeStep) {
     return Serve(context, [&](FrameSession& session) {
-        if (!time || !timeStep) return kErrBadArgument;
+        if (!time || !timeStep) return kQNGP_ErrBadArgument;
         *time = session.RenderTime();
         *timeStep = session.TimeStep();
         return 0;
@@ -33,8 +33,8 @@ int32_t GetRenderTime(QNGP_RenderContextH context, T_Time* time, T_Time* timeSte
 
 int32_t GetCompDestination(QNGP_RenderContextH context, QNGP_CompH comp, PF_World** world) {
     return Serve(context, [&](FrameSession& session) {
-        if (!world) return kErrBadArgument;
-        if (comp != session.CompHandle()) return kErrBadHandle;
+        if (!world) return kQNGP_ErrBadArgument;
+        if (comp != session.CompHandle()) return kQNGP_ErrBadHandle;
         *world = &session.Destination();
         return 0;
     });
@@ -42,7 +42,7 @@ int32_t GetCompDestination(QNGP_RenderContextH context, QNGP_CompH comp, PF_Worl
 
 int32_t GetDownsample(QNGP_RenderContextH context, int16_t* dx, int16_t* dy) {
     return Serve(context, [&](FrameSession& session) {
-        if (!dx || !dy) return kErrBadArgument;
+        if (!dx || !dy) return kQNGP_ErrBadArgument;
         *dx = session.DownsampleX();
         *dy = session.DownsampleY();
         return 0;
@@ -51,7 +51,7 @@ int32_t GetDownsample(QNGP_RenderContextH context, int16_t* dx, int16_t* dy) {
 
 int32_t GetRegionOfInterest(QNGP_RenderContextH context, QNGP_ShortRect* region) {
     return Serve(context, [&](FrameSession& session) {
-        if (!region) return kErrBadArgument;
+        if (!region) return kQNGP_ErrBadArgument;
         *region = session.Region();
         return 0;
     });
@@ -59,7 +59,7 @@ int32_t GetRegionOfInterest(QNGP_RenderContextH context, QNGP_ShortRect* region)
 
 int32_t GetFieldRender(QNGP_RenderContextH context, int32_t* fieldMode) {
     return Serve(context, [&](FrameSession& session) {
-        if (!fieldMode) return kErrBadArgument;
+        if (!fieldMode) return kQNGP_ErrBadArgument;
         *fieldMode = session.FieldMode();
         return 0;
     });
@@ -67,7 +67,7 @@ int32_t GetFieldRender(QNGP_RenderContextH context, int32_t* fieldMode) {
 
 int32_t GetNumLayersToRender(QNGP_RenderContextH context, int32_t* count) {
     return Serve(context, [&](FrameSession& session) {
-        if (!count) return kErrBadArgument;
+        if (!count) return kQNGP_ErrBadArgument;
         *count = session.LayerContextCount();
         return 0;
     });
@@ -76,8 +76,8 @@ int32_t GetNumLayersToRender(QNGP_RenderContextH context, int32_t* count) {
 int32_t GetNthLayerContext(QNGP_RenderContextH context, int32_t index,
                            QNGP_LayerContextH* layerContext) {
     return Serve(context, [&](FrameSession& session) {
-        if (!layerContext) return kErrBadArgument;
-        if (index < 0 || index >= session.LayerContextCount()) return kErrBadIndex;
+        if (!layerContext) return kQNGP_ErrBadArgument;
+        if (index < 0 || index >= session.LayerContextCount()) return kQNGP_ErrBadIndex;
         *layerContext = session.LayerContext(index);
         return 0;
     });
@@ -86,8 +86,8 @@ int32_t GetNthLayerContext(QNGP_RenderContextH context, int32_t index,
 int32_t GetLayerFromLayerContext(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                                  QNGP_LayerH* layer) {
     return Serve(context, [&](FrameSession& session) {
-        if (!layer) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!layer) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         *layer = layerContext->layer;
         return 0;
     });
@@ -102,8 +102,8 @@ int32_t GetTopLevelLayer(QNGP_RenderContextH context, QNGP_LayerContextH layerCo
 int32_t GetRenderLayerToWorldXform(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                                    const T_Time* time, M_Matrix4* transform) {
     return Serve(context, [&](FrameSession& session) {
-        if (!time || !transform) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!time || !transform) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         *transform = LayerToWorld(session.Comp(), layerContext->layer->index, T_Seconds(*time));
         return 0;
     });
@@ -112,8 +112,8 @@ int32_t GetRenderLayerToWorldXform(QNGP_RenderContextH context, QNGP_LayerContex
 int32_t GetRenderLayerBounds(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                              const T_Time* time, QNGP_ShortRect* bounds) {
     return Serve(context, [&](FrameSession& session) {
-        if (!time || !bounds) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!time || !bounds) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         M_LRect r = SourceBounds(session.LayerAt(layerContext->layer->index));
         *bounds = {static_cast<int16_t>(r.top), static_cast<int16_t>(r.left),
                    static_cast<int16_t>(r.bottom), static_cast<int16_t>(r.right)};
@@ -124,10 +124,10 @@ int32_t GetRenderLayerBounds(QNGP_RenderContextH context, QNGP_LayerContextH lay
 int32_t GetRenderOpacity(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                          const T_Time* time, double* opacity) {
     return Serve(context, [&](FrameSession& session) {
-        if (!time || !opacity) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!time || !opacity) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         const Layer& layer = session.LayerAt(layerContext->layer->index);
-        *opacity = StreamValue(layer, kStreamOpacity, T_Seconds(*time)) / 100;
+        *opacity = StreamValue(layer, kQNGP_StreamOpacity, T_Seconds(*time)) / 100;
         return 0;
     });
 }
@@ -136,8 +136,8 @@ int32_t GetRenderOpacity(QNGP_RenderContextH context, QNGP_LayerContextH layerCo
 int32_t IsLayerUnbounded(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                          bool* unbounded) {
     return Serve(context, [&](FrameSession& session) {
-        if (!unbounded) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!unbounded) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         *unbounded = session.LayerAt(layerContext->layer->index).source.unbounded;
         return 0;
     });
@@ -181,9 +181,9 @@ PF_World* HandedOutPixels(FrameSession& session, int32_t layerIndex, Placement p
 int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerContextH layerContext,
                     int32_t mode, PF_World** world) {
     return Serve(context, [&](FrameSession& session) {
-        if (!world) return kErrBadArgument;
+        if (!world) return kQNGP_ErrBadArgument;
         *world = nullptr;
-        if (!Owns(session, layerContext) || layer != layerContext->layer) return kErrBadHandle;
+        if (!Owns(session, layerContext) || layer != layerContext->layer) return kQNGP_ErrBadHandle;
         Placement placement =
             session.LayerAt(layer->index).source.unbounded ? Placement::kOutput : Placement::kLayer;
         if (mode == kQNGP_RenderMatte) {
@@ -191,7 +191,7 @@ int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerCo
         } else if (mode == kQNGP_RenderWholeLayer) {
             *world = HandedOutPixels(session, layer->index, placement);
         } else {
-            return kErrBadArgument;
+            return kQNGP_ErrBadArgument;
         }
         return 0;
     });
@@ -204,9 +204,9 @@ int32_t RenderLayer(QNGP_RenderContextH context, QNGP_LayerH layer, QNGP_LayerCo
 int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerContext, int32_t,
                       const double*, const M_LRect*, M_Matrix3* sourceMatrix, PF_World** world) {
     return Serve(context, [&](FrameSession& session) {
-        if (!sourceMatrix || !world) return kErrBadArgument;
+        if (!sourceMatrix || !world) return kQNGP_ErrBadArgument;
         *world = nullptr;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         M_SetIdentityMatrix(sourceMatrix);
         *world = HandedOutPixels(session, layerContext->layer->index, Placement::kLayer);
         return 0;
@@ -216,16 +216,16 @@ int32_t RenderTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerConte
 int32_t DisposeTexture(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                        PF_World* world) {
     return Serve(context, [&](FrameSession& session) {
-        if (!Owns(session, layerContext)) return kErrBadHandle;
-        return session.TakeBack(world) ? 0 : kErrBadHandle;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
+        return session.TakeBack(world) ? 0 : kQNGP_ErrBadHandle;
     });
 }
 
 int32_t GetTrackMatteContext(QNGP_RenderContextH context, QNGP_LayerContextH layerContext,
                              QNGP_LayerContextH* matteContext) {
     return Serve(context, [&](FrameSession& session) {
-        if (!matteContext) return kErrBadArgument;
-        if (!Owns(session, layerContext)) return kErrBadHandle;
+        if (!matteContext) return kQNGP_ErrBadArgument;
+        if (!Owns(session, layerContext)) return kQNGP_ErrBadHandle;
         *matteContext = layerContext->matte;
         return 0;
     });
@@ -234,20 +234,20 @@ int32_t GetTrackMatteContext(QNGP_RenderContextH context, QNGP_LayerContextH lay
 int32_t ReportRenderProgress(QNGP_RenderContextH context, int32_t count, int32_t total) {
     return Serve(context, [&](FrameSession& session) {
         FrameProgress* progress = session.Progress();
-        return !progress || progress->Renderables(count, total) ? 0 : kErrUserCancel;
+        return !progress || progress->Renderables(count, total) ? 0 : kQNGP_ErrUserCancel;
     });
 }
 
 int32_t ReportRowProgress(QNGP_RenderContextH context, int32_t count, int32_t total) {
     return Serve(context, [&](FrameSession& session) {
         FrameProgress* progress = session.Progress();
-        return !progress || progress->Rows(count, total) ? 0 : kErrUserCancel;
+        return !progress || progress->Rows(count, total) ? 0 : kQNGP_ErrUserCancel;
     });
 }
 
 int32_t GetShutterInterval(QNGP_RenderContextH context, T_Time* start, T_Time* duration) {
     return Serve(context, [&](FrameSession& session) {
-        if (!start || !duration) return kErrBadArgument;
+        if (!start || !duration) return kQNGP_ErrBadArgument;
         ShutterInterval shutter = ShutterIntervalAt(session.Comp(), session.RenderTime());
         *start = shutter.start;
         *duration = shutter.duration;

@@ -11,11 +11,9 @@
 namespace ostrel {
 namespace {
 
-constexpr int32_t kNormalMode = 2;
-
 int32_t GetCompNumLayers(QNGP_CompH comp, int32_t* count) {
     return Serve(comp, [&](FrameSession& session) {
-        if (!count) return kErrBadArgument;
+        if (!count) return kQNGP_ErrBadArgument;
         *count = session.LayerCount();
         return 0;
     });
@@ -23,8 +21,8 @@ int32_t GetCompNumLayers(QNGP_CompH comp, int32_t* count) {
 
 int32_t GetCompLayerByIndex(QNGP_CompH comp, int32_t index, QNGP_LayerH* layer) {
     return Serve(comp, [&](FrameSession& session) {
-        if (!layer) return kErrBadArgument;
-        if (index < 0 || index >= session.LayerCount()) return kErrBadIndex;
+        if (!layer) return kQNGP_ErrBadArgument;
+        if (index < 0 || index >= session.LayerCount()) return kQNGP_ErrBadIndex;
         *layer = session.LayerHandle(index);
         return 0;
     });
@@ -32,7 +30,7 @@ int32_t GetCompLayerByIndex(QNGP_CompH comp, int32_t index, QNGP_LayerH* layer) 
 
 int32_t GetLayerIndex(QNGP_LayerH layer, int32_t* index) {
     return Serve(layer, [&](FrameSession&) {
-        if (!index) return kErrBadArgument;
+        if (!index) return kQNGP_ErrBadArgument;
         *index = layer->index;
         return 0;
     });
@@ -40,7 +38,7 @@ int32_t GetLayerIndex(QNGP_LayerH layer, int32_t* index) {
 
 int32_t GetLayerFlags(QNGP_LayerH layer, int32_t* flags) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!flags) return kErrBadArgument;
+        if (!flags) return kQNGP_ErrBadArgument;
         *flags = LayerFlags(session.LayerAt(layer->index));
         return 0;
     });
@@ -48,7 +46,7 @@ int32_t GetLayerFlags(QNGP_LayerH layer, int32_t* flags) {
 
 int32_t GetLayerObjectType(QNGP_LayerH layer, int32_t* type) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!type) return kErrBadArgument;
+        if (!type) return kQNGP_ErrBadArgument;
         *type = ObjectType(session.LayerAt(layer->index));
         return 0;
     });
@@ -56,7 +54,7 @@ int32_t GetLayerObjectType(QNGP_LayerH layer, int32_t* type) {
 
 int32_t IsLayerActive(QNGP_LayerH layer, const T_Time* time, bool* active) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!time || !active) return kErrBadArgument;
+        if (!time || !active) return kQNGP_ErrBadArgument;
         *active = session.LayerAt(layer->index).IsActiveAt(T_Seconds(*time));
         return 0;
     });
@@ -64,7 +62,7 @@ int32_t IsLayerActive(QNGP_LayerH layer, const T_Time* time, bool* active) {
 
 int32_t GetLayerQuality(QNGP_LayerH layer, int16_t* quality) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!quality) return kErrBadArgument;
+        if (!quality) return kQNGP_ErrBadArgument;
         *quality = static_cast<int16_t>(session.LayerAt(layer->index).quality);
         return 0;
     });
@@ -72,14 +70,14 @@ int32_t GetLayerQuality(QNGP_LayerH layer, int16_t* quality) {
 
 int32_t GetLayerTransferMode(QNGP_LayerH layer, QNGP_LayerTransferMode* mode) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!mode) return kErrBadArgument;
+        if (!mode) return kQNGP_ErrBadArgument;
         const Layer& l = session.LayerAt(layer->index);
-        int32_t number = l.HasPixels() ? PF_XferModeFromName(l.transferMode) : kNormalMode;
+        int32_t number = l.HasPixels() ? PF_XferModeFromName(l.transferMode) : kPF_XferNormal;
         if (number < 0) {
             session.NoteFailure(
                 session.Comp().file.string() + ": layers[" + std::to_string(layer->index) +
                 "].transferMode: no transfer mode is named \"" + l.transferMode + "\"");
-            return kErrHostFailure;
+            return kQNGP_ErrHostFailure;
         }
         *mode = {number, TransferFlags(l), static_cast<int32_t>(l.trackMatte)};
         return 0;
@@ -88,7 +86,7 @@ int32_t GetLayerTransferMode(QNGP_LayerH layer, QNGP_LayerTransferMode* mode) {
 
 int32_t LayerHasTrackMatte(QNGP_LayerH layer, bool* hasMatte) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!hasMatte) return kErrBadArgument;
+        if (!hasMatte) return kQNGP_ErrBadArgument;
         *hasMatte = session.LayerAt(layer->index).trackMatte != TrackMatte::kNone;
         return 0;
     });
@@ -96,7 +94,7 @@ int32_t LayerHasTrackMatte(QNGP_LayerH layer, bool* hasMatte) {
 
 int32_t GetLayerToWorldXform(QNGP_LayerH layer, const T_Time* time, M_Matrix4* transform) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!time || !transform) return kErrBadArgument;
+        if (!time || !transform) return kQNGP_ErrBadArgument;
         *transform = LayerToWorld(session.Comp(), layer->index, T_Seconds(*time));
         return 0;
     });
@@ -106,10 +104,11 @@ int32_t GetLayerToWorldXform(QNGP_LayerH layer, const T_Time* time, M_Matrix4* t
 // flag; their sampling is the one the composition chose for best quality.
 int32_t GetEngineLayer(QNGP_LayerH layer, QNGP_EngineLayer* engine) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!engine) return kErrBadArgument;
+        if (!engine) return kQNGP_ErrBadArgument;
         const Layer& l = session.LayerAt(layer->index);
-        constexpr uint8_t kBilinear = 1, kBicubic = 2;
-        *engine = {l.HasPixels(), false, l.sampling == Sampling::kBicubic ? kBicubic : kBilinear};
+        *engine = {
+            l.HasPixels(), false,
+            l.sampling == Sampling::kBicubic ? kQNGP_SamplingBicubic : kQNGP_SamplingBilinear};
         return 0;
     });
 }
@@ -117,9 +116,9 @@ int32_t GetEngineLayer(QNGP_LayerH layer, QNGP_EngineLayer* engine) {
 int32_t GetLayerStreamValue(QNGP_LayerH layer, int32_t stream, int32_t timeMode, const T_Time* time,
                             int32_t, QNGP_StreamValue* value) {
     return Serve(layer, [&](FrameSession& session) {
-        if (!time || !value || timeMode != kQNGP_TimeModeLayer) return kErrBadArgument;
+        if (!time || !value || timeMode != kQNGP_TimeModeLayer) return kQNGP_ErrBadArgument;
         const Layer& l = session.LayerAt(layer->index);
-        if (!HasStream(l, stream)) return kErrNoSuchStream;
+        if (!HasStream(l, stream)) return kQNGP_ErrNoSuchStream;
         // Layers start at comp time 0 and are not time-remapped: layer time is comp time.
         StreamVector values = StreamValues(l, stream, T_Seconds(*time));
         *value = {};

@@ -6,8 +6,9 @@
 #include <new>
 #include <stdexcept>
 
+#include "qngp_suites.h"
 #include "session/frame_session.h"
-#include "suites/suite_errors.h"
+#include "u_memory.h"
 
 namespace ostrel {
 
@@ -29,14 +30,14 @@ inline FrameSession* SessionOf(QNGP_LayerH layer) {
 template <class Handle, class Body>
 int32_t Serve(Handle handle, Body&& body) noexcept {
     FrameSession* session = SessionOf(handle);
-    if (!session) return kErrBadHandle;
+    if (!session) return kQNGP_ErrBadHandle;
     try {
         return body(*session);
     } catch (const std::bad_alloc&) {
-        return kErrOutOfMemory;
+        return kU_ErrOutOfMemory;
     } catch (const std::exception& error) {
         session->NoteFailure(error.what());
-        return kErrHostFailure;
+        return kQNGP_ErrHostFailure;
     }
 }
 

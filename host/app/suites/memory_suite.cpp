@@ -17,14 +17,14 @@ std::atomic<int64_t> gLive{0};
 std::atomic<int64_t> gLocked{0};
 
 int32_t NewHandle(int32_t, const char* name, uint32_t size, int32_t, QNGP_MemHandle* handle) {
-    if (!handle) return kErrBadHandle;
+    if (!handle) return kQNGP_ErrBadHandle;
     *handle = new QNGP_Memory{name ? name : "", std::vector<uint8_t>(size), 0};
     ++gLive;
     return 0;
 }
 
 int32_t FreeHandle(QNGP_MemHandle handle) {
-    if (!handle) return kErrBadHandle;
+    if (!handle) return kQNGP_ErrBadHandle;
     if (handle->locks) gLocked -= 1;
     delete handle;
     --gLive;
@@ -32,20 +32,20 @@ int32_t FreeHandle(QNGP_MemHandle handle) {
 }
 
 int32_t LockHandle(QNGP_MemHandle handle, void** pointer) {
-    if (!handle || !pointer) return kErrBadHandle;
+    if (!handle || !pointer) return kQNGP_ErrBadHandle;
     if (handle->locks++ == 0) ++gLocked;
     *pointer = handle->bytes.data();
     return 0;
 }
 
 int32_t UnlockHandle(QNGP_MemHandle handle) {
-    if (!handle || handle->locks == 0) return kErrBadHandle;
+    if (!handle || handle->locks == 0) return kQNGP_ErrBadHandle;
     if (--handle->locks == 0) --gLocked;
     return 0;
 }
 
 int32_t GetHandleSize(QNGP_MemHandle handle, uint32_t* size) {
-    if (!handle || !size) return kErrBadHandle;
+    if (!handle || !size) return kQNGP_ErrBadHandle;
     *size = static_cast<uint32_t>(handle->bytes.size());
     return 0;
 }

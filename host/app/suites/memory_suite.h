@@ -4,7 +4,6 @@
 #include <cstdint>
 
 #include "qngp_suites.h"
-#include "suites/suite_errors.h"
 
 namespace ostrel {
 

@@ -207,7 +207,7 @@ P FromLinear(const PF_Pixel16& p, const PF_LinearBlendingTables& t) {
     }
 }
 
-PF_PixelFloat RaiseColour(PF_PixelFloat p, float exponent) {
+PF_PixelFloat RaiseColor(PF_PixelFloat p, float exponent) {
     auto raise = [&](float c) { return c >= 0.0f ? std::pow(c, exponent) : c; };
     return {p.alpha, raise(p.red), raise(p.green), raise(p.blue)};
 }
@@ -218,9 +218,9 @@ template <class P, int kMode>
 [[gnu::noinline]] void ApplyLinear(const P& src, const PF_LinearBlendingTables& tables,
                                    PF_XferOpacity<P> opacity, P* dst) {
     if constexpr (PF_PixelTraits<P>::kIsFloat) {
-        PF_PixelFloat d = RaiseColour(*dst, tables.toLinearExponent);
-        BlendDirect<P, kMode>(RaiseColour(src, tables.toLinearExponent), opacity, d);
-        *dst = RaiseColour(d, tables.fromLinearExponent);
+        PF_PixelFloat d = RaiseColor(*dst, tables.toLinearExponent);
+        BlendDirect<P, kMode>(RaiseColor(src, tables.toLinearExponent), opacity, d);
+        *dst = RaiseColor(d, tables.fromLinearExponent);
     } else {
         PF_Pixel16 d = ToLinear(*dst, tables);
         uint16_t opacity16 = PF_PixelTraits<P>::kBitDepth == 8 ? PF_8To16(opacity) : opacity;

@@ -6,6 +6,7 @@
 #include <tuple>
 
 #include "instance_options.h"
+#include "qngp_suites.h"
 #include "render_context.h"
 #include "render_entry.h"
 #include "renderer/scene/messages.h"
@@ -13,7 +14,6 @@
 #include "scene_assembly.h"
 #include "served_frame.h"
 #include "suites/memory_suite.h"
-#include "suites/suite_errors.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
 #include "world_pixels.h"
@@ -390,7 +390,7 @@ TEST_F(Capture, FramesThroughTheEntryLeaveNothingBehind) {
     };
     const Case kCases[] = {
         {"a frame that renders", kLitCards + "," + kMovingCard, 12, 0},
-        {"a frame that fails in capture", kOdd, 3, kErrHostFailure},
+        {"a frame that fails in capture", kOdd, 3, kQNGP_ErrHostFailure},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.name);

@@ -4,8 +4,8 @@
 #include <optional>
 #include <tuple>
 
+#include "qngp_suites.h"
 #include "served_frame.h"
-#include "suites/suite_errors.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
 #include "world_pixels.h"
@@ -100,7 +100,7 @@ TEST(CanvasSuite, RenderOrderLayerContextsAndTheirValues) {
     ASSERT_EQ(count, 1);
     QNGP_LayerContextH context = nullptr;
     ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &context), 0);
-    EXPECT_EQ(canvas.GetNthLayerContext(render, 1, &context), kErrBadIndex);
+    EXPECT_EQ(canvas.GetNthLayerContext(render, 1, &context), kQNGP_ErrBadIndex);
     ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &context), 0);
     QNGP_LayerH layer = nullptr, topLevel = nullptr;
     ASSERT_EQ(canvas.GetLayerFromLayerContext(render, context, &layer), 0);
@@ -168,7 +168,7 @@ TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
         std::unique_ptr<PF_World> owned(world);
         EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(51, 17));
         EXPECT_EQ(world->bitDepth, 8);
-        EXPECT_EQ(canvas.RenderLayer(render, matteLayer, matte, 7, &world), kErrBadArgument);
+        EXPECT_EQ(canvas.RenderLayer(render, matteLayer, matte, 7, &world), kQNGP_ErrBadArgument);
 
         M_Matrix3 source{};
         ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
@@ -178,7 +178,7 @@ TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
                 EXPECT_EQ(source.mat[r][c], r == c ? 1.0 : 0.0);
         }
         EXPECT_EQ(canvas.DisposeTexture(render, card, world), 0);
-        EXPECT_EQ(canvas.DisposeTexture(render, card, owned.get()), kErrBadHandle);
+        EXPECT_EQ(canvas.DisposeTexture(render, card, owned.get()), kQNGP_ErrBadHandle);
 
         QNGP_LayerH cardLayer = frame.Layer(4);
         ASSERT_EQ(canvas.RenderLayer(render, cardLayer, card, kQNGP_RenderWholeLayer, &world), 0);
@@ -250,7 +250,7 @@ TEST(CanvasSuite, OnlyUnboundedSolidsSayTheyAreUnbounded) {
         EXPECT_EQ(bounds.bottom, c.bottom);
     }
     bool unbounded = false;
-    EXPECT_EQ(canvas.IsLayerUnbounded(render, nullptr, &unbounded), kErrBadHandle);
+    EXPECT_EQ(canvas.IsLayerUnbounded(render, nullptr, &unbounded), kQNGP_ErrBadHandle);
 }
 
 TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
@@ -331,7 +331,7 @@ TEST(CanvasSuite, RegionDownsampleAndFieldsShapeTheFrame) {
     QNGP_RenderContextH render = frame.Render();
 
     PF_World* destination = nullptr;
-    EXPECT_EQ(canvas.GetCompDestination(render, nullptr, &destination), kErrBadHandle);
+    EXPECT_EQ(canvas.GetCompDestination(render, nullptr, &destination), kQNGP_ErrBadHandle);
     ASSERT_EQ(canvas.GetCompDestination(render, frame.Comp(), &destination), 0);
     EXPECT_EQ(std::tuple(destination->width, destination->height),
               std::tuple(151, 100));  // ceil(301 / 2)
@@ -368,7 +368,7 @@ TEST(CanvasSuite, ProgressAnswersTheUsersCancel) {
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 1, 3), 0);
     frame.Session().SetProgress(&progress);
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 1, 3), 0);
-    EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 2, 3), kErrUserCancel);
+    EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 2, 3), kQNGP_ErrUserCancel);
     EXPECT_EQ(canvas.ReportRowProgress(frame.Render(), 2, 3), 0);
 }
 
@@ -397,14 +397,14 @@ TEST(CompSuites, CompItemCameraAndLight) {
     int32_t type = -1;
     ASSERT_EQ(CameraSuite()->GetCameraType(camera, &type), 0);
     EXPECT_EQ(type, kQNGP_CameraOrthographic);
-    EXPECT_EQ(CameraSuite()->GetCameraType(frame.Layer(1), &type), kErrWrongLayerKind);
+    EXPECT_EQ(CameraSuite()->GetCameraType(frame.Layer(1), &type), kQNGP_ErrWrongLayerKind);
     double distance = 0;
     ASSERT_EQ(CameraSuite()->GetDefaultCameraDistanceToImagePlane(frame.Comp(), &distance), 0);
     EXPECT_DOUBLE_EQ(distance, 960 * 50.0 / 36);
 
     ASSERT_EQ(LightSuite()->GetLightType(frame.Layer(1), &type), 0);
     EXPECT_EQ(type, 1);  // spot
-    EXPECT_EQ(LightSuite()->GetLightType(frame.Layer(0), &type), kErrWrongLayerKind);
+    EXPECT_EQ(LightSuite()->GetLightType(frame.Layer(0), &type), kQNGP_ErrWrongLayerKind);
 
     PF_LinearBlendingTables unused;
     const PF_LinearBlendingTables* colorSettings = &unused;
@@ -427,7 +427,7 @@ TEST(LayerSuite, EveryLayerOfTheComp) {
     ASSERT_EQ(layers.GetCompNumLayers(frame.Comp(), &count), 0);
     ASSERT_EQ(count, 7);
     QNGP_LayerH layer = nullptr;
-    EXPECT_EQ(layers.GetCompLayerByIndex(frame.Comp(), 7, &layer), kErrBadIndex);
+    EXPECT_EQ(layers.GetCompLayerByIndex(frame.Comp(), 7, &layer), kQNGP_ErrBadIndex);
 
     struct Case {
         int32_t index;
@@ -483,7 +483,7 @@ TEST(LayerSuite, EveryLayerOfTheComp) {
     EXPECT_DOUBLE_EQ(camera.mat[3][0], 480);
     EXPECT_DOUBLE_EQ(camera.mat[3][1], 270);
     EXPECT_DOUBLE_EQ(camera.mat[3][2], -1000);
-    EXPECT_EQ(layers.GetLayerFlags(nullptr, &count), kErrBadHandle);
+    EXPECT_EQ(layers.GetLayerFlags(nullptr, &count), kQNGP_ErrBadHandle);
 }
 
 TEST(LayerSuite, UnknownTransferModeFailsWithAPlacedMessage) {
@@ -491,7 +491,7 @@ TEST(LayerSuite, UnknownTransferModeFailsWithAPlacedMessage) {
         CompJson("", R"({"name": "a", "kind": "solid", "threeD": true, "transferMode": "sparkle",
                 "source": {"color": "#ffffff"}})"));
     QNGP_LayerTransferMode mode{};
-    EXPECT_EQ(LayerSuite()->GetLayerTransferMode(frame.Layer(0), &mode), kErrHostFailure);
+    EXPECT_EQ(LayerSuite()->GetLayerTransferMode(frame.Layer(0), &mode), kQNGP_ErrHostFailure);
     EXPECT_EQ(frame.Session().Failure(),
               "test.json: layers[0].transferMode: no transfer mode is named \"sparkle\"");
 }
@@ -525,9 +525,9 @@ TEST(StreamSuite, ValuesByStreamNumber) {
     QNGP_StreamValue value{};
     EXPECT_EQ(StreamSuite()->GetLayerStreamValue(frame.Layer(0), 24, kQNGP_TimeModeLayer, &now, 0,
                                                  &value),
-              kErrNoSuchStream);
+              kQNGP_ErrNoSuchStream);
     EXPECT_EQ(StreamSuite()->GetLayerStreamValue(frame.Layer(4), 1, 0, &now, 0, &value),
-              kErrBadArgument);
+              kQNGP_ErrBadArgument);
 }
 
 }  // namespace

@@ -29,7 +29,7 @@ protected:
     ImageCache cache_;
 };
 
-TEST_F(ImageCacheTest, EightBitFileAtEveryDepthKeepsStraightColour) {
+TEST_F(ImageCacheTest, EightBitFileAtEveryDepthKeepsStraightColor) {
     // A half-transparent orange pixel keeps its colour exactly: the file stores it straight.
     auto file = folder_.WriteImage<uint8_t>("straight.png", 2, 1, 4,
                                             {200, 100, 0, 128, 255, 255, 255, 255});
@@ -74,7 +74,7 @@ TEST_F(ImageCacheTest, PremultipliedFloatFileBecomesStraight) {
         EXPECT_NEAR(actual[i], expected[i], 1e-3);  // EXR keeps half floats by default
 }
 
-TEST_F(ImageCacheTest, GreyFileFillsAllThreeColours) {
+TEST_F(ImageCacheTest, GreyFileFillsAllThreeColors) {
     auto file = folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77});
     auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1);
     EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{255, 77, 77, 77}));

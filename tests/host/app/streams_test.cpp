@@ -32,19 +32,25 @@ TEST(Streams, LayerValuesComeAsTheHostShowsThem) {
         double expected;
     };
     const Case cases[] = {
-        {kStreamOpacity, 50},           {kStreamCastsShadows, 2}, {kStreamAcceptsShadows, 0},
-        {kStreamAcceptsLights, 0},      {kStreamAmbient, 10},     {kStreamDiffuse, 20},
-        {kStreamSpecularIntensity, 30}, {kStreamShininess, 40},   {kStreamMetal, 50},
-        {kStreamLightTransmission, 60},
+        {kQNGP_StreamOpacity, 50},
+        {kQNGP_StreamCastsShadows, 2},
+        {kQNGP_StreamAcceptsShadows, 0},
+        {kQNGP_StreamAcceptsLights, 0},
+        {kQNGP_StreamAmbient, 10},
+        {kQNGP_StreamDiffuse, 20},
+        {kQNGP_StreamSpecularIntensity, 30},
+        {kQNGP_StreamShininess, 40},
+        {kQNGP_StreamMetal, 50},
+        {kQNGP_StreamLightTransmission, 60},
     };
     for (const Case& c : cases)
         EXPECT_DOUBLE_EQ(StreamValue(layer, c.stream, 1.0), c.expected) << c.stream;
-    StreamVector scale = StreamValues(layer, kStreamScale, 0.0);
+    StreamVector scale = StreamValues(layer, kQNGP_StreamScale, 0.0);
     EXPECT_EQ(scale.count, 3);
     EXPECT_DOUBLE_EQ(scale.values[0], 50);
     EXPECT_DOUBLE_EQ(scale.values[1], 25);
-    EXPECT_EQ(LayerFlags(layer), kLayerFlagMotionBlur);
-    EXPECT_EQ(CompFlags(comp), kCompFlagMotionBlur | kCompFlagNoLightsNoDepthOfField);
+    EXPECT_EQ(LayerFlags(layer), kQNGP_LayerFlagMotionBlur);
+    EXPECT_EQ(CompFlags(comp), kQNGP_CompFlagMotionBlur | kQNGP_CompFlagNoLightsOrDepthOfField);
 }
 
 TEST(Streams, CameraValues) {
@@ -59,24 +65,24 @@ TEST(Streams, CameraValues) {
         double expected;
     };
     const Case cases[] = {
-        {kStreamZoom, 800},
-        {kStreamDepthOfField, 1},
-        {kStreamFocusDistance, 800},
-        {kStreamAperture, 40},
-        {kStreamBlurLevel, 150},
-        {kStreamIrisShape, 6},
-        {kStreamIrisRotation, 15},
-        {kStreamIrisRoundness, 20},
-        {kStreamIrisAspect, 1.5},
-        {kStreamDiffractionFringe, 30},
-        {kStreamHighlightGain, 40},
-        {kStreamHighlightThreshold, 200},
-        {kStreamHighlightSaturation, 50},
+        {kQNGP_StreamZoom, 800},
+        {kQNGP_StreamDepthOfField, 1},
+        {kQNGP_StreamFocusDistance, 800},
+        {kQNGP_StreamAperture, 40},
+        {kQNGP_StreamBlurLevel, 150},
+        {kQNGP_StreamIrisShape, 6},
+        {kQNGP_StreamIrisRotation, 15},
+        {kQNGP_StreamIrisRoundness, 20},
+        {kQNGP_StreamIrisAspect, 1.5},
+        {kQNGP_StreamDiffractionFringe, 30},
+        {kQNGP_StreamHighlightGain, 40},
+        {kQNGP_StreamHighlightThreshold, 200},
+        {kQNGP_StreamHighlightSaturation, 50},
     };
     for (const Case& c : cases)
         EXPECT_DOUBLE_EQ(StreamValue(camera, c.stream, 0.0), c.expected) << c.stream;
-    EXPECT_EQ(CameraType(camera), kCameraTypeOrthographic);
-    EXPECT_EQ(ObjectType(camera), kObjectTypeCamera);
+    EXPECT_EQ(CameraType(camera), kQNGP_CameraOrthographic);
+    EXPECT_EQ(ObjectType(camera), kQNGP_ObjectTypeCamera);
 }
 
 TEST(Streams, LightValues) {
@@ -85,7 +91,7 @@ TEST(Streams, LightValues) {
         "radius": 100, "distance": 300, "castsShadows": true, "shadowDarkness": 70,
         "shadowDiffusion": 12, "lightsOnlyLayersBelow": true}})");
     const Layer& light = comp.layers[0];
-    StreamVector color = StreamValues(light, kStreamColor, 0.0);
+    StreamVector color = StreamValues(light, kQNGP_StreamColor, 0.0);
     ASSERT_EQ(color.count, 4);
     const double kOrange[] = {1, 1, 128.0 / 255.0, 0};  // alpha, red, green, blue
     for (int i = 0; i < 4; ++i)
@@ -95,30 +101,32 @@ TEST(Streams, LightValues) {
         double expected;
     };
     const Case cases[] = {
-        {kStreamIntensity, 150},  {kStreamConeAngle, 60},      {kStreamConeFeather, 25},
-        {kStreamFalloff, 3},      {kStreamFalloffRadius, 100}, {kStreamFalloffDistance, 300},
-        {kStreamCastsShadows, 1}, {kStreamShadowDarkness, 70}, {kStreamShadowDiffusion, 12},
+        {kQNGP_StreamIntensity, 150},      {kQNGP_StreamConeAngle, 60},
+        {kQNGP_StreamConeFeather, 25},     {kQNGP_StreamFalloff, 3},
+        {kQNGP_StreamFalloffRadius, 100},  {kQNGP_StreamFalloffDistance, 300},
+        {kQNGP_StreamCastsShadows, 1},     {kQNGP_StreamShadowDarkness, 70},
+        {kQNGP_StreamShadowDiffusion, 12},
     };
     for (const Case& c : cases)
         EXPECT_DOUBLE_EQ(StreamValue(light, c.stream, 0.0), c.expected) << c.stream;
-    EXPECT_EQ(LayerFlags(light), kLayerFlagLightsOnlyLayersBelow);
-    EXPECT_EQ(ObjectType(light), kObjectTypeLight);
+    EXPECT_EQ(LayerFlags(light), kQNGP_LayerFlagAdjustment);
+    EXPECT_EQ(ObjectType(light), kQNGP_ObjectTypeLight);
     // A spot light aims at the comp centre unless told otherwise.
-    StreamVector target = StreamValues(light, kStreamPointOfInterest, 0.0);
+    StreamVector target = StreamValues(light, kQNGP_StreamPointOfInterest, 0.0);
     EXPECT_DOUBLE_EQ(target.values[0], 180);
     EXPECT_DOUBLE_EQ(target.values[1], 120);
 }
 
 TEST(Streams, StreamsALayerLacksAreRefused) {
     Composition comp = Parse(R"({"kind": "camera"}, {"kind": "null"}, {"kind": "light"})");
-    EXPECT_FALSE(HasStream(comp.layers[0], kStreamAmbient));
-    EXPECT_FALSE(HasStream(comp.layers[0], kStreamScale));
-    EXPECT_TRUE(HasStream(comp.layers[0], kStreamZoom));
-    EXPECT_TRUE(HasStream(comp.layers[1], kStreamOpacity));
-    EXPECT_FALSE(HasStream(comp.layers[1], kStreamCastsShadows));
+    EXPECT_FALSE(HasStream(comp.layers[0], kQNGP_StreamAmbient));
+    EXPECT_FALSE(HasStream(comp.layers[0], kQNGP_StreamScale));
+    EXPECT_TRUE(HasStream(comp.layers[0], kQNGP_StreamZoom));
+    EXPECT_TRUE(HasStream(comp.layers[1], kQNGP_StreamOpacity));
+    EXPECT_FALSE(HasStream(comp.layers[1], kQNGP_StreamCastsShadows));
     // A point light has no point of interest to aim at.
-    EXPECT_FALSE(HasStream(comp.layers[2], kStreamPointOfInterest));
-    EXPECT_THROW(StreamValue(comp.layers[0], kStreamMetal, 0.0), std::out_of_range);
+    EXPECT_FALSE(HasStream(comp.layers[2], kQNGP_StreamPointOfInterest));
+    EXPECT_THROW(StreamValue(comp.layers[0], kQNGP_StreamMetal, 0.0), std::out_of_range);
     EXPECT_THROW(StreamValue(comp.layers[1], 99, 0.0), std::out_of_range);
 }
 

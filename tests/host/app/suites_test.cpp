@@ -19,7 +19,7 @@ TEST(MemorySuite, HandlesLockAndFree) {
     EXPECT_EQ(ostrel::LockedMemoryHandles(), 1);
     static_cast<int32_t*>(bytes)[3] = 7;
     EXPECT_EQ(memory->UnlockHandle(handle), 0);
-    EXPECT_EQ(memory->UnlockHandle(handle), ostrel::kErrBadHandle);
+    EXPECT_EQ(memory->UnlockHandle(handle), kQNGP_ErrBadHandle);
     uint32_t size = 0;
     EXPECT_EQ(memory->GetHandleSize(handle, &size), 0);
     EXPECT_EQ(size, 16u);

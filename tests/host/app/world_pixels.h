@@ -30,11 +30,11 @@ inline Channels ChannelsAt(const PF_World& world, int32_t x, int32_t y) {
 }
 
 // How many pixels of the world are not exactly the colour.
-inline int64_t PixelsOtherThan(const PF_World& world, const Channels& colour) {
+inline int64_t PixelsOtherThan(const PF_World& world, const Channels& color) {
     int64_t count = 0;
     for (int32_t y = 0; y < world.height; ++y) {
         for (int32_t x = 0; x < world.width; ++x)
-            count += ChannelsAt(world, x, y) != colour;
+            count += ChannelsAt(world, x, y) != color;
     }
     return count;
 }

@@ -74,7 +74,7 @@ TYPED_TEST(DrawLine, OutsideTheWorldIsSkipped) {
 }
 
 // A translucent colour blends over what is there.
-TEST(DrawLineBlend, TranslucentColourBlendsNormally) {
+TEST(DrawLineBlend, TranslucentColorBlendsNormally) {
     PF_WorldX<PF_Pixel8> world(4, 3);
     for (int32_t x = 0; x < 4; ++x)
         world.At(x, 1) = {255, 0, 0, 255};

@@ -152,7 +152,7 @@ TYPED_TEST(Samplers, BilinearInterpolatesPremultipliedTexels) {
     using P = TypeParam;
     struct Case {
         float a0, c0, a1, c1;
-        double t, alpha, colour;
+        double t, alpha, color;
     };
     const Case cases[] = {
         {1, 0.8f, 0.2f, 0, 0.5, 0.6, 0.4 / 0.6},      // colour leans to the opaque texel
@@ -173,17 +173,17 @@ TYPED_TEST(Samplers, BilinearInterpolatesPremultipliedTexels) {
         const P& p0 = world.At(1, 0);
         const P& p1 = world.At(2, 0);
         double alpha = (1 - c.t) * Unit<P>(p0.alpha) + c.t * Unit<P>(p1.alpha);
-        double colour = ((1 - c.t) * Unit<P>(p0.alpha) * Unit<P>(p0.red) +
-                         c.t * Unit<P>(p1.alpha) * Unit<P>(p1.red)) /
-                        alpha;
+        double color = ((1 - c.t) * Unit<P>(p0.alpha) * Unit<P>(p0.red) +
+                        c.t * Unit<P>(p1.alpha) * Unit<P>(p1.red)) /
+                       alpha;
         EXPECT_NEAR(alpha, c.alpha, Step<P>());
-        EXPECT_NEAR(colour, c.colour, 2 * Step<P>());
+        EXPECT_NEAR(color, c.color, 2 * Step<P>());
         // On a row, and halfway between two equal rows.
         for (double y : {1.0, 2.5}) {
             P got = Sample<P>(Filter::kBilinear, world, 1 + c.t, y);
             std::string what = "t " + std::to_string(c.t) + " y " + std::to_string(y);
             EXPECT_NEAR(Unit<P>(got.alpha), alpha, tolerance) << what;
-            EXPECT_NEAR(Unit<P>(got.red), colour, tolerance) << what;
+            EXPECT_NEAR(Unit<P>(got.red), color, tolerance) << what;
             EXPECT_EQ(Unit<P>(got.green), 0.0) << what;
             EXPECT_NEAR(Unit<P>(got.blue), 1.0, tolerance) << what;
         }

@@ -29,25 +29,27 @@ namespace {
 
 void CaptureDepthOfField(ORM_SuiteTable& suites, QNGP_LayerH camera, const ORM_CameraView& view,
                          double zoom, const T_Time& time, SY_CameraDOFDesc* dof) {
-    auto number = [&](ORM_Stream stream) { return ORM_StreamNumber(suites, camera, stream, time); };
-    auto fraction = [&](ORM_Stream stream) {
+    auto number = [&](QNGP_Stream stream) {
+        return ORM_StreamNumber(suites, camera, stream, time);
+    };
+    auto fraction = [&](QNGP_Stream stream) {
         return ORM_StreamFraction(suites, camera, stream, time);
     };
     dof->zoom = zoom;
-    dof->focusDistance = number(ORM_Stream::kFocusDistance);
-    dof->aperture = number(ORM_Stream::kAperture);
-    dof->blurLevel = fraction(ORM_Stream::kBlurLevel);
+    dof->focusDistance = number(kQNGP_StreamFocusDistance);
+    dof->aperture = number(kQNGP_StreamAperture);
+    dof->blurLevel = fraction(kQNGP_StreamBlurLevel);
     dof->downsampleX = view.downsampleX;
     dof->downsampleY = view.downsampleY;
     dof->pixelAspect = view.pixelAspect;
-    dof->irisShape = number(ORM_Stream::kIrisShape);
-    dof->irisRotation = number(ORM_Stream::kIrisRotation);
-    dof->irisRoundness = fraction(ORM_Stream::kIrisRoundness);
-    dof->irisAspect = number(ORM_Stream::kIrisAspect);
-    dof->diffractionFringe = fraction(ORM_Stream::kDiffractionFringe);
-    dof->highlightGain = fraction(ORM_Stream::kHighlightGain);
-    dof->highlightThreshold = number(ORM_Stream::kHighlightThreshold);
-    dof->highlightSaturation = fraction(ORM_Stream::kHighlightSaturation);
+    dof->irisShape = number(kQNGP_StreamIrisShape);
+    dof->irisRotation = number(kQNGP_StreamIrisRotation);
+    dof->irisRoundness = fraction(kQNGP_StreamIrisRoundness);
+    dof->irisAspect = number(kQNGP_StreamIrisAspect);
+    dof->diffractionFringe = fraction(kQNGP_StreamDiffractionFringe);
+    dof->highlightGain = fraction(kQNGP_StreamHighlightGain);
+    dof->highlightThreshold = number(kQNGP_StreamHighlightThreshold);
+    dof->highlightSaturation = fraction(kQNGP_StreamHighlightSaturation);
 }
 
 }  // namespace
@@ -90,7 +92,7 @@ void ORM_CaptureCamera(ORM_RenderContext& context, const ORM_CaptureFrame& frame
         ORM_Check(
             suites.Get<QNGP_LayerSuite10>().GetLayerToWorldXform(camera, &time, &cameraToWorld));
         double zoom =
-            view.perspective ? ORM_StreamNumber(suites, camera, ORM_Stream::kZoom, time) : 0;
+            view.perspective ? ORM_StreamNumber(suites, camera, kQNGP_StreamZoom, time) : 0;
         return ORM_CameraPair(view, &cameraToWorld, zoom, placement, projection);
     };
     auto count = static_cast<int32_t>(frame.samples.size());
@@ -104,7 +106,7 @@ void ORM_CaptureCamera(ORM_RenderContext& context, const ORM_CaptureFrame& frame
 
     scene->dof.enabled =
         !(compFlags & kQNGP_CompFlagNoLightsOrDepthOfField) && camera &&
-        ORM_StreamNumber(suites, camera, ORM_Stream::kDepthOfField, frame.renderTime) != 0;
+        ORM_StreamNumber(suites, camera, kQNGP_StreamDepthOfField, frame.renderTime) != 0;
     if (scene->dof.enabled) {
         CaptureDepthOfField(suites, camera, view, zoom, frame.samples.front(), &scene->dof);
     }

@@ -7,8 +7,6 @@
 
 namespace {
 
-constexpr int16_t kQualityWireframe = 0;
-constexpr int16_t kQualityBest = 2;
 constexpr int32_t kAcceptsShadowsOnly = 2;
 
 }  // namespace
@@ -23,8 +21,8 @@ uint8_t ORM_StoredTransferMode(const QNGP_LayerTransferMode& mode, const QNGP_En
 }
 
 void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_LayerDesc* layer) {
-    layer->bestQuality = quality == kQualityBest;
-    if (quality == kQualityWireframe) {
+    layer->bestQuality = quality == kQNGP_QualityBest;
+    if (quality == kQNGP_QualityWireframe) {
         layer->renders = false;
         layer->wireframe = true;
         layer->castsShadows = false;
@@ -81,7 +79,7 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     record->top = bounds.top;
     record->right = bounds.right;
     record->bottom = bounds.bottom;
-    QNGP_StreamValue scale = ORM_StreamValue(suites, layer, ORM_Stream::kScale, now);
+    QNGP_StreamValue scale = ORM_StreamValue(suites, layer, kQNGP_StreamScale, now);
     record->scaleX = scale.v[0] / 100;
     record->scaleY = scale.v[1] / 100;
 
@@ -96,23 +94,22 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     int16_t quality = 0;
     ORM_Check(layers.GetLayerQuality(layer, &quality));
     ORM_ShadowStreams streams{};
-    if (quality != kQualityWireframe) {
-        streams.castsShadows = ORM_StreamNumber(suites, layer, ORM_Stream::kCastsShadows, now);
-        streams.acceptsShadows = ORM_StreamNumber(suites, layer, ORM_Stream::kAcceptsShadows, now);
+    if (quality != kQNGP_QualityWireframe) {
+        streams.castsShadows = ORM_StreamNumber(suites, layer, kQNGP_StreamCastsShadows, now);
+        streams.acceptsShadows = ORM_StreamNumber(suites, layer, kQNGP_StreamAcceptsShadows, now);
         if (static_cast<int32_t>(streams.acceptsShadows) != kAcceptsShadowsOnly) {
-            streams.acceptsLights =
-                ORM_StreamNumber(suites, layer, ORM_Stream::kAcceptsLights, now);
+            streams.acceptsLights = ORM_StreamNumber(suites, layer, kQNGP_StreamAcceptsLights, now);
         }
     }
     ORM_ApplyQuality(quality, streams, record);
 
-    record->ambient = ORM_StreamFraction(suites, layer, ORM_Stream::kAmbient, now);
-    record->diffuse = ORM_StreamFraction(suites, layer, ORM_Stream::kDiffuse, now);
-    record->specular = ORM_StreamFraction(suites, layer, ORM_Stream::kSpecular, now);
-    record->shininess = ORM_StreamNumber(suites, layer, ORM_Stream::kShininess, now);
-    record->metal = ORM_StreamFraction(suites, layer, ORM_Stream::kMetal, now);
+    record->ambient = ORM_StreamFraction(suites, layer, kQNGP_StreamAmbient, now);
+    record->diffuse = ORM_StreamFraction(suites, layer, kQNGP_StreamDiffuse, now);
+    record->specular = ORM_StreamFraction(suites, layer, kQNGP_StreamSpecularIntensity, now);
+    record->shininess = ORM_StreamNumber(suites, layer, kQNGP_StreamShininess, now);
+    record->metal = ORM_StreamFraction(suites, layer, kQNGP_StreamMetal, now);
     record->lightTransmission =
-        ORM_StreamFraction(suites, layer, ORM_Stream::kLightTransmission, now);
+        ORM_StreamFraction(suites, layer, kQNGP_StreamLightTransmission, now);
 
     ORM_Check(canvas.IsLayerUnbounded(render, layerContext, &record->unbounded));
     record->motionBlur = flags & kQNGP_LayerFlagMotionBlur;

@@ -1,6 +1,6 @@
 #include "layer_streams.h"
 
-QNGP_StreamValue ORM_StreamValue(ORM_SuiteTable& suites, QNGP_LayerH layer, ORM_Stream stream,
+QNGP_StreamValue ORM_StreamValue(ORM_SuiteTable& suites, QNGP_LayerH layer, QNGP_Stream stream,
                                  const T_Time& time) {
     QNGP_StreamValue value{};
     ORM_Check(suites.Get<QNGP_StreamSuite7>().GetLayerStreamValue(

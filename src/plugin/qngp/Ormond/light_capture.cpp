@@ -8,6 +8,10 @@
 
 namespace {
 
+// The scene model numbers light types as the host does, so a type passes through unchanged.
+static_assert(kSY_LightParallel == kQNGP_LightParallel && kSY_LightSpot == kQNGP_LightSpot &&
+              kSY_LightPoint == kQNGP_LightPoint && kSY_LightAmbient == kQNGP_LightAmbient);
+
 // Degrees of the full cone to radians of half of it: π / 360.
 constexpr double kHalfConeRadiansPerDegree = 0.008726646259971648;
 
@@ -21,34 +25,34 @@ struct LightSource {
 SY_LightDesc CaptureLight(ORM_SuiteTable& suites, const LightSource& light,
                           const ORM_CaptureFrame& frame, int32_t shadowMapSize) {
     const T_Time& middle = frame.samples[frame.samples.size() / 2];
-    auto number = [&](ORM_Stream stream) {
+    auto number = [&](QNGP_Stream stream) {
         return ORM_StreamNumber(suites, light.layer, stream, middle);
     };
-    auto fraction = [&](ORM_Stream stream) {
+    auto fraction = [&](QNGP_Stream stream) {
         return ORM_StreamFraction(suites, light.layer, stream, middle);
     };
-    bool ambient = light.type == kSY_LightAmbient;
-    bool spot = light.type == kSY_LightSpot;
+    bool ambient = light.type == kQNGP_LightAmbient;
+    bool spot = light.type == kQNGP_LightSpot;
 
     SY_LightDesc record;
     record.type = light.type;
     record.id = light.compIndex;
-    QNGP_StreamValue color = ORM_StreamValue(suites, light.layer, ORM_Stream::kColor, middle);
-    double intensity = fraction(ORM_Stream::kIntensity);
+    QNGP_StreamValue color = ORM_StreamValue(suites, light.layer, kQNGP_StreamColor, middle);
+    double intensity = fraction(kQNGP_StreamIntensity);
     record.color[0] = 1.0;
     for (int c = 1; c < 4; ++c)
         record.color[c] = color.v[c] * intensity;
-    record.coneHalfAngle = spot ? number(ORM_Stream::kConeAngle) * kHalfConeRadiansPerDegree : 0;
-    record.coneFeather = spot ? fraction(ORM_Stream::kConeFeather) : 0;
-    record.castsShadows = number(ORM_Stream::kCastsShadows) != 0;
-    record.shadowDarkness = fraction(ORM_Stream::kShadowDarkness);
+    record.coneHalfAngle = spot ? number(kQNGP_StreamConeAngle) * kHalfConeRadiansPerDegree : 0;
+    record.coneFeather = spot ? fraction(kQNGP_StreamConeFeather) : 0;
+    record.castsShadows = number(kQNGP_StreamCastsShadows) != 0;
+    record.shadowDarkness = fraction(kQNGP_StreamShadowDarkness);
     record.shadowDiffusion =
-        light.type == kSY_LightParallel ? 0 : number(ORM_Stream::kShadowDiffusion);
+        light.type == kQNGP_LightParallel ? 0 : number(kQNGP_StreamShadowDiffusion);
     if (!ambient) {
         // The host's falloff menu counts from 1.
-        record.falloffType = static_cast<int32_t>(number(ORM_Stream::kFalloff) - 1);
-        record.falloffRadius = number(ORM_Stream::kFalloffRadius);
-        record.falloffDistance = number(ORM_Stream::kFalloffDistance);
+        record.falloffType = static_cast<int32_t>(number(kQNGP_StreamFalloff) - 1);
+        record.falloffRadius = number(kQNGP_StreamFalloffRadius);
+        record.falloffDistance = number(kQNGP_StreamFalloffDistance);
     }
     record.shadowMapSize = shadowMapSize;
 

@@ -5,13 +5,14 @@
 
 #include "pf_pixel.h"
 #include "pf_world.h"
+#include "qngp_suites.h"
 
-// How a layer uses its matte layer.
+// How a layer uses its matte layer: the host's track matte types but none.
 enum class ORM_MatteType : int32_t {
-    kAlpha = 1,
-    kInvertedAlpha = 2,
-    kLuma = 3,
-    kInvertedLuma = 4,
+    kAlpha = kQNGP_TrackMatteAlpha,
+    kInvertedAlpha = kQNGP_TrackMatteInvertedAlpha,
+    kLuma = kQNGP_TrackMatteLuma,
+    kInvertedLuma = kQNGP_TrackMatteInvertedLuma,
 };
 
 // Luma with weights summing to 32768 (0.299, 0.587, 0.114), truncated: white gives the maximum.
