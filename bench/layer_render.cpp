@@ -16,8 +16,8 @@
 
 #include "m_matrix.h"
 #include "pf_world.h"
-#include "renderer/scene/fetchers.h"
 #include "renderer/frame/frame_driver.h"
+#include "renderer/scene/fetchers.h"
 #include "renderer/scene/scene_desc.h"
 
 #ifdef OSTREL_HAVE_OPENCV
@@ -126,9 +126,10 @@ struct Scene {
             layer.placements.Allocate(1);
             layer.placements[0] = CardPlacement(k);
             layer.right = layer.bottom = kTextureSize;
-            layer.renderIndex = layer.depthIndex = k;
-            layer.bestQuality = best;
-            layer.engineFlag = best ? 1 : 0;
+            layer.material.renderIndex = layer.material.depthIndex = k;
+            layer.material.bestQuality = best;
+            layer.material.engineFlag =
+                best ? SY_SamplingFilter::kBilinear : SY_SamplingFilter::kNearest;
             fetcher.worlds[k] = texture.get();
             textures.push_back(std::move(texture));
         }
@@ -174,7 +175,7 @@ double CoveredPixels() {
         double sum = 0;
         for (int32_t k = 0; k < kCards; ++k) {
             for (int32_t j = 0; j < kCards; ++j)
-                one.scene.layers[j].opacity = j == k ? 1 : 0;
+                one.scene.layers[j].material.opacity = j == k ? 1 : 0;
             PF_WorldX<PF_Pixel8> frame(kWidth, kHeight);
             one.Render(&frame, false);
             for (int32_t y = 0; y < kHeight; ++y) {

@@ -35,10 +35,11 @@ struct LitLayer {
         spot.cosOuter = 0.70710678f, spot.cosInner = 0.8f;
         spot.coneScale = 1.0f / (spot.cosInner - spot.cosOuter);
 
-        shader.acceptsLights = 1;
+        shader.material.acceptsLights = 1;
         shader.shaded = 1;
         shader.needsPoint = 1;
-        shader.ambient = 1, shader.diffuse = 0.5, shader.specular = 0.5, shader.metal = 1;
+        shader.material.ambient = 1, shader.material.diffuse = 0.5, shader.material.specular = 0.5,
+        shader.material.metal = 1;
         shader.specularTable = &tables.ForShininess(5);
         shader.eye[0] = 960, shader.eye[1] = 540, shader.eye[2] = -1500;
         shader.lights.Allocate(3);

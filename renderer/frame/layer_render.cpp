@@ -131,7 +131,7 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
     flags.needsSurfacePoint = shader && shader->NeedsSurfacePoint();
     flags.blurred = shader && shader->ShadowBlurRadius() != 0;
     flags.wholeLayer = simplePath;
-    flags.quality = material.bestQuality ? material.engineFlag : 0;
+    flags.samplingFilter = SY_SamplingFilterOf(material);
 
     SY_ScreenGeometry geometry;
     geometry.Build(*context, *this, camera.worldToScreen, camera.count, flags);

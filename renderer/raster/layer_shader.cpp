@@ -11,7 +11,8 @@ namespace {
 bool LitReadsPoint(const SY_LayerShader& shader, const SY_LightState& light) {
     if (light.type == kSY_LightAmbient) return false;
     return light.type != kSY_LightParallel || SY_FalloffUsesDistance(light) ||
-           shader.specular != 0.0 || (shader.acceptsShadows != 0 && light.shadowMap);
+           shader.material.specular != 0.0 ||
+           (shader.material.acceptsShadows != 0 && light.shadowMap);
 }
 
 }  // namespace
@@ -21,17 +22,9 @@ std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
     const SY_Material& material = renderable.material;
     auto shader = std::make_unique<SY_LayerShader>();
     shader->layerId = static_cast<uint16_t>(material.renderIndex);
-    shader->mode = material.mode;
-    shader->opacity = material.opacity;
-    shader->ambient = material.ambient;
-    shader->diffuse = material.diffuse;
-    shader->specular = material.specular;
-    shader->lightTransmission = material.lightTransmission;
-    shader->metal = material.metal;
+    shader->material = material;
     std::copy(context->cameraPosition, context->cameraPosition + 3, shader->eye);
     shader->depthOffset = SY_DepthOffset(material);
-    shader->acceptsShadows = material.acceptsShadows;
-    shader->acceptsLights = material.acceptsLights;
     shader->softShadowLookup = material.acceptsShadows != 0 && material.bestQuality;
 
     shader->lights.Allocate(renderable.lights.Count());

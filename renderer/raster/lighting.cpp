@@ -46,11 +46,10 @@ struct PixelLighting {
         if (shader.needsPoint) ViewVector(v);
         for (const SY_LightState* light : shader.lights) {
             if (light->type == kSY_LightAmbient) {
-                if (shader.ambient == 0.0) continue;
+                if (shader.material.ambient == 0.0) continue;
                 for (int c = 0; c < 3; ++c) {
-                    diffuse[c] =
-                        diffuse[c] +
-                        L::SplatSingle(static_cast<float>(light->color[1 + c] * shader.ambient));
+                    diffuse[c] = diffuse[c] + L::SplatSingle(static_cast<float>(
+                                                  light->color[1 + c] * shader.material.ambient));
                 }
                 continue;
             }
@@ -82,7 +81,7 @@ struct PixelLighting {
         // A light in the layer's plane counts as behind it.
         Real facing = SY_Dot<L>(n, l);
         Mask behind = L::LessEqual(facing, L::Splat(0.0));
-        if (shader.lightTransmission == 0.0) {
+        if (shader.material.lightTransmission == 0.0) {
             active = L::AndNot(behind, active);
             if (L::None(active)) return;
         }
@@ -98,15 +97,16 @@ struct PixelLighting {
             spot = SY_SpotEdge<L>(light, c);
         }
         Single k = spot * SY_Falloff<L>(light, distanceSquared);
-        if (shader.lightTransmission != 0.0) {
+        if (shader.material.lightTransmission != 0.0) {
             k = L::SelectSingle(
-                behind, k * L::SplatSingle(static_cast<float>(shader.lightTransmission)), k);
+                behind, k * L::SplatSingle(static_cast<float>(shader.material.lightTransmission)),
+                k);
         }
 
         Single e[3];
         for (int c = 0; c < 3; ++c)
             e[c] = L::SplatSingle(static_cast<float>(light.color[1 + c]));
-        if (shader.acceptsShadows != 0 && light.shadowMap) {
+        if (shader.material.acceptsShadows != 0 && light.shadowMap) {
             Single t[3], a[3];
             SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId,
                                      p, active, t);
@@ -119,12 +119,12 @@ struct PixelLighting {
                 e[c] = e[c] * a[c];
         }
 
-        if (shader.diffuse != 0.0) {
-            Single amount = L::ToSingle(L::ToReal(k) * L::Splat(shader.diffuse) * facing);
+        if (shader.material.diffuse != 0.0) {
+            Single amount = L::ToSingle(L::ToReal(k) * L::Splat(shader.material.diffuse) * facing);
             for (int c = 0; c < 3; ++c)
                 diffuse[c] = diffuse[c] + L::Keep(active, e[c] * amount);
         }
-        if (shader.specular != 0.0) Highlight(l, v, facing, behind, k, e, active);
+        if (shader.material.specular != 0.0) Highlight(l, v, facing, behind, k, e, active);
     }
 
     // Blinn highlight from the power table; a light behind the layer shines through toward the
@@ -135,7 +135,7 @@ struct PixelLighting {
         Real nh = SY_Dot<L>(n, h);
         Real q = nh * nh / SY_Dot<L>(h, h);
         Mask turnedAway = L::LessEqual(nh, L::Splat(0.0));
-        if (shader.lightTransmission != 0.0) {
+        if (shader.material.lightTransmission != 0.0) {
             Real lv = SY_Dot<L>(l, v);
             q = L::Select(behind, lv * lv, q);
             turnedAway = L::AndNot(behind, turnedAway);
@@ -144,11 +144,11 @@ struct PixelLighting {
         if (L::None(active)) return;
         Single power = L::Lookup(shader.specularTable->values, L::Select(active, q, L::Splat(0.0)),
                                  SY_SpecularTable::kSteps);
-        Single sigma = L::ToSingle(L::ToReal(k) * L::Splat(shader.specular)) * power;
+        Single sigma = L::ToSingle(L::ToReal(k) * L::Splat(shader.material.specular)) * power;
         // Highlights fade out as the light grazes the surface.
         sigma = L::SelectSingle(L::Less(facing, L::Splat(0.01)),
                                 sigma * L::ToSingle(L::Splat(100.0) * facing), sigma);
-        const float metal = static_cast<float>(shader.metal);
+        const float metal = static_cast<float>(shader.material.metal);
         for (int c = 0; c < 3; ++c) {
             // Metal gives the highlight the texture's colour by adding it to the diffuse factor.
             Single highlight = L::Keep(active, e[c] * sigma);
@@ -209,7 +209,7 @@ struct PixelLighting {
     }
 
     void Run() {
-        if (shader.acceptsLights) {
+        if (shader.material.acceptsLights) {
             Lit();
         } else {
             ShadowOnly();

@@ -67,7 +67,7 @@ template <class P>
     int32_t x = ToFixed(u), y = ToFixed(v);
     PF_SampPB& pb = texture.sampling;
     if (ru < kSubpixelBelow && rv < kSubpixelBelow) {
-        if (texture.quality == 2)
+        if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
             PF_SubpixelBicubic(x, y, pb, out);
         else
             PF_SubpixelBilinear(x, y, pb, out);
@@ -137,7 +137,7 @@ inline void SY_SampleNearest(SY_SpanSampleState<P>& state, P* out) {
     *out = state.lastTexel;
 }
 
-// Filtered texel, one sample, at the texture's quality (1 bilinear, 2 bicubic).
+// Filtered texel, one sample, with the texture's filter (bilinear or bicubic).
 template <class P>
 inline void SY_SampleFiltered(SY_SpanSampleState<P>& state, P* out) {
     const SY_SpanMapping& m = state.mapping;

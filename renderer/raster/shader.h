@@ -7,6 +7,7 @@
 
 #include "renderer/scene/light_state.h"
 #include "renderer/scene/owned_array.h"
+#include "renderer/scene/scene_desc.h"
 #include "renderer/scene/specular_table.h"
 #include "u_memory.h"
 
@@ -46,19 +47,16 @@ public:
                         SY_Lighting* out1, SY_Lighting* out2) const;
 
     uint16_t layerId = 0;  // passed to every shadow lookup
-    uint8_t mode = 2;      // transfer mode byte, keep-alpha in bit 7
-    double opacity = 1;
-    double ambient = 0;
-    double diffuse = 0;
-    double specular = 0;
-    double lightTransmission = 0;
-    double metal = 0;
+    // The layer's material. A shader made by hand starts with no light terms and takes no
+    // light until they are set; SY_MakeLayerShader copies the layer's. With acceptsShadows 2
+    // the texel's colour is replaced by white, so only shadows show; acceptsLights false takes
+    // the shadow-only path.
+    SY_Material material{
+        .ambient = 0, .diffuse = 0, .specular = 0, .metal = 0, .acceptsLights = false};
     const SY_SpecularTable* specularTable = nullptr;
     SY_OwnedArray<const SY_LightState*> lights;
     double eye[3] = {};     // camera position, in world space like the surface points
     float depthOffset = 0;  // added to every depth key; layers later in render order lie behind
-    uint8_t acceptsShadows = 0;    // 2: the texel's colour is replaced by white, only shadows show
-    uint8_t acceptsLights = 0;     // 0 takes the shadow-only path
     uint8_t softShadowLookup = 0;  // filtered shadow-map lookups, for best-quality layers
     uint8_t shaded = 0;            // 0: pixels pass unlit
     uint8_t needsPoint = 0;        // the lighting reads the surface point

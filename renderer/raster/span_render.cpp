@@ -23,7 +23,7 @@ SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
 
 void StartTexture(const SY_ScreenGeometry& geometry, SY_SpanTexture* texture) {
     texture->world = geometry.texture;
-    texture->quality = geometry.quality;
+    texture->samplingFilter = geometry.samplingFilter;
     texture->sampling.src = geometry.texture;
     texture->perspective = geometry.perspective;
 }
@@ -38,12 +38,12 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     };
     target.Visit(
         [&](PF_World* world) {
-            draw(SY_CompositeDelivery<P>(world->Row<P>(y), shader.mode, tables));
+            draw(SY_CompositeDelivery<P>(world->Row<P>(y), shader.material.mode, tables));
         },
         [&](SY_MBuffer* buffer) {
             if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
             draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                             shader.mode));
+                                             shader.material.mode));
         },
         [&](const SY_SpanImageRecord& record) {
             draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});

@@ -167,10 +167,10 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     using namespace sy_span;
     const SY_SpanMapping& first = FirstMapping(state);
     SpanSetup<P> setup;
-    setup.coverage0 = LayerCoverage<P>(shader.opacity);
+    setup.coverage0 = LayerCoverage<P>(shader.material.opacity);
     setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
-    setup.filtered = state.texture.quality != 0;
-    setup.colorOnly = shader.acceptsShadows == 2;
+    setup.filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
+    setup.colorOnly = shader.material.acceptsShadows == 2;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
     setup.pairLighting = pairLighting;

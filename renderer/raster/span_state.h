@@ -8,6 +8,7 @@
 #include "m_matrix.h"
 #include "pf_sampling.h"
 #include "pf_world.h"
+#include "renderer/scene/scene_desc.h"
 
 // One screen-to-texture mapping evaluated at a pixel centre: U, V and W with their slopes.
 // The W extent is the range W takes over the pixel's square relative to its centre.
@@ -58,8 +59,8 @@ struct SY_SpanMapping {
 // What the samplers read of the texture, shared by both state forms.
 struct SY_SpanTexture {
     const PF_World* world = nullptr;
-    int32_t quality = 0;  // 0 nearest texel, 1 bilinear, 2 bicubic
-    PF_SampPB sampling;   // the pixel library's block; radii filled per call
+    SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
+    PF_SampPB sampling;  // the pixel library's block; radii filled per call
     bool perspective = true;
 };
 

@@ -86,7 +86,7 @@ void ProjectQuadrilateral(const SY_LayerDesc& layer, const M_Matrix4& layerToScr
                           bool perspective, const SY_SetUpOptions& options, SY_Polygon* polygon,
                           SY_Polygon* scratch) {
     // Best quality samples half a pixel beyond the source so that its edges are filtered.
-    double grow = layer.bestQuality ? 0.5 : 0.0;
+    double grow = layer.material.bestQuality ? 0.5 : 0.0;
     double scale = std::min(std::fabs(layer.scaleX), std::fabs(layer.scaleY));
     grow += scale > 1e-6 ? options.margin / scale : options.margin;
     double left = layer.left - grow, top = layer.top - grow;

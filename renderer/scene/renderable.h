@@ -54,30 +54,6 @@ struct SY_Subsample {
     }
 };
 
-// The layer record's fields from renderIndex through motionBlur.
-struct SY_Material {
-    int32_t renderIndex = 0;
-    int32_t depthIndex = 0;
-    uint8_t mode = 2;
-    double opacity = 1;
-    double ambient = 1;
-    double diffuse = 0.5;
-    double specular = 0.5;
-    double shininess = 5;
-    double lightTransmission = 0;
-    double metal = 1;
-    bool renders = true;
-    bool wireframe = false;
-    bool castsShadows = false;
-    uint8_t acceptsShadows = 0;
-    bool acceptsLights = true;
-    bool bestQuality = false;
-    uint8_t engineFlag = 0;
-    bool motionBlur = false;
-};
-
-SY_Material SY_MaterialOf(const SY_LayerDesc& layer);
-
 // What the layer's position in the render order adds to its fragments' depth keys.
 inline float SY_DepthOffset(const SY_Material& material) {
     return static_cast<float>(-material.depthIndex * kSY_DepthStepPerIndex);

@@ -38,10 +38,12 @@ void SY_BuildRenderables(const SY_RenderableSources& sources, SY_Renderables* re
                       static_cast<double>(sources.outputHeight)};
     for (int32_t i = 0; i < sources.layerCount; ++i) {
         const SY_LayerDesc& layer = sources.layers[i];
-        if (layer.opacity == 0 || !(layer.renders || layer.wireframe)) continue;
+        if (layer.material.opacity == 0 || !(layer.material.renders || layer.material.wireframe))
+            continue;
         SY_TRLayer renderable(layer);
-        options.depthOffset = layer.depthIndex * kSY_DepthStepPerIndex;
-        const SY_CameraView& camera = layer.motionBlur ? sources.motionCamera : sources.frameCamera;
+        options.depthOffset = layer.material.depthIndex * kSY_DepthStepPerIndex;
+        const SY_CameraView& camera =
+            layer.material.motionBlur ? sources.motionCamera : sources.frameCamera;
         if (!SY_SetUpRenderable(layer, camera, options, &renderable)) continue;
         AssignLights(layer, sources.lightStates, sources.lightCount, &renderable);
         renderables->push_back(std::move(renderable));

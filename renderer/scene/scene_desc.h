@@ -53,11 +53,18 @@ struct SY_LightDesc {
     int32_t shadowMapSize = 0;  // pixels; 0 chooses from the output size
 };
 
-struct SY_LayerDesc {
-    SY_OwnedArray<M_Matrix4> placements;  // layer pixels to world, per subsample
-    double scaleX = 1, scaleY = 1;
-    int32_t left = 0, top = 0, right = 0, bottom = 0;  // source rectangle in layer pixels
-    // From renderIndex through motionBlur the fields form the renderable's material block.
+// How a best-quality layer's texture is sampled. The values are the host engine's, which the
+// layer record keeps as it reports them.
+enum class SY_SamplingFilter : uint8_t {
+    kNearest = 0,
+    kBilinear = 1,
+    kBicubic = 2,
+};
+
+// What a layer is drawn with, from its position in the render order to its motion-blur switch.
+// The layer record holds it, and the renderable and its shader copy it whole, so a setting is
+// added in one place.
+struct SY_Material {
     int32_t renderIndex = 0;
     int32_t depthIndex = 0;
     uint8_t mode = 2;  // transfer mode in bits 0-6, keep-alpha in bit 7
@@ -73,10 +80,21 @@ struct SY_LayerDesc {
     bool castsShadows = false;
     uint8_t acceptsShadows = 0;  // 0 off, 1 on, 2 only
     bool acceptsLights = true;
-    bool bestQuality = false;
-    uint8_t engineFlag =
-        0;  // sampling quality of a best-quality layer: 0 nearest, 1 bilinear, 2 bicubic
+    bool bestQuality = false;                                    // false: draft
+    SY_SamplingFilter engineFlag = SY_SamplingFilter::kNearest;  // used at best quality only
     bool motionBlur = false;
+};
+
+// A draft layer samples the nearest texel whatever its engine asks for.
+inline SY_SamplingFilter SY_SamplingFilterOf(const SY_Material& material) {
+    return material.bestQuality ? material.engineFlag : SY_SamplingFilter::kNearest;
+}
+
+struct SY_LayerDesc {
+    SY_OwnedArray<M_Matrix4> placements;  // layer pixels to world, per subsample
+    double scaleX = 1, scaleY = 1;
+    int32_t left = 0, top = 0, right = 0, bottom = 0;  // source rectangle in layer pixels
+    SY_Material material;
     bool collapsed = false;
     bool unbounded = false;
     std::vector<int32_t> lightIds;

@@ -86,7 +86,7 @@ void SY_ScreenGeometry::Build(const SY_RenderContext& context, const SY_TRLayer&
     textureFetcher = context.textureFetcher;
     renderIndex = renderable.material.renderIndex;
     perspective = flags.perspective;
-    quality = flags.quality;
+    samplingFilter = flags.samplingFilter;
     firstValid = renderable.firstValid;
     lastValid = renderable.lastValid;
 
@@ -117,7 +117,8 @@ void SY_ScreenGeometry::Build(const SY_RenderContext& context, const SY_TRLayer&
             textureToWorld.AssignFromByDroppingIndices(a, 2, 3);
             Check(M_ConcatMatrix(&m, &textureToWorld, &eyeRay));
         }
-        if (quality != 0) Check(M_TranslateMatrix(&m, -0.5, -0.5));
+        // A filter weighs texels by their centres, half a texel in from their corners.
+        if (samplingFilter != SY_SamplingFilter::kNearest) Check(M_TranslateMatrix(&m, -0.5, -0.5));
         if (!perspective) {
             const double* plane = subsample.plane;
             m.mat[0][2] = plane[0] / plane[2];

@@ -18,7 +18,7 @@ struct SY_GeometryFlags {
     bool needsSurfacePoint = false;   // the shader lights points: fill the eye-ray mapping
     bool blurred = false;             // the shader samples a blurred texture
     bool wholeLayer = false;          // fetch the whole layer at its own size
-    int32_t quality = 0;              // 0 nearest texel, 1 bilinear, 2 bicubic
+    SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
 };
 
 // Owns its hold on the texture: destruction hands it back through the fetcher.
@@ -52,5 +52,5 @@ public:
     double normal[3] = {};  // unit normal in world space, turned toward the camera
     bool perspective = true;
     double projectionW = -1;  // the camera's [2][3] under perspective, else −1
-    int32_t quality = 0;
+    SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
 };

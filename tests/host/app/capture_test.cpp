@@ -10,6 +10,7 @@
 #include "render_context.h"
 #include "render_entry.h"
 #include "renderer/scene/messages.h"
+#include "renderer/scene/scene_print.h"
 #include "resources/ormond_strings.h"
 #include "scene_assembly.h"
 #include "served_frame.h"
@@ -234,7 +235,7 @@ TEST_F(Capture, LightsReachOnlyTheLayersBelowWhenTheyAskForIt) {
         for (int32_t i = 0; i < 4; ++i) {
             SCOPED_TRACE(i);
             EXPECT_EQ(scene.layers[i].compIndex, kCompIndex[i]);
-            EXPECT_EQ(scene.layers[i].renderIndex, i);
+            EXPECT_EQ(scene.layers[i].material.renderIndex, i);
             EXPECT_EQ(scene.layers[i].lightIds, enabled && kCompIndex[i] > 3
                                                     ? std::vector<int32_t>{3}
                                                     : std::vector<int32_t>{});
@@ -297,10 +298,11 @@ TEST_F(Capture, QualityAndShadowSwitches) {
     };
     for (int32_t i = 0; i < 4; ++i) {
         const SY_LayerDesc& l = scene.layers[i];
-        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
-                           l.acceptsLights, l.bestQuality, l.mode),
+        EXPECT_EQ(Switches(l.material.renders, l.material.wireframe, l.material.castsShadows,
+                           l.material.acceptsShadows, l.material.acceptsLights,
+                           l.material.bestQuality, l.material.mode),
                   kExpected[i])
-            << "layer " << i;
+            << "layer " << i << ": " << l;
     }
 }
 

@@ -58,8 +58,8 @@ TYPED_TEST(FrameRender, EachPixelShowsTheTexelItsRayMeets) {
     for (const auto& c : cases) {
         Frame frame(kWidth, kHeight, 1);
         SY_LayerDesc& layer = frame.Layer(0, texture.get(), c.placement);
-        layer.bestQuality = c.best;
-        layer.engineFlag = c.best;
+        layer.material.bestQuality = c.best;
+        layer.material.engineFlag = SY_SamplingFilter::kBilinear;  // at best quality only
         PF_WorldX<P> destination(kWidth, kHeight);
         frame.Render(&destination);
         int32_t checked = 0;
@@ -153,8 +153,8 @@ TEST(FrameRender, WireframeOutlinesTheLayerButNotTheOutputBorder) {
     auto texture = PatternTexture<PF_Pixel8>(40, 40);
     Frame frame(kWidth, kHeight, 1);
     SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(40, 30, 0));
-    layer.renders = false;
-    layer.wireframe = true;
+    layer.material.renders = false;
+    layer.material.wireframe = true;
     PF_WorldX<PF_Pixel8> destination(kWidth, kHeight);
     frame.Render(&destination);
     auto white = [&](int32_t x, int32_t y) { return destination.At(x, y).blue == 255; };
@@ -217,18 +217,18 @@ TYPED_TEST(FrameRenderThreads, ThreadedFrameEqualsSingleThreadedFrame) {
         frame.Layer(0, plain.get(), Translation(2, 3, 0));
         SY_LayerDesc& turned = frame.Layer(
             1, large.get(), scene_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
-        turned.bestQuality = true;
-        turned.engineFlag = 1;
+        turned.material.bestQuality = true;
+        turned.material.engineFlag = SY_SamplingFilter::kBilinear;
         SY_LayerDesc& bicubic =
             frame.Layer(2, plain.get(), scene_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
-        bicubic.bestQuality = true;
-        bicubic.engineFlag = 2;
-        bicubic.opacity = 0.7;
-        bicubic.mode = kPF_XferMultiply;
+        bicubic.material.bestQuality = true;
+        bicubic.material.engineFlag = SY_SamplingFilter::kBicubic;
+        bicubic.material.opacity = 0.7;
+        bicubic.material.mode = kPF_XferMultiply;
         SY_LayerDesc& moving = frame.Layer(3, plain.get(), Translation(30, 5, 0));
         scene_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
-        moving.motionBlur = moving.bestQuality = true;
-        moving.engineFlag = 1;
+        moving.material.motionBlur = moving.material.bestQuality = true;
+        moving.material.engineFlag = SY_SamplingFilter::kBilinear;
         frame.Render(destination, iterate);
     };
     PF_WorldX<P> single(kWidth, kHeight), threaded(kWidth, kHeight);

@@ -7,7 +7,6 @@
 #include <vector>
 
 #include "../scene/frame_test_support.h"
-#include "m_matrix.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
 #include "renderer/scene/renderable.h"
@@ -40,9 +39,9 @@ SY_LightState Spot(double x, double y, double z, double ax, double ay, double az
     return light;
 }
 
+// A light with a falloff of type over radius and distance, and the squares preparing derives.
 SY_LightState Falloff(SY_LightState light, int32_t type, double radius, double distance) {
     light.falloffType = type, light.falloffRadius = radius, light.falloffDistance = distance;
-    // What preparing a light derives from them.
     light.radiusSquared = radius * radius, light.distanceSquared = distance * distance;
     light.outerSquared = (radius + distance) * (radius + distance);
     light.inverseDistance = distance == 0 ? 1.0 : 1.0 / distance;
@@ -72,7 +71,8 @@ struct FixedShadow : SY_ShadowMap {
 // A shader that takes light from `lights`, with no material terms but those the test sets.
 std::unique_ptr<SY_LayerShader> LitShader(std::initializer_list<const SY_LightState*> lights) {
     auto shader = std::make_unique<SY_LayerShader>();
-    shader->acceptsLights = shader->shaded = shader->needsPoint = 1;
+    shader->material.acceptsLights = true;
+    shader->shaded = shader->needsPoint = 1;
     shader->eye[2] = -1000;
     shader->lights.Allocate(static_cast<int32_t>(lights.size()));
     std::copy(lights.begin(), lights.end(), shader->lights.begin());
@@ -129,9 +129,9 @@ TEST(Lighting, OneLightAtAKnownPlace) {
     };
     for (const Case& c : cases) {
         auto shader = LitShader({&c.light});
-        shader->ambient = c.ambient;
-        shader->diffuse = 1;
-        shader->lightTransmission = c.transmission;
+        shader->material.ambient = c.ambient;
+        shader->material.diffuse = 1;
+        shader->material.lightTransmission = c.transmission;
         SY_Lighting out = LightAt(*shader, c.x, 0);
         for (int k = 0; k < 3; ++k) {
             EXPECT_NEAR(out.diffuse[k], c.lit * c.light.color[1 + k], 1e-6) << c.what;
@@ -156,8 +156,8 @@ TEST(Lighting, HighlightsByMetalAndAtGrazingLight) {
         SY_LightState light = Light(kSY_LightParallel, x, 0, z);
         light.color[2] = 0.8, light.color[3] = 0.6;
         auto shader = LitShader({&light});
-        shader->specular = 1;
-        shader->metal = metal;
+        shader->material.specular = 1;
+        shader->material.metal = metal;
         shader->specularTable = &tables.ForShininess(shininess);
         SY_Lighting out = LightAt(*shader, 0, 0);
         const double texel[3] = {1, 0, 0}, shown[3] = {red, green, blue};
@@ -188,9 +188,9 @@ TEST(Lighting, ShadowsLetThroughAKnownDarkness) {
         const FixedShadow& lookups = *map;
         light.shadowMap = std::move(map);
         auto shader = LitShader({&light, &withoutMap});
-        shader->diffuse = 1;
-        shader->acceptsLights = lit;
-        shader->acceptsShadows = lit ? 1 : 2;
+        shader->material.diffuse = 1;
+        shader->material.acceptsLights = lit;
+        shader->material.acceptsShadows = lit ? 1 : 2;
         shader->softShadowLookup = soft;
         shader->layerId = 7;
         SY_Lighting out = LightAt(*shader, 0, 0);
@@ -201,7 +201,7 @@ TEST(Lighting, ShadowsLetThroughAKnownDarkness) {
         EXPECT_EQ(lookups.softLookups, 2 * soft);  // the point alone and in the pair
         EXPECT_EQ(lookups.hardLookups, 2 - 2 * soft);
         EXPECT_EQ(lookups.lastReceiver, 7);
-        shader->acceptsShadows = 0;
+        shader->material.acceptsShadows = 0;
         EXPECT_NEAR(LightAt(*shader, 0, 0).diffuse[0], 1, 1e-6);
         EXPECT_EQ(lookups.hardLookups + lookups.softLookups, 2);
     }
@@ -216,9 +216,9 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
         SY_LightState point = Falloff(Light(kSY_LightPoint, -50, 10, side * 80), 2, 60, 0);
         auto shader = LitShader({&spot, &point});
         shader->eye[2] = side * 1000;
-        shader->diffuse = 0.7;
-        shader->specular = 0.6;
-        shader->metal = 0.3;
+        shader->material.diffuse = 0.7;
+        shader->material.specular = 0.6;
+        shader->material.metal = 0.3;
         shader->specularTable = &tables.ForShininess(40);
         const double n[3] = {0, 0, side};
         return LightAt(*shader, 12, 7, n);
@@ -236,8 +236,8 @@ TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
     SY_LightState ambient = Light(kSY_LightAmbient), onSurface = Light(kSY_LightPoint, 5, 5, 0);
     ambient.color[1] = ambient.color[2] = ambient.color[3] = 0.2;
     auto shader = LitShader({&ambient, &onSurface});
-    shader->ambient = 1;
-    shader->diffuse = 1;
+    shader->material.ambient = 1;
+    shader->material.diffuse = 1;
     ostrel_test::ReportCapture capture;
     EXPECT_NEAR(LightAt(*shader, 5, 5).diffuse[0], 0.2, 1e-6);
     EXPECT_TRUE(capture.reports().empty());
@@ -302,11 +302,11 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
             SY_RenderContext context;
             std::fill(context.cameraPosition, context.cameraPosition + 3, -3.0);
             SY_LayerDesc layer;
-            layer.renderIndex = layer.depthIndex = 4;
-            layer.bestQuality = (&c - cases) % 2;
-            layer.acceptsLights = c.acceptsLights;
-            layer.acceptsShadows = c.acceptsShadows;
-            layer.specular = c.specular;
+            layer.material.renderIndex = layer.material.depthIndex = 4;
+            layer.material.bestQuality = (&c - cases) % 2;
+            layer.material.acceptsLights = c.acceptsLights;
+            layer.material.acceptsShadows = c.acceptsShadows;
+            layer.material.specular = c.specular;
             auto shader = SY_MakeLayerShader(&context, Renderable(layer, c.lights));
             EXPECT_EQ(shader->shaded, c.shaded) << c.what;
             EXPECT_EQ(shader->NeedsSurfacePoint(), c.needsPoint) << c.what;
@@ -316,7 +316,8 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
             EXPECT_FLOAT_EQ(exponent, c.table ? 0.5 * SY_SpecularExponent(5) : 0) << c.what;
             EXPECT_EQ(shader->eye[1], -3.0) << c.what;
             EXPECT_FLOAT_EQ(shader->depthOffset, -4e-7f) << c.what;
-            EXPECT_EQ(shader->softShadowLookup, c.acceptsShadows && layer.bestQuality) << c.what;
+            EXPECT_EQ(shader->softShadowLookup, c.acceptsShadows && layer.material.bestQuality)
+                << c.what;
         }
         EXPECT_EQ(U_AccountedBytes(), start) << c.what;
     }

@@ -74,8 +74,8 @@ struct Frame {
         ostrel_test::SetDefaultCamera(&scene, w, h, kDistance);
         scene.layers.Allocate(layerCount);
         for (int32_t i = 0; i < layerCount; ++i) {
-            scene.layers[i].renderIndex = i;
-            scene.layers[i].depthIndex = i;
+            scene.layers[i].material.renderIndex = i;
+            scene.layers[i].material.depthIndex = i;
         }
     }
 

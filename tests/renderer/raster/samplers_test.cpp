@@ -2,6 +2,7 @@
 
 #include "raster_test_support.h"
 #include "renderer/raster/samplers.h"
+#include "renderer/scene/scene_print.h"
 
 namespace {
 
@@ -10,6 +11,8 @@ using raster_test::FilledWorld;
 using raster_test::IsClear;
 using raster_test::Opaque;
 using raster_test::PatternTexel;
+
+using Filter = SY_SamplingFilter;
 
 // Screen to texture: U = s·x, V = s·y, W = 1.
 M_Matrix3 Scaled(double s) {
@@ -20,27 +23,27 @@ M_Matrix3 Scaled(double s) {
 }
 
 template <class State>
-void StartTexture(const PF_World& texture, int32_t quality, bool perspective, State* state) {
+void StartTexture(const PF_World& texture, Filter filter, bool perspective, State* state) {
     state->texture.world = state->texture.sampling.src = &texture;
-    state->texture.quality = quality;
+    state->texture.samplingFilter = filter;
     state->texture.perspective = perspective;
 }
 
 template <class P, class State>
-P Take(State& state, int32_t quality) {
+P Take(State& state, Filter filter) {
     P got;
-    quality == 0 ? SY_SampleNearest(state, &got) : SY_SampleFiltered(state, &got);
+    filter == Filter::kNearest ? SY_SampleNearest(state, &got) : SY_SampleFiltered(state, &got);
     return got;
 }
 
-// The sample at screen point (x, y) through m, with quality 0 (nearest texel), 1 or 2.
+// The sample at screen point (x, y) through m with the given filter.
 template <class P>
-P Sample(const PF_World& texture, int32_t quality, const M_Matrix3& m, double x, double y,
+P Sample(const PF_World& texture, Filter filter, const M_Matrix3& m, double x, double y,
          bool perspective = false) {
     SY_SpanSampleState<P> state;
-    StartTexture(texture, quality, perspective, &state);
+    StartTexture(texture, filter, perspective, &state);
     state.mapping.Start(m, x, y, perspective, 1.0f);
-    return Take<P>(state, quality);
+    return Take<P>(state, filter);
 }
 
 template <class P>
@@ -55,7 +58,7 @@ TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
     const double cases[][3] = {{0.5, 0.5, 1}, {7.99, 3.99, 1}, {3.0, 2.0, 1},
                                {8.0, 1.5, 0}, {1.5, 4.0, 0},   {-0.25, 1.5, 0}};
     for (const auto& [x, y, inside] : cases) {
-        const P got = Sample<P>(*texture, 0, Scaled(1), x, y);
+        const P got = Sample<P>(*texture, Filter::kNearest, Scaled(1), x, y);
         EXPECT_TRUE(inside ? Equal(got, PatternTexel<P>(int32_t(x), int32_t(y))) : IsClear(got))
             << x << "," << y;
     }
@@ -67,13 +70,13 @@ TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
 TYPED_TEST(Samplers, FilteredInterpolatesSmallFootprintsAndAveragesWideOnes) {
     using P = TypeParam;
     auto pattern = raster_test::PatternTexture<P>(8, 8);
-    for (int32_t quality : {1, 2})
-        EXPECT_TRUE(Equal(Sample<P>(*pattern, quality, Scaled(1), 4, 3), PatternTexel<P>(4, 3)));
+    for (Filter filter : {Filter::kBilinear, Filter::kBicubic})
+        EXPECT_TRUE(Equal(Sample<P>(*pattern, filter, Scaled(1), 4, 3), PatternTexel<P>(4, 3)));
+    const P white = Opaque<P>(255, 255, 255);
     auto dot = FilledWorld<P>(8, 8, Opaque<P>(0, 0, 0));
-    dot->At(4, 3) = Opaque<P>(255, 255, 255);
-    EXPECT_TRUE(Equal(Sample<P>(*dot, 1, Scaled(1), 4, 3), Opaque<P>(255, 255, 255)));
-    EXPECT_FALSE(
-        Equal(Sample<P>(*dot, 1, Scaled(1.5), 4 / 1.5, 3 / 1.5), Opaque<P>(255, 255, 255)));
+    dot->At(4, 3) = white;
+    EXPECT_TRUE(Equal(Sample<P>(*dot, Filter::kBilinear, Scaled(1), 4, 3), white));
+    EXPECT_FALSE(Equal(Sample<P>(*dot, Filter::kBilinear, Scaled(1.5), 4 / 1.5, 3 / 1.5), white));
 }
 
 // W = 0.1 + 0.2·x, with U and V following W so they stay inside the texture: at x = 0 the
@@ -84,8 +87,8 @@ TYPED_TEST(Samplers, FootprintReachingTheEyePlaneIsTransparent) {
     M_Matrix3 m{};
     m.mat[0][0] = m.mat[0][2] = 0.2;
     m.mat[2][1] = m.mat[2][2] = 0.1;
-    EXPECT_TRUE(IsClear(Sample<P>(*texture, 1, m, 0.0, 0.5, true)));
-    EXPECT_FALSE(IsClear(Sample<P>(*texture, 1, m, 2.0, 0.5, true)));
+    EXPECT_TRUE(IsClear(Sample<P>(*texture, Filter::kBilinear, m, 0.0, 0.5, true)));
+    EXPECT_FALSE(IsClear(Sample<P>(*texture, Filter::kBilinear, m, 2.0, 0.5, true)));
 }
 
 // Two subsamples, the second absent: alpha is halved, the colour stays. With both absent the
@@ -95,18 +98,18 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
     constexpr double kMax = PF_PixelTraits<P>::kMax;
     const P color = Opaque<P>(200, 100, 50);
     auto texture = FilledWorld<P>(8, 8, color);
-    for (int32_t quality : {0, 1}) {
+    for (Filter filter : {Filter::kNearest, Filter::kBilinear}) {
         SY_SpanSubsampleState<P> state;
-        StartTexture(*texture, quality, false, &state);
+        StartTexture(*texture, filter, false, &state);
         state.count = 2;
         state.last = 1;
         state.mappings[0].Start(Scaled(1), 4, 4, false, 0.5f);
         state.mappings[1].StartAbsent();
-        const P got = Take<P>(state, quality);
-        EXPECT_NEAR(got.alpha, kMax / 2, kMax / 255) << quality;
-        EXPECT_TRUE(Equal(P{got.alpha, color.red, color.green, color.blue}, got)) << quality;
+        const P got = Take<P>(state, filter);
+        EXPECT_NEAR(got.alpha, kMax / 2, kMax / 255) << filter;
+        EXPECT_TRUE(Equal(P{got.alpha, color.red, color.green, color.blue}, got)) << filter;
         state.mappings[0].StartAbsent();
-        EXPECT_TRUE(IsClear(Take<P>(state, quality))) << quality;
+        EXPECT_TRUE(IsClear(Take<P>(state, filter))) << filter;
     }
 }
 

@@ -2,7 +2,6 @@
 
 #include <cmath>
 #include <type_traits>
-#include <vector>
 
 #include "raster_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
@@ -132,7 +131,7 @@ TYPED_TEST(Span, KeepAlphaLeavesTheDestinationAlpha) {
 TYPED_TEST(Span, MatteAndOpacityScaleTheCoverage) {
     using P = TypeParam;
     using Traits = PF_PixelTraits<P>;
-    this->blend_.opacity = this->shader_.opacity = 0.5;
+    this->blend_.opacity = this->shader_.material.opacity = 0.5;
     PF_WorldX<P> matte(kWidth, kHeight);
     for (int32_t x = 0; x < kWidth; ++x)
         matte.At(x, 4).alpha = x < 8 ? 0 : static_cast<typename Traits::Channel>(Traits::kMax / 2);
@@ -156,12 +155,13 @@ TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     SY_LayerShader& shader = this->shader_;
     shader.lights.Allocate(1);
     shader.lights[0] = &ambient;
-    shader.ambient = shader.acceptsLights = shader.shaded = 1;
+    shader.material.ambient = shader.shaded = 1;
+    shader.material.acceptsLights = true;
     auto half = [](double c) {
         return PF_PixelTraits<P>::kIsFloat ? c / 2 : std::floor(c / 2 + 0.5);
     };
     for (uint8_t acceptsShadows : {0, 2}) {
-        shader.acceptsShadows = acceptsShadows;
+        shader.material.acceptsShadows = acceptsShadows;
         PF_WorldX<P> destination(kWidth, kHeight);
         this->Draw(false, SY_RenderTarget(destination), 1, 3, 4);  // a pair and the tail
         for (int32_t i = 1; i < 4; ++i) {

@@ -15,14 +15,14 @@
 namespace ostrel_test {
 
 // The camera a composition without a camera layer gets: at (w/2, h/2, −d) looking down +z with
-// zoom d, so that the plane z = 0 maps 1:1 onto the output.
-inline void SetDefaultCamera(SY_SceneDesc* scene, int32_t width, int32_t height, double distance,
-                             int32_t subsamples = 1) {
+// zoom d, so that the plane z = 0 maps 1:1 onto the output; orthographic, it does at any depth.
+inline void SetDefaultCamera(SY_SceneDesc* scene, double width, double height, double distance,
+                             int32_t subsamples = 1, bool perspective = true) {
     M_Matrix4 placement, projection;
     M_IdentityMatrix4(&placement);
     M_TranslateMatrix4(width * 0.5, height * 0.5, -distance, &placement);
     M_IdentityMatrix4(&projection);
-    projection.Project(distance);
+    if (perspective) projection.Project(distance);
     M_TranslateMatrix4(width * 0.5, height * 0.5, 0, &projection);
     scene->cameraPlacements.Allocate(subsamples);
     scene->cameraProjections.Allocate(subsamples);
@@ -32,7 +32,7 @@ inline void SetDefaultCamera(SY_SceneDesc* scene, int32_t width, int32_t height,
     }
     scene->framePlacement = placement;
     scene->frameProjection = projection;
-    scene->perspective = true;
+    scene->perspective = perspective;
 }
 
 // Collects everything reported while it lives.
@@ -57,8 +57,7 @@ private:
     U_Reporter previous_;
 };
 
-// A threaded iterator like the host's: items spread over a fixed number of threads, each
-// thread with its own stable index.
+// A threaded iterator like the host's: items over a fixed number of threads of stable index.
 template <int32_t kThreads>
 struct ThreadedIterateSuite {
     static int32_t GetThreadCount(int32_t* count) {

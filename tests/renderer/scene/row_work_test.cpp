@@ -1,6 +1,5 @@
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <vector>
 
 #include "frame_test_support.h"
@@ -12,80 +11,55 @@ namespace {
 using ostrel_test::RecordingProgress;
 using ostrel_test::ThreadedIterateSuite;
 
-std::vector<int32_t> RowsDrawn(int32_t fieldMode, int32_t rows, RecordingProgress* progress) {
-    std::vector<int32_t> drawn;
-    SY_RowWork work{
-        &PF_IterateGeneric_Static,
-        progress,
-        0,
-        rows,
-        fieldMode,
-        [](const void* closure, int32_t row, int32_t, int32_t) {
-            static_cast<std::vector<int32_t>*>(const_cast<void*>(closure))->push_back(row);
-        },
-        &drawn};
-    SY_RunRowWork(work);
-    return drawn;
+// Runs work over `rows` rows in a field mode and returns the rows drawn; row `failing` throws 4,
+// which comes back negated after the rows drawn.
+std::vector<int32_t> RowsDrawn(int32_t fieldMode, int32_t rows, int32_t failing,
+                               RecordingProgress* progress) {
+    struct Closure {
+        std::vector<int32_t> drawn;
+        int32_t failing;
+    } closure{{}, failing};
+    auto draw = [](const void* c, int32_t row, int32_t, int32_t) {
+        auto* self = static_cast<Closure*>(const_cast<void*>(c));
+        if (row == self->failing) throw int32_t{4};
+        self->drawn.push_back(row);
+    };
+    try {
+        SY_RunRowWork({&PF_IterateGeneric_Static, progress, 0, rows, fieldMode, draw, &closure});
+    } catch (int32_t code) {
+        closure.drawn.push_back(-code);
+    }
+    return closure.drawn;
 }
 
-TEST(RowWork, FieldModesSkipRows) {
+TEST(RowWork, FieldModesSkipRowsProgressComesEveryFourthRowAndAFailureStopsTheRest) {
+    using Reports = std::vector<std::pair<int32_t, int32_t>>;
     struct Case {
-        int32_t fieldMode;
-        std::vector<int32_t> rows;
+        int32_t fieldMode, rows, failing;
+        std::vector<int32_t> drawn;
+        Reports progress;
     };
-    const Case cases[] = {{0, {0, 1, 2, 3, 4}}, {1, {0, 2, 4}}, {2, {1, 3}}};
-    for (const Case& c : cases) {
+    const Case kCases[] = {
+        {0, 5, -1, {0, 1, 2, 3, 4}, {{0, 5}, {4, 5}}},
+        {1, 5, -1, {0, 2, 4}, {{0, 5}, {4, 5}}},
+        {2, 5, -1, {1, 3}, {}},
+        {0, 10, -1, {0, 1, 2, 3, 4, 5, 6, 7, 8, 9}, {{0, 10}, {4, 10}, {8, 10}}},
+        {0, 10, 3, {0, 1, 2, -4}, {{0, 10}}},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(testing::Message() << "field mode " << c.fieldMode << ", " << c.rows
+                                        << " rows, failing at " << c.failing);
         RecordingProgress progress;
-        EXPECT_EQ(RowsDrawn(c.fieldMode, 5, &progress), c.rows) << "field mode " << c.fieldMode;
+        EXPECT_EQ(RowsDrawn(c.fieldMode, c.rows, c.failing, &progress), c.drawn);
+        EXPECT_EQ(progress.rows, c.progress);
     }
 }
 
-TEST(RowWork, ProgressEveryFourthRowFromThreadZero) {
-    RecordingProgress progress;
-    RowsDrawn(0, 10, &progress);
-    using Report = std::pair<int32_t, int32_t>;
-    EXPECT_EQ(progress.rows, (std::vector<Report>{{0, 10}, {4, 10}, {8, 10}}));
-    RecordingProgress single;
-    RowsDrawn(0, 1, &single);
-    EXPECT_EQ(single.rows, (std::vector<Report>{{0, 1}}));
-}
-
-TEST(RowWork, TheFirstFailureStopsTheRestAndIsRethrown) {
-    int32_t drawn = 0;
-    RecordingProgress progress;
-    SY_RowWork work{&PF_IterateGeneric_Static,
-                    &progress,
-                    0,
-                    10,
-                    0,
-                    [](const void* closure, int32_t row, int32_t, int32_t) {
-                        if (row == 3) throw int32_t{4};
-                        ++*static_cast<int32_t*>(const_cast<void*>(closure));
-                    },
-                    &drawn};
-    EXPECT_THROW(
-        {
-            try {
-                SY_RunRowWork(work);
-            } catch (int32_t code) {
-                EXPECT_EQ(code, 4);
-                throw;
-            }
-        },
-        int32_t);
-    EXPECT_EQ(drawn, 3);
-}
-
 // Items that share a counter through the allocation lock, as fragment pools share blocks.
-struct SharedCounter {
-    int64_t value = 0;
-};
-
 void CountUnderLock(const void* closure, int32_t, int32_t, int32_t) {
-    auto* counter = static_cast<SharedCounter*>(const_cast<void*>(closure));
     for (int i = 0; i < 100; ++i) {
         SY_AllocationLockScope scope(SY_GetAllocationLock());
-        ++counter->value;
+        ++*static_cast<int64_t*>(const_cast<void*>(closure));
     }
 }
 
@@ -97,10 +71,10 @@ TEST(RowWorkThreads, LockModeFollowsEachFrame) {
         PF_IterateFunction iterate = SY_PrepareThreads(multiprocessing, Threaded::Suite());
         EXPECT_EQ(SY_GetAllocationLock()->singleThreaded.load(), !multiprocessing);
         EXPECT_EQ(SY_ThreadCount(), multiprocessing ? 4 : 1);
-        SharedCounter counter;
+        int64_t counter = 0;
         RecordingProgress progress;
         SY_RunRowWork({iterate, &progress, 0, 64, 0, &CountUnderLock, &counter});
-        EXPECT_EQ(counter.value, 6400);
+        EXPECT_EQ(counter, 6400);
     }
 }
 

@@ -7,6 +7,7 @@
 #include <initializer_list>
 #include <new>
 
+#include "frame_test_support.h"
 #include "m_matrix.h"
 #include "renderer/scene/renderable.h"
 #include "renderer/scene/scene_desc.h"
@@ -26,17 +27,13 @@ inline M_Matrix4 Translation(double x, double y, double z) {
     return m;
 }
 
-// The default camera of a width × height output at distance d from the plane z = 0, looking
-// along +z at the output's centre; under perspective the zoom is d, so z = 0 maps 1:1.
+// The world-to-screen matrix of the default camera (see SetDefaultCamera).
 inline M_Matrix4 DefaultCamera(double width, double height, double distance, bool perspective) {
-    M_Matrix4 placement = Translation(width / 2, height / 2, -distance);
-    M_Matrix4 projection = Identity();
-    if (perspective) projection.Project(distance);
-    M_TranslateMatrix4(width / 2, height / 2, 0, &projection);
-    M_Matrix4 eye;
-    M_InverseMatrix4(&placement, &eye);
-    M_Matrix4 worldToScreen;
-    M_ConcatMatrix4(&eye, &projection, &worldToScreen);
+    SY_SceneDesc scene;
+    ostrel_test::SetDefaultCamera(&scene, width, height, distance, 1, perspective);
+    M_Matrix4 eye, worldToScreen;
+    M_InverseMatrix4(&scene.framePlacement, &eye);
+    M_ConcatMatrix4(&eye, &scene.frameProjection, &worldToScreen);
     return worldToScreen;
 }
 

@@ -20,26 +20,26 @@ uint8_t ORM_StoredTransferMode(const QNGP_LayerTransferMode& mode, const QNGP_En
     return stored;
 }
 
-void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_LayerDesc* layer) {
-    layer->bestQuality = quality == kQNGP_QualityBest;
+void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_Material* material) {
+    material->bestQuality = quality == kQNGP_QualityBest;
     if (quality == kQNGP_QualityWireframe) {
-        layer->renders = false;
-        layer->wireframe = true;
-        layer->castsShadows = false;
-        layer->acceptsShadows = 0;
-        layer->acceptsLights = false;
+        material->renders = false;
+        material->wireframe = true;
+        material->castsShadows = false;
+        material->acceptsShadows = 0;
+        material->acceptsLights = false;
         return;
     }
-    layer->wireframe = false;
-    layer->renders = true;
-    layer->castsShadows = streams.castsShadows != 0;
-    if (streams.castsShadows > 1.0) layer->renders = false;
-    layer->acceptsShadows = static_cast<uint8_t>(static_cast<int32_t>(streams.acceptsShadows));
-    if (layer->acceptsShadows == kAcceptsShadowsOnly) {
-        layer->acceptsLights = false;
-        layer->mode = kORM_ShadowsOnlyMode;
+    material->wireframe = false;
+    material->renders = true;
+    material->castsShadows = streams.castsShadows != 0;
+    if (streams.castsShadows > 1.0) material->renders = false;
+    material->acceptsShadows = static_cast<uint8_t>(static_cast<int32_t>(streams.acceptsShadows));
+    if (material->acceptsShadows == kAcceptsShadowsOnly) {
+        material->acceptsLights = false;
+        material->mode = kORM_ShadowsOnlyMode;
     } else {
-        layer->acceptsLights = streams.acceptsLights != 0;
+        material->acceptsLights = streams.acceptsLights != 0;
     }
 }
 
@@ -64,6 +64,7 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     const auto& layers = suites.Get<QNGP_LayerSuite10>();
     QNGP_RenderContextH render = context.Render();
     const T_Time& now = frame.renderTime;
+    SY_Material& material = record->material;
 
     QNGP_LayerContextH layerContext = nullptr;
     ORM_Check(canvas.GetNthLayerContext(render, index, &layerContext));
@@ -87,9 +88,11 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     ORM_Check(layers.GetLayerTransferMode(layer, &transfer));
     QNGP_EngineLayer engine{};
     ORM_Check(layers.GetEngineLayer(layer, &engine));
-    record->mode = ORM_StoredTransferMode(transfer, engine);
-    record->engineFlag = engine.isAVLayer ? engine.samplingQuality : 0;
-    ORM_Check(canvas.GetRenderOpacity(render, layerContext, &now, &record->opacity));
+    material.mode = ORM_StoredTransferMode(transfer, engine);
+    // The renderer's sampling filters carry the engine's values.
+    material.engineFlag = engine.isAVLayer ? static_cast<SY_SamplingFilter>(engine.samplingQuality)
+                                           : SY_SamplingFilter::kNearest;
+    ORM_Check(canvas.GetRenderOpacity(render, layerContext, &now, &material.opacity));
 
     int16_t quality = 0;
     ORM_Check(layers.GetLayerQuality(layer, &quality));
@@ -101,21 +104,21 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
             streams.acceptsLights = ORM_StreamNumber(suites, layer, kQNGP_StreamAcceptsLights, now);
         }
     }
-    ORM_ApplyQuality(quality, streams, record);
+    ORM_ApplyQuality(quality, streams, &material);
 
-    record->ambient = ORM_StreamFraction(suites, layer, kQNGP_StreamAmbient, now);
-    record->diffuse = ORM_StreamFraction(suites, layer, kQNGP_StreamDiffuse, now);
-    record->specular = ORM_StreamFraction(suites, layer, kQNGP_StreamSpecularIntensity, now);
-    record->shininess = ORM_StreamNumber(suites, layer, kQNGP_StreamShininess, now);
-    record->metal = ORM_StreamFraction(suites, layer, kQNGP_StreamMetal, now);
-    record->lightTransmission =
+    material.ambient = ORM_StreamFraction(suites, layer, kQNGP_StreamAmbient, now);
+    material.diffuse = ORM_StreamFraction(suites, layer, kQNGP_StreamDiffuse, now);
+    material.specular = ORM_StreamFraction(suites, layer, kQNGP_StreamSpecularIntensity, now);
+    material.shininess = ORM_StreamNumber(suites, layer, kQNGP_StreamShininess, now);
+    material.metal = ORM_StreamFraction(suites, layer, kQNGP_StreamMetal, now);
+    material.lightTransmission =
         ORM_StreamFraction(suites, layer, kQNGP_StreamLightTransmission, now);
 
     ORM_Check(canvas.IsLayerUnbounded(render, layerContext, &record->unbounded));
-    record->motionBlur = flags & kQNGP_LayerFlagMotionBlur;
+    material.motionBlur = flags & kQNGP_LayerFlagMotionBlur;
     record->collapsed = flags & kQNGP_LayerFlagCollapse;
-    record->renderIndex = index;
-    record->depthIndex = index;
+    material.renderIndex = index;
+    material.depthIndex = index;
 
     bool hasMatte = false;
     ORM_Check(layers.LayerHasTrackMatte(layer, &hasMatte));

@@ -27,7 +27,7 @@ struct ORM_ShadowStreams {
 // Sets renders, wireframe, bestQuality and the shadow and light switches from the layer's
 // quality (0 wireframe, 1 draft, 2 best) and, except for a wireframe, its streams; a layer that
 // only receives shadows is drawn with the shadows-only mode.
-void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_LayerDesc* layer);
+void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_Material* material);
 
 void ORM_CaptureLayers(ORM_RenderContext& context, const ORM_CaptureFrame& frame,
                        SY_SceneDesc* scene);

@@ -1,142 +1,78 @@
-// The rules scene capture applies to what the host reports: camera matrices, light linking,
-// shadow map sizes, transfer modes and quality.
+// The rules scene capture applies to what the host reports: camera matrices, shadow map sizes
+// and transfer modes.
 #include <gtest/gtest.h>
-
-#include <tuple>
-#include <vector>
 
 #include "camera_capture.h"
 #include "layer_capture.h"
-#include "light_capture.h"
 #include "m_matrix.h"
 #include "resources/shadow_map_sizes.h"
-#include "u_memory.h"
 
 namespace {
 
-struct ScreenPoint {
-    double x, y;
-};
-
-ScreenPoint Screen(const M_Matrix4& projection, double x, double y, double z) {
-    const double eye[4] = {x, y, z, 1};
-    double out[4];
-    M_TransformVector4NoDivide(&projection, eye, out);
-    return {out[0] / out[3], out[1] / out[3]};
-}
-
-// A 100 × 50 comp seen by the default camera 200 pixels away.
-ORM_CameraView DefaultView() {
-    ORM_CameraView view{};
-    view.width = 100;
-    view.height = 50;
-    view.pixelAspect = 1;
-    view.downsampleX = view.downsampleY = 1;
-    view.defaultDistance = 200;
-    view.perspective = true;
-    return view;
-}
-
-TEST(CameraPair, DefaultCameraLooksAtTheCompCentreFromItsDistance) {
-    ORM_CameraView view = DefaultView();
-    view.pixelAspect = 2;
-    M_Matrix4 placement, projection;
-    EXPECT_EQ(ORM_CameraPair(view, nullptr, 0, &placement, &projection), 200);
-    // Eye at (aspect × width / 2, height / 2, −distance), axes as the world's.
-    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
-              std::tuple(100, 25, -200));
-    EXPECT_EQ(placement.mat[0][0], 1);
-    EXPECT_NE(projection.mat[2][3], 0);
-    // On the image plane one eye unit across is half a (wide) pixel.
-    ScreenPoint p = Screen(projection, 10, -5, 200);
-    EXPECT_DOUBLE_EQ(p.x, 55);
-    EXPECT_DOUBLE_EQ(p.y, 20);
-}
-
-TEST(CameraPair, RegionOfInterestAndDownsampleMoveAndShrinkTheScreen) {
-    struct Case {
+// A 100 × 50 comp with the default camera 200 pixels away, or a camera layer at (7, 8, −300)
+// with zoom 400: an eye point off the axis lands where similar triangles put it on screen.
+TEST(CameraPair, EyeAndScreenFollowTheViewAndTheCameraLayer) {
+    enum Camera { kDefault, kLayer, kOrthographic };
+    struct View {
+        double aspect;
         int16_t top, left, dx, dy;
-        double eyeZ;
-        ScreenPoint expected;
     };
-    // Eye point (10, −5): at depth 200 it lands 10 right and 5 above the centre (50, 25); at
-    // depth 400 half as far. The region's corner becomes the origin; downsampling divides.
+    struct Case {
+        View view;
+        Camera camera;
+        double zoom, eye[3], point[3], screen[2];
+    };
+    // The default eye sits at (aspect × width / 2, height / 2, −distance); the layer's is
+    // stretched by the aspect. At the zoom depth one eye unit is 1 / aspect pixels across; twice
+    // as deep, half as far from the centre. The region's corner becomes the origin; downsampling
+    // divides.
     const Case kCases[] = {
-        {0, 0, 1, 1, 200, {60, 20}},       {10, 20, 1, 1, 200, {40, 10}},
-        {0, 0, 2, 2, 200, {30, 10}},       {10, 20, 2, 2, 200, {20, 5}},
-        {10, 20, 2, 2, 400, {17.5, 6.25}}, {0, 0, 4, 1, 200, {15, 20}},
+        {{2, 0, 0, 1, 1}, kDefault, 200, {100, 25, -200}, {10, -5, 200}, {55, 20}},
+        {{1, 10, 20, 1, 1}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {40, 10}},
+        {{1, 0, 0, 2, 2}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {30, 10}},
+        {{1, 10, 20, 2, 2}, kDefault, 200, {50, 25, -200}, {10, -5, 400}, {17.5, 6.25}},
+        {{1, 0, 0, 4, 1}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {15, 20}},
+        {{2, 0, 0, 1, 1}, kLayer, 400, {14, 8, -300}, {20, 10, 400}, {60, 35}},
+        {{1, 0, 0, 1, 1}, kOrthographic, 0, {7, 8, -300}, {20, 10, 5000}, {70, 35}},
     };
     for (const Case& c : kCases) {
-        SCOPED_TRACE(testing::Message() << "region " << c.top << "," << c.left << " downsample "
-                                        << c.dx << "×" << c.dy << " depth " << c.eyeZ);
-        ORM_CameraView view = DefaultView();
-        view.regionTop = c.top;
-        view.regionLeft = c.left;
-        view.downsampleX = c.dx;
-        view.downsampleY = c.dy;
+        SCOPED_TRACE(testing::Message() << "camera " << c.camera << " aspect " << c.view.aspect
+                                        << " region " << c.view.top << "," << c.view.left
+                                        << " downsample " << c.view.dx << "×" << c.view.dy);
+        ORM_CameraView view{};
+        view.width = 100;
+        view.height = 50;
+        view.pixelAspect = c.view.aspect;
+        view.regionTop = c.view.top;
+        view.regionLeft = c.view.left;
+        view.downsampleX = c.view.dx;
+        view.downsampleY = c.view.dy;
+        view.defaultDistance = 200;
+        view.perspective = c.camera != kOrthographic;
+        M_Matrix4 cameraToWorld;
+        M_IdentityMatrix4(&cameraToWorld);
+        M_TranslateMatrix4(7, 8, -300, &cameraToWorld);
         M_Matrix4 placement, projection;
-        ORM_CameraPair(view, nullptr, 0, &placement, &projection);
-        ScreenPoint p = Screen(projection, 10, -5, c.eyeZ);
-        EXPECT_DOUBLE_EQ(p.x, c.expected.x);
-        EXPECT_DOUBLE_EQ(p.y, c.expected.y);
+        EXPECT_EQ(ORM_CameraPair(view, c.camera == kDefault ? nullptr : &cameraToWorld, 400,
+                                 &placement, &projection),
+                  c.zoom);
+        EXPECT_EQ(placement.mat[0][0], c.camera == kDefault ? 1 : c.view.aspect);
+        for (int i = 0; i < 3; ++i)
+            EXPECT_EQ(placement.mat[3][i], c.eye[i]) << "eye axis " << i;
+        const double eye[4] = {c.point[0], c.point[1], c.point[2], 1};
+        double out[4];
+        M_TransformVector4NoDivide(&projection, eye, out);
+        EXPECT_DOUBLE_EQ(out[0] / out[3], c.screen[0]);
+        EXPECT_DOUBLE_EQ(out[1] / out[3], c.screen[1]);
     }
 }
 
-TEST(CameraPair, CameraLayerPlacesTheEyeAndItsZoomProjects) {
-    M_Matrix4 cameraToWorld;
-    M_IdentityMatrix4(&cameraToWorld);
-    M_TranslateMatrix4(7, 8, -300, &cameraToWorld);
-    ORM_CameraView view = DefaultView();
-    view.pixelAspect = 2;
-    M_Matrix4 placement, projection;
-    EXPECT_EQ(ORM_CameraPair(view, &cameraToWorld, 400, &placement, &projection), 400);
-    // The layer's transform, then stretched by the pixel aspect.
-    EXPECT_EQ(placement.mat[0][0], 2);
-    EXPECT_EQ(std::tuple(placement.mat[3][0], placement.mat[3][1], placement.mat[3][2]),
-              std::tuple(14, 8, -300));
-    ScreenPoint p = Screen(projection, 20, 10, 400);
-    EXPECT_DOUBLE_EQ(p.x, 60);
-    EXPECT_DOUBLE_EQ(p.y, 35);
-}
-
-TEST(CameraPair, OrthographicCameraHasNoProjectionAndZoomZero) {
-    M_Matrix4 cameraToWorld;
-    M_IdentityMatrix4(&cameraToWorld);
-    ORM_CameraView view = DefaultView();
-    view.perspective = false;
-    M_Matrix4 placement, projection;
-    EXPECT_EQ(ORM_CameraPair(view, &cameraToWorld, 400, &placement, &projection), 0);
-    EXPECT_EQ(projection.mat[2][3], 0);
-    // Depth does not shrink anything.
-    ScreenPoint p = Screen(projection, 20, 10, 5000);
-    EXPECT_DOUBLE_EQ(p.x, 70);
-    EXPECT_DOUBLE_EQ(p.y, 35);
-}
-
-TEST(LightLinking, LightThatLightsBelowOnlyReachesLayersWithGreaterCompIndex) {
-    int64_t start = U_AccountedBytes();
-    {
-        SY_OwnedArray<SY_LayerDesc> layers;
-        layers.Allocate(5);
-        const int32_t compIndexes[] = {0, 2, 3, 4, 6};
-        for (int32_t i = 0; i < 5; ++i)
-            layers[i].compIndex = compIndexes[i];
-
-        ORM_LinkLight(3, true, &layers);
-        ORM_LinkLight(5, false, &layers);
-        const std::vector<std::vector<int32_t>> expected{{5}, {5}, {5}, {3, 5}, {3, 5}};
-        for (int32_t i = 0; i < 5; ++i)
-            EXPECT_EQ(layers[i].lightIds, expected[static_cast<size_t>(i)]) << "layer " << i;
-    }
-    EXPECT_EQ(U_AccountedBytes(), start);
-}
-
+// The popup's labels read their sizes; a project saved by a later version may carry a choice
+// the popup does not have, which is the comp size.
 TEST(ShadowMapSize, ChoiceReadsItsPopupLabel) {
-    const int32_t kSizes[] = {0, 250, 500, 750, 1000, 1500, 2000, 3000, 4000};
-    for (int32_t choice = 0; choice < 9; ++choice)
-        EXPECT_EQ(ORM_ShadowMapSize(choice), kSizes[choice]) << "choice " << choice;
-    EXPECT_EQ(ORM_ShadowMapSize(9), 0);
-    EXPECT_EQ(ORM_ShadowMapSize(-1), 0);
+    const int32_t kSizes[] = {0, 0, 250, 500, 750, 1000, 1500, 2000, 3000, 4000, 0};
+    for (int32_t choice = -1; choice <= 9; ++choice)
+        EXPECT_EQ(ORM_ShadowMapSize(choice), kSizes[choice + 1]) << "choice " << choice;
 }
 
 TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
@@ -160,30 +96,14 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
     }
 }
 
-TEST(LayerQuality, QualityAndShadowStreamsSetTheSwitches) {
-    // Renders, wireframe, casts shadows, accepts shadows, accepts lights, best quality, mode.
-    using Switches = std::tuple<bool, bool, bool, int, bool, bool, int>;
-    struct Case {
-        const char* name;
-        int16_t quality;
-        ORM_ShadowStreams streams;
-        Switches switches;
-    };
-    const Case kCases[] = {
-        {"wireframe ignores the streams", 0, {1, 1, 1}, {false, true, false, 0, false, false, 2}},
-        {"draft, casting and accepting", 1, {1, 1, 1}, {true, false, true, 1, true, false, 2}},
-        {"best, neither", 2, {0, 0, 0}, {true, false, false, 0, false, true, 2}},
-        {"casts shadows only", 1, {2, 0, 1}, {false, false, true, 0, true, false, 2}},
-        {"accepts shadows only", 2, {0, 2, 1}, {true, false, false, 2, false, true, 5}},
-        {"accepts shadows truncated", 1, {0, 1.7, 1}, {true, false, false, 1, true, false, 2}},
-    };
-    for (const Case& c : kCases) {
-        SY_LayerDesc l;
-        ORM_ApplyQuality(c.quality, c.streams, &l);
-        EXPECT_EQ(Switches(l.renders, l.wireframe, l.castsShadows, l.acceptsShadows,
-                           l.acceptsLights, l.bestQuality, l.mode),
-                  c.switches)
-            << c.name;
+// Only best is best quality; the accepts-shadows stream is a popup index, truncated.
+TEST(LayerQuality, DraftIsNotBestAndAcceptsShadowsTruncates) {
+    for (int16_t quality : {1, 2}) {
+        SY_Material l;
+        ORM_ApplyQuality(quality, {0, 1.7, 1}, &l);
+        EXPECT_EQ(l.bestQuality, quality == 2) << "quality " << quality;
+        EXPECT_TRUE(l.renders && l.acceptsLights && !l.castsShadows);
+        EXPECT_EQ(l.acceptsShadows, 1);
     }
 }
 

@@ -2,11 +2,14 @@
 
 #include <gtest/gtest.h>
 
+#include "entry_guard.h"
 #include "pf_world.h"
+#include "plugin_test_support.h"
 #include "track_matte_fetcher.h"
-#include "u_memory.h"
 
 namespace {
+
+using ormond_test::FakeHost;
 
 // One pixel converted in a 1×1 world of its depth; returns the new alpha.
 template <class P>
@@ -57,7 +60,7 @@ TEST(MatteConversion, EightBitLumaRoundsAlphaTimesLumaOver255ToNearest) {
     }
 }
 
-TEST(MatteConversion, LumaWeighsTheChannels) {
+TEST(MatteConversion, LumaWeighsTheChannelsAndFloatClampsToTheUnitRange) {
     // Pure red, green and blue at full alpha: luma is (weight × max + 16384) / 32768, truncated.
     EXPECT_EQ(ConvertOne(PF_Pixel8{255, 255, 0, 0}, ORM_MatteType::kLuma), 76);   // 76.2 + 0.5
     EXPECT_EQ(ConvertOne(PF_Pixel8{255, 0, 255, 0}, ORM_MatteType::kLuma), 150);  // 149.7 + 0.5
@@ -66,10 +69,7 @@ TEST(MatteConversion, LumaWeighsTheChannels) {
     // Half alpha: (16384 × 19235 + 16383) / 32768 = 9617.99…, truncated.
     EXPECT_EQ(ConvertOne(PF_Pixel16{16384, 0, 32768, 0}, ORM_MatteType::kLuma), 9617);
     EXPECT_FLOAT_EQ(ConvertOne(PF_PixelFloat{0.5f, 0, 0, 1}, ORM_MatteType::kLuma), 0.057f);
-}
-
-TEST(MatteConversion, FloatLumaClampsToTheUnitRange) {
-    // A product below 1e-16 is exactly no matte; above 1 it is full.
+    // A float product below 1e-16 is exactly no matte; above 1 it is full.
     EXPECT_EQ(ConvertOne(PF_PixelFloat{1e-9f, 1e-9f, 1e-9f, 1e-9f}, ORM_MatteType::kLuma), 0.0f);
     EXPECT_EQ(ConvertOne(PF_PixelFloat{1e-9f, 1e-9f, 1e-9f, 1e-9f}, ORM_MatteType::kInvertedLuma),
               1.0f);
@@ -81,13 +81,9 @@ TEST(MatteConversion, FloatLumaClampsToTheUnitRange) {
 TEST(MatteConversion, UnexpectedDepthIsReportedAndThrowsThree) {
     uint8_t pixels[8] = {};
     PF_World world(1, 1, 8, 64, pixels);
-    int32_t thrown = 0;
-    try {
-        ORM_ConvertMatteWorld(world, ORM_MatteType::kLuma);
-    } catch (int32_t code) {
-        thrown = code;
-    }
-    EXPECT_EQ(thrown, 3);
+    FakeHost host;
+    EXPECT_EQ(ORM_Guard([&] { ORM_ConvertMatteWorld(world, ORM_MatteType::kLuma); }), 3);
+    EXPECT_EQ(host.Reports().size(), 1u);
 }
 
 }  // namespace

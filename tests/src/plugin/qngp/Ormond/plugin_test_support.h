@@ -1,9 +1,10 @@
-// A basic suite that serves only the suites a test hands it, a Memory suite of plain byte
-// blocks, and a log of what the host was told. Enough to drive single entry points; whole
-// frames run through the stand-in host.
+// A host for driving single entry points: a basic suite serving the suites a test hands it and
+// a Memory suite of plain byte blocks, and a log of what the user was told. Whole frames run
+// through the stand-in host.
 #pragma once
 
 #include <cstdint>
+#include <cstdio>
 #include <map>
 #include <memory>
 #include <string>
@@ -15,79 +16,36 @@
 
 namespace ormond_test {
 
-// Serves suites by name and version while it lives; one at a time.
-class SuiteServer {
-public:
-    SuiteServer() { current() = this; }
-    ~SuiteServer() { current() = nullptr; }
-    SuiteServer(const SuiteServer&) = delete;
-    SuiteServer& operator=(const SuiteServer&) = delete;
-
-    void Serve(const char* name, int32_t version, const void* suite) {
-        suites_[{name, version}] = suite;
-    }
-    // The error the host answers an acquisition of a suite it does not serve with; 0 makes it
-    // answer success with a null suite.
-    void SetMissingError(int32_t error) { missingError_ = error; }
-
-    const QNGP_BasicSuite* Basic() const { return &kBasic; }
-    // Suites acquired and not yet released.
-    int32_t Held() const { return held_; }
-    const std::vector<std::pair<std::string, int32_t>>& Acquired() const { return acquired_; }
-    const std::vector<std::pair<std::string, int32_t>>& Released() const { return released_; }
-
-private:
-    static SuiteServer*& current() {
-        static SuiteServer* server = nullptr;
-        return server;
-    }
-    static int32_t Acquire(const char* name, int32_t version, const void** suite) {
-        SuiteServer& self = *current();
-        auto found = self.suites_.find({name, version});
-        if (found == self.suites_.end()) {
-            *suite = nullptr;
-            return self.missingError_;
-        }
-        *suite = found->second;
-        ++self.held_;
-        self.acquired_.emplace_back(name, version);
-        return 0;
-    }
-    static int32_t Release(const char* name, int32_t version) {
-        SuiteServer& self = *current();
-        --self.held_;
-        self.released_.emplace_back(name, version);
-        return 0;
-    }
-
-    static constexpr QNGP_BasicSuite kBasic{&Acquire, &Release};
-    std::map<std::pair<std::string, int32_t>, const void*> suites_;
-    int32_t missingError_ = kQNGP_ErrMissingSuite;
-    int32_t held_ = 0;
-    std::vector<std::pair<std::string, int32_t>> acquired_;
-    std::vector<std::pair<std::string, int32_t>> released_;
-};
-
-// "QNGP Memory Suite" 1 over byte blocks; counts locks so that a test sees every lock undone.
-class MemoryHost {
+// One lives at a time; the suites it serves reach it through current().
+class FakeHost {
 public:
     struct Block {
-        std::string name;
-        int32_t pluginId;
-        int32_t flags;
         std::vector<uint8_t> bytes;
         int32_t locks = 0;
     };
 
-    MemoryHost() { current() = this; }
-    ~MemoryHost() { current() = nullptr; }
-    MemoryHost(const MemoryHost&) = delete;
-    MemoryHost& operator=(const MemoryHost&) = delete;
+    FakeHost() : previousReporter_(U_SetReporter(&Collect)) {
+        current() = this;
+        Serve(kQNGP_MemorySuite, 1, &kMemory);
+    }
+    ~FakeHost() {
+        U_SetReporter(previousReporter_);
+        current() = nullptr;
+    }
+    FakeHost(const FakeHost&) = delete;
+    FakeHost& operator=(const FakeHost&) = delete;
 
-    static const QNGP_MemorySuite1* Suite() { return &kSuite; }
+    void Serve(const char* name, int32_t version, const void* suite) {
+        suites_[{name, version}] = suite;
+    }
+    // The answer to a suite it does not serve; 0 answers success with a null suite.
+    void SetMissingError(int32_t error) { missingError_ = error; }
+    const QNGP_BasicSuite* Basic() const { return &kBasic; }
+    // Suites acquired and not yet released; a release of a suite it does not serve is ignored.
+    int32_t Held() const { return held_; }
 
     QNGP_MemHandle Make(std::vector<uint8_t> bytes) {
-        auto block = std::make_unique<Block>(Block{"test", 0, 0, std::move(bytes)});
+        auto block = std::make_unique<Block>(Block{std::move(bytes)});
         auto handle = reinterpret_cast<QNGP_MemHandle>(block.get());
         blocks_[handle] = std::move(block);
         return handle;
@@ -97,29 +55,37 @@ public:
     // The next NewHandle answers with this error.
     void FailNextNew(int32_t error) { failNew_ = error; }
 
+    // Each report as "text (code, severity)".
+    const std::vector<std::string>& Reports() const { return reports_; }
+
 private:
-    static MemoryHost*& current() {
-        static MemoryHost* host = nullptr;
+    static FakeHost*& current() {
+        static FakeHost* host = nullptr;
         return host;
     }
-    static int32_t NewHandle(int32_t pluginId, const char* name, uint32_t size, int32_t flags,
-                             QNGP_MemHandle* handle) {
-        MemoryHost& self = *current();
-        if (int32_t error = std::exchange(self.failNew_, 0)) return error;
-        *handle = self.Make(std::vector<uint8_t>(size, 0xEE));
-        Block& block = Of(*handle);
-        block.name = name;
-        block.pluginId = pluginId;
-        block.flags = flags;
+    static int32_t Acquire(const char* name, int32_t version, const void** suite) {
+        FakeHost& self = *current();
+        auto found = self.suites_.find({name, version});
+        *suite = found == self.suites_.end() ? nullptr : found->second;
+        if (!*suite) return self.missingError_;
+        ++self.held_;
+        return 0;
+    }
+    static int32_t Release(const char* name, int32_t version) {
+        current()->held_ -= current()->suites_.count({name, version}) ? 1 : 0;
+        return 0;
+    }
+    static int32_t NewHandle(int32_t, const char*, uint32_t size, int32_t, QNGP_MemHandle* handle) {
+        if (int32_t error = std::exchange(current()->failNew_, 0)) return error;
+        *handle = current()->Make(std::vector<uint8_t>(size, 0xEE));
         return 0;
     }
     static int32_t FreeHandle(QNGP_MemHandle handle) {
         return current()->blocks_.erase(handle) ? 0 : 1;
     }
     static int32_t LockHandle(QNGP_MemHandle handle, void** pointer) {
-        Block& block = Of(handle);
-        ++block.locks;
-        *pointer = block.bytes.data();
+        ++Of(handle).locks;
+        *pointer = Of(handle).bytes.data();
         return 0;
     }
     static int32_t UnlockHandle(QNGP_MemHandle handle) {
@@ -130,38 +96,23 @@ private:
         *size = static_cast<uint32_t>(Of(handle).bytes.size());
         return 0;
     }
+    static void Collect(const U_Report& report) {
+        char tail[32];
+        std::snprintf(tail, sizeof tail, " (%#x, %d)", static_cast<unsigned>(report.code),
+                      report.severity);
+        current()->reports_.push_back(std::string(report.text) + tail);
+    }
 
-    static constexpr QNGP_MemorySuite1 kSuite{&NewHandle, &FreeHandle, &LockHandle, &UnlockHandle,
-                                              &GetHandleSize};
+    static constexpr QNGP_BasicSuite kBasic{&Acquire, &Release};
+    static constexpr QNGP_MemorySuite1 kMemory{&NewHandle, &FreeHandle, &LockHandle, &UnlockHandle,
+                                               &GetHandleSize};
+    U_Reporter previousReporter_;
+    std::map<std::pair<std::string, int32_t>, const void*> suites_;
+    int32_t missingError_ = kQNGP_ErrMissingSuite;
+    int32_t held_ = 0;
     std::map<QNGP_MemHandle, std::unique_ptr<Block>> blocks_;
     int32_t failNew_ = 0;
-};
-
-// Everything reported to the user while it lives.
-class ReportLog {
-public:
-    struct Entry {
-        U_Report::Kind kind;
-        int32_t code;
-        int32_t severity;
-        std::string text;
-    };
-
-    ReportLog() : previous_(U_SetReporter(&Collect)) { entries().clear(); }
-    ~ReportLog() { U_SetReporter(previous_); }
-    ReportLog(const ReportLog&) = delete;
-    ReportLog& operator=(const ReportLog&) = delete;
-
-    static std::vector<Entry>& entries() {
-        static std::vector<Entry> log;
-        return log;
-    }
-
-private:
-    static void Collect(const U_Report& report) {
-        entries().push_back({report.kind, report.code, report.severity, report.text});
-    }
-    U_Reporter previous_;
+    std::vector<std::string> reports_;
 };
 
 }  // namespace ormond_test
