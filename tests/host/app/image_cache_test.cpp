@@ -29,34 +29,6 @@ protected:
     ImageCache cache_;
 };
 
-TEST_F(ImageCacheTest, EightBitFileAtEveryDepthKeepsStraightColor) {
-    // A half-transparent orange pixel keeps its colour exactly: the file stores it straight.
-    auto file = folder_.WriteImage<uint8_t>("straight.png", 2, 1, 4,
-                                            {200, 100, 0, 128, 255, 255, 255, 255});
-    struct Case {
-        int16_t depth;
-        Channels orange, white;
-    };
-    // 16 bits follow the host's exact 8-to-16 conversion, 255 becoming 32768.
-    const Case kCases[] = {
-        {8, {128, 200, 100, 0}, {255, 255, 255, 255}},
-        {16, {PF_8To16(128), PF_8To16(200), PF_8To16(100), 0}, {32768, 32768, 32768, 32768}},
-        {32, {128 / 255.0f, 200 / 255.0f, 100 / 255.0f, 0}, {1, 1, 1, 1}},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(c.depth);
-        auto world = LayerSource(cache_, ImageLayer(file, 2, 1), c.depth, 1, 1);
-        ASSERT_EQ(world->GetBitDepth(), c.depth);
-        ASSERT_EQ(world->width, 2);
-        for (int i = 0; i < 4; ++i) {  // float within rounding, whole numbers exactly
-            EXPECT_NEAR(ChannelsAt(*world, 0, 0)[i], c.orange[i], 1e-6) << "channel " << i;
-            EXPECT_NEAR(ChannelsAt(*world, 1, 0)[i], c.white[i], 1e-6) << "channel " << i;
-        }
-    }
-    // One decode served all three depths.
-    EXPECT_EQ(cache_.Count(), 1u);
-}
-
 TEST_F(ImageCacheTest, SixteenBitFileScalesToTheHostMaximum) {
     // 65535 → 32768; 32768 → 32768 × 32768 / 65535 = 16384.25, rounded to 16384. No alpha
     // channel means opaque.
@@ -76,8 +48,8 @@ TEST_F(ImageCacheTest, PremultipliedFloatFileBecomesStraight) {
 
 TEST_F(ImageCacheTest, GreyFileFillsAllThreeColors) {
     auto file = folder_.WriteImage<uint8_t>("grey.png", 1, 1, 1, {77});
-    auto world = LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1);
-    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{255, 77, 77, 77}));
+    EXPECT_EQ(ChannelsAt(*LayerSource(cache_, ImageLayer(file, 1, 1), 8, 1, 1), 0, 0),
+              (Channels{255, 77, 77, 77}));
 }
 
 TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
@@ -92,25 +64,6 @@ TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
     ASSERT_EQ(world->height, 1);
     EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{128, 128, 0, 128}));
     EXPECT_EQ(ChannelsAt(*world, 1, 0), (Channels{255, 0, 255, 0}));
-}
-
-TEST_F(ImageCacheTest, SolidFillsItsSizeAtTheDownsample) {
-    Layer layer;
-    layer.kind = LayerKind::kSolid;
-    layer.source = {{}, {1.0, 0.5, 0.0}, 3, 2};
-    auto world = LayerSource(cache_, layer, 16, 2, 1);
-    ASSERT_EQ(world->width, 2);
-    ASSERT_EQ(world->height, 2);
-    EXPECT_EQ(PixelsOtherThan(*world, {32768, 32768, 16384, 0}), 0);
-    EXPECT_EQ(cache_.Count(), 0u);
-}
-
-TEST_F(ImageCacheTest, DecodedOnceAcrossFrames) {
-    auto file = folder_.WriteImage<uint8_t>("once.png", 1, 1, 4, {1, 2, 3, 4});
-    auto first = cache_.Get(file);
-    auto second = cache_.Get(file);
-    EXPECT_EQ(first.get(), second.get());
-    EXPECT_EQ(cache_.Count(), 1u);
 }
 
 TEST_F(ImageCacheTest, WorldsReturnTheirMemoryAlsoWhenAllocationFails) {

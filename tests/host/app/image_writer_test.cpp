@@ -32,36 +32,18 @@ std::vector<float> ReadBack(const fs::path& path, OIIO::TypeDesc* stored) {
     return pixels;
 }
 
-TEST(ImageWriter, KeepsDepthAndValues) {
+// TIFF and PNG keep straight colour value for value (the reference images read them back);
+// OpenEXR holds premultiplied colour.
+TEST(ImageWriter, FloatToOpenEXRIsPremultiplied) {
     TempFolder folder;
-    PF_WorldX<PF_Pixel8> eight(2, 1);
-    eight.At(0, 0) = {255, 10, 20, 30};
-    eight.At(1, 0) = {128, 255, 0, 1};
-    PF_WorldX<PF_Pixel16> sixteen(1, 1);
-    sixteen.At(0, 0) = {32768, 16384, 0, 32768};
     PF_WorldX<PF_PixelFloat> floating(1, 1);
     floating.At(0, 0) = {0.5f, 0.25f, 2.0f, 0.0f};
-
-    OIIO::TypeDesc stored;
-    WriteWorld(eight, folder.Path() / "eight.png");
-    auto p8 = ReadBack(folder.Path() / "eight.png", &stored);
-    EXPECT_EQ(stored, OIIO::TypeDesc::UINT8);
-    EXPECT_FLOAT_EQ(p8[0] * 255, 10);
-    EXPECT_FLOAT_EQ(p8[7] * 255, 128);  // straight alpha: colour is not scaled by it
-    EXPECT_FLOAT_EQ(p8[4] * 255, 255);
-
-    WriteWorld(sixteen, folder.Path() / "sixteen.png");
-    auto p16 = ReadBack(folder.Path() / "sixteen.png", &stored);
-    EXPECT_EQ(stored, OIIO::TypeDesc::UINT16);
-    EXPECT_FLOAT_EQ(p16[0] * 65535, 32768);  // 16384 of 32768 is half: 32767.5 rounds up
-    EXPECT_FLOAT_EQ(p16[3], 1);
-
     WriteWorld(floating, folder.Path() / "float.exr");
+    OIIO::TypeDesc stored;
     auto pf = ReadBack(folder.Path() / "float.exr", &stored);
-    EXPECT_FLOAT_EQ(pf[0], 0.125f);  // OpenEXR holds premultiplied colour
-    EXPECT_FLOAT_EQ(pf[1], 1.0f);
-    EXPECT_FLOAT_EQ(pf[3], 0.5f);
-    EXPECT_EQ(FileCount(folder), 3u);
+    EXPECT_EQ(stored, OIIO::TypeDesc::FLOAT);
+    EXPECT_EQ(std::vector<float>(pf.begin(), pf.begin() + 4),
+              (std::vector<float>{0.125f, 1.0f, 0.0f, 0.5f}));
 }
 
 TEST(ImageWriter, AFailedWriteLeavesNoFile) {

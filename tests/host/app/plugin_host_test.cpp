@@ -66,10 +66,16 @@ TEST(PluginHost, RefusesWhatItCannotLoad) {
         std::vector<uint8_t> list;
         const char* problem;
     };
-    PropertyListBuilder filter;
+    PropertyListBuilder filter, noKind, noEntry;
     filter.Code("kind", "QNfl").Entry("TestArtisanMain");
+    noKind.Entry("TestArtisanMain");
+    noEntry.Code("kind", "QNgx");
+    auto whole = PropertyListBuilder::General("TestArtisanMain").Bytes();
     const Case cases[] = {
         {"wrong kind", filter.Bytes(), "not a general plug-in"},
+        {"no kind", noKind.Bytes(), "has no kind"},
+        {"no entry point", noEntry.Bytes(), "names no x86-64 entry point"},
+        {"truncated", std::vector<uint8_t>(whole.begin(), whole.begin() + 30), "it ends inside"},
         {"missing entry point", PropertyListBuilder::General("NoSuchMain").Bytes(),
          "\"NoSuchMain\" that its property list names is not exported"},
     };
@@ -80,7 +86,9 @@ TEST(PluginHost, RefusesWhatItCannotLoad) {
             host.Load(plugins.library());
             ADD_FAILURE() << c.name << " loaded";
         } catch (const ostrel::HostError& e) {
-            EXPECT_NE(std::string(e.what()).find(c.problem), std::string::npos) << e.what();
+            std::string message = e.what();
+            EXPECT_NE(message.find(c.problem), std::string::npos) << message;
+            EXPECT_NE(message.find("libtest_artisan"), std::string::npos) << message;
         }
         EXPECT_TRUE(host.Artisans().empty());
     }

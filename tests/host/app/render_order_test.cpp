@@ -33,24 +33,5 @@ TEST(RenderOrder, ActiveThreeDLayersWithPixelsFromTopToBottom) {
     EXPECT_EQ(comp.layers[7].matteLayer, 6);
 }
 
-TEST(RenderOrder, SourceBoundsAreTheLayerPixels) {
-    Composition comp = Parse(R"(
-        {"kind": "solid", "source": {"color": [1, 1, 1], "width": 40, "height": 30}},
-        {"kind": "solid", "source": {"color": [1, 1, 1]}},
-        {"kind": "null"})");
-    struct Case {
-        size_t layer;
-        M_LRect expected;
-    };
-    const Case cases[] = {{0, {0, 0, 40, 30}}, {1, {0, 0, 100, 100}}, {2, {0, 0, 0, 0}}};
-    for (const Case& c : cases) {
-        M_LRect bounds = SourceBounds(comp.layers[c.layer]);
-        EXPECT_EQ(bounds.left, c.expected.left);
-        EXPECT_EQ(bounds.top, c.expected.top);
-        EXPECT_EQ(bounds.right, c.expected.right);
-        EXPECT_EQ(bounds.bottom, c.expected.bottom);
-    }
-}
-
 }  // namespace
 }  // namespace ostrel

@@ -5,42 +5,8 @@
 #include <set>
 
 #include "suites/iterate_suite.h"
-#include "suites/memory_suite.h"
-#include "suites/persistent_data_suite.h"
 
 namespace {
-
-TEST(MemorySuite, HandlesLockAndFree) {
-    const QNGP_MemorySuite1* memory = ostrel::MemorySuite();
-    QNGP_MemHandle handle = nullptr;
-    ASSERT_EQ(memory->NewHandle(1, "Tessary 3D options data", 16, 1, &handle), 0);
-    void* bytes = nullptr;
-    ASSERT_EQ(memory->LockHandle(handle, &bytes), 0);
-    EXPECT_EQ(ostrel::LockedMemoryHandles(), 1);
-    static_cast<int32_t*>(bytes)[3] = 7;
-    EXPECT_EQ(memory->UnlockHandle(handle), 0);
-    EXPECT_EQ(memory->UnlockHandle(handle), kQNGP_ErrBadHandle);
-    uint32_t size = 0;
-    EXPECT_EQ(memory->GetHandleSize(handle, &size), 0);
-    EXPECT_EQ(size, 16u);
-    EXPECT_EQ(memory->FreeHandle(handle), 0);
-    EXPECT_EQ(ostrel::LiveMemoryHandles(), 0);
-    EXPECT_EQ(ostrel::LockedMemoryHandles(), 0);
-}
-
-TEST(PersistentDataSuite, SettingsWithDefaults) {
-    const QNGP_PersistentDataSuite3* data = ostrel::PersistentDataSuite();
-    QNGP_PersistentBlobH blob = nullptr;
-    ASSERT_EQ(data->GetApplicationBlob(&blob), 0);
-    int32_t value = -1;
-    ostrel::ClearApplicationSettings();
-    EXPECT_EQ(data->GetLong(blob, "Tessary 3D", "Enable Multiprocessing", 1, &value), 0);
-    EXPECT_EQ(value, 1);
-    ostrel::SetApplicationSetting("Tessary 3D", "Enable Multiprocessing", 0);
-    EXPECT_EQ(data->GetLong(blob, "Tessary 3D", "Enable Multiprocessing", 1, &value), 0);
-    EXPECT_EQ(value, 0);
-    ostrel::ClearApplicationSettings();
-}
 
 struct Seen {
     std::mutex mutex;

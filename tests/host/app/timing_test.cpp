@@ -29,9 +29,6 @@ TEST(Timing, ShutterIntervals) {
         T_Time duration;
     };
     const Case cases[] = {
-        // 180° opening 90° early at 24 fps: frame 10 is at 10/24 s; the shutter opens 1/96 s
-        // before it, at 39/96 s, and stays open 1/48 s.
-        {"24", R"({"enabled": true})", 10, {39, 96}, {1, 48}},
         // 360° with no phase at 30000/1001: open from the frame's time for a whole frame.
         {"[30000, 1001]",
          R"({"enabled": true, "shutterAngle": 360, "shutterPhase": 0})",

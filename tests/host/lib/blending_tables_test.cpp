@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <string>
+#include <tuple>
 
 #include "pf_xfer.h"
 
@@ -35,10 +36,9 @@ TEST(LinearBlendingTables, MembersSitWhereReadersLookForThem) {
 TEST(LinearBlendingTables, EveryCodeSurvivesTheRoundTrip) {
     for (const Curve& c : kCurves) {
         PF_LinearBlendingTables t = Build(c);
-        EXPECT_EQ(t.forward[0], 0) << c.name;
-        EXPECT_EQ(t.forward[255], 32768) << c.name;
-        EXPECT_EQ(t.inverse[0], 0) << c.name;
-        EXPECT_EQ(t.inverse[4096], 32768) << c.name;
+        EXPECT_EQ(std::tuple(t.forward[0], t.forward[255], t.inverse[0], t.inverse[4096]),
+                  std::tuple(0, 32768, 0, 32768))
+            << c.name;
         for (uint32_t code = 0; code < 256; ++code) {
             EXPECT_EQ(PF_LinearTo8(t, PF_LinearFrom8(t, code)), code) << c.name;
             if (code) {
@@ -68,9 +68,6 @@ TEST(LinearBlendingTables, FollowTheirCurves) {
         PF_LinearBlendingTables t = Build(c.curve);
         EXPECT_NEAR(t.forward[c.code] / 32768.0, c.linear, 1.0 / 32768) << c.curve.name;
     }
-    PF_LinearBlendingTables t = Build({"gamma 2.2", 2.2f});
-    EXPECT_FLOAT_EQ(t.toLinearExponent, 2.2f);
-    EXPECT_FLOAT_EQ(t.fromLinearExponent, 1.0f / 2.2f);
 }
 
 // 16-bit codes read the forward table between its entries in steps of 1/32768 of a code.
@@ -106,13 +103,6 @@ TEST(LinearBlendingTables, BlendsHappenInLinearLight) {
     PF_PixelFloat blackF = {0.5f, 0, 0, 0}, whiteF = {1, 1, 1, 1};
     PF_Get_Xfer1_tableF(kPF_XferNormal)(&blackF, &t, &whiteF);
     EXPECT_NEAR(whiteF.red, std::pow(0.5, 1 / 2.2), 1e-5);
-
-    // An opaque source still hides the backdrop exactly.
-    PF_Pixel8 src = {255, 17, 130, 250}, dst = {255, 3, 4, 5};
-    PF_Get_Xfer1_table8(kPF_XferNormal)(&src, &t, &dst);
-    EXPECT_EQ(dst.red, 17);
-    EXPECT_EQ(dst.green, 130);
-    EXPECT_EQ(dst.blue, 250);
 }
 
 }  // namespace

@@ -73,15 +73,4 @@ TYPED_TEST(DrawLine, OutsideTheWorldIsSkipped) {
     EXPECT_NEAR(AlphaSum(world), 6.0, 1e-6);
 }
 
-// A translucent colour blends over what is there.
-TEST(DrawLineBlend, TranslucentColorBlendsNormally) {
-    PF_WorldX<PF_Pixel8> world(4, 3);
-    for (int32_t x = 0; x < 4; ++x)
-        world.At(x, 1) = {255, 0, 0, 255};
-    PF_DrawLine(world, 0.5, 1.5, 3.5, 1.5, {0.5f, 1, 0, 0});
-    EXPECT_EQ(world.At(2, 1).alpha, 255);
-    EXPECT_NEAR(world.At(2, 1).red, 128, 1);
-    EXPECT_NEAR(world.At(2, 1).blue, 127, 1);
-}
-
 }  // namespace

@@ -1,9 +1,14 @@
-// Helpers shared by the pixel library's tests: worlds filled from a seed, and channel values
-// in unit range so that one expectation serves all three depths.
+// Helpers shared by the pixel library's tests: worlds filled from a seed, channel values in unit
+// range so that one expectation serves all three depths, and a brute-force box average.
 #pragma once
 
+#include <algorithm>
+#include <array>
 #include <cstdint>
 #include <random>
+#include <string>
+
+#include <gtest/gtest.h>
 
 #include "pf_pixel.h"
 #include "pf_world.h"
@@ -39,6 +44,39 @@ void FillRandom(PF_WorldX<P>& world, uint32_t seed, bool someTransparent = true)
             world.At(x, y) = FromUnit<P>(a, unit(random), unit(random), unit(random));
         }
     }
+}
+
+// The exact average over the box [x0, x1] × [y0, y1], pixel (i, j) covering [i, i + 1) ×
+// [j, j + 1) and weighted by the share of it inside; alpha over the box's area, straight colour
+// from premultiplied sums. Clear when nothing is covered.
+template <class P>
+std::array<double, 4> BoxAverage(const PF_WorldX<P>& world, double x0, double y0, double x1,
+                                 double y1) {
+    double sum[4] = {0, 0, 0, 0};
+    for (int32_t j = 0; j < world.height; ++j) {
+        double wy = std::max(0.0, std::min(y1, j + 1.0) - std::max(y0, double(j)));
+        for (int32_t i = 0; i < world.width; ++i) {
+            double wx = std::max(0.0, std::min(x1, i + 1.0) - std::max(x0, double(i)));
+            const P& p = world.At(i, j);
+            double a = Unit<P>(p.alpha) * wx * wy;
+            sum[0] += a;
+            sum[1] += a * Unit<P>(p.red);
+            sum[2] += a * Unit<P>(p.green);
+            sum[3] += a * Unit<P>(p.blue);
+        }
+    }
+    if (sum[0] <= 0) return {0, 0, 0, 0};
+    return {sum[0] / ((x1 - x0) * (y1 - y0)), sum[1] / sum[0], sum[2] / sum[0], sum[3] / sum[0]};
+}
+
+// Alpha, red, green and blue each within the tolerance, in unit range.
+template <class P>
+void ExpectChannels(const P& got, const std::array<double, 4>& want, double tolerance,
+                    const std::string& what) {
+    const double channels[] = {Unit<P>(got.alpha), Unit<P>(got.red), Unit<P>(got.green),
+                               Unit<P>(got.blue)};
+    for (int c = 0; c < 4; ++c)
+        EXPECT_NEAR(channels[c], want[c], tolerance) << what << ", channel " << c;
 }
 
 }  // namespace pixel_test

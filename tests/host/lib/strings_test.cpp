@@ -4,7 +4,6 @@
 #include <string>
 #include <vector>
 
-#include "u_cpu.h"
 #include "u_report.h"
 #include "u_strings.h"
 
@@ -75,11 +74,6 @@ TEST(Reporting, ExceptionsBecomeCodesAndReports) {
     ASSERT_EQ(gTexts.size(), 3u);
     EXPECT_NE(gTexts[1].find("bad thing"), std::string::npos);
     EXPECT_EQ(gCodes[2], 0x13A80002);
-}
-
-TEST(Processor, RecordAndByteSwap) {
-    EXPECT_GE(U_G_CPU_DataP()->processorCount, 1);
-    EXPECT_EQ(U_LongSwap(0x11223344u), 0x44332211u);
 }
 
 }  // namespace
