@@ -271,13 +271,18 @@ struct QNGP_LayerTransferMode {
     int32_t trackMatte;
 };
 
+// The values of a layer's casts-shadows and accepts-shadows streams.
+inline constexpr int32_t kQNGP_ShadowsOff = 0;
+inline constexpr int32_t kQNGP_ShadowsOn = 1;
+inline constexpr int32_t kQNGP_ShadowsOnly = 2;  // casting: the layer itself is not drawn
+
 // The host engine's view of a layer: whether it is an audio/visual layer, and that layer's
 // answers to the two queries the renderer makes (it ignores the keep-alpha flag; its texture
 // sampling filter, one of kQNGP_Sampling…).
 struct QNGP_EngineLayer {
     bool isAVLayer;
     bool ignoresPreserveAlpha;
-    uint8_t samplingQuality;
+    uint8_t samplingFilter;
 };
 
 // A comp's layers and each layer's switches, transfer mode and placement.
@@ -327,13 +332,13 @@ enum QNGP_Stream : int32_t {
     kQNGP_StreamShadowDarkness = 20,   // percent
     kQNGP_StreamShadowDiffusion = 21,  // pixels
     // Material, on image and solid layers.
-    kQNGP_StreamAcceptsShadows = 22,  // 0 off, 1 on, 2 only
+    kQNGP_StreamAcceptsShadows = 22,  // a kQNGP_Shadows… value
     kQNGP_StreamAcceptsLights = 23,   // 0 or 1
     kQNGP_StreamAmbient = 24,         // percent, like the two after it
     kQNGP_StreamDiffuse = 25,
     kQNGP_StreamSpecularIntensity = 26,
     kQNGP_StreamShininess = 27,          // percent
-    kQNGP_StreamCastsShadows = 28,       // layers: 0 off, 1 on, 2 only; lights: 0 or 1
+    kQNGP_StreamCastsShadows = 28,       // layers: a kQNGP_Shadows… value; lights: 0 or 1
     kQNGP_StreamLightTransmission = 29,  // percent
     kQNGP_StreamMetal = 30,              // percent
     // Camera iris and highlights.

@@ -48,7 +48,7 @@ public:
 
     uint16_t layerId = 0;  // passed to every shadow lookup
     // The layer's material. A shader made by hand starts with no light terms and takes no
-    // light until they are set; SY_MakeLayerShader copies the layer's. With acceptsShadows 2
+    // light until they are set; SY_MakeLayerShader copies the layer's. With acceptsShadows "only"
     // the texel's colour is replaced by white, so only shadows show; acceptsLights false takes
     // the shadow-only path.
     SY_Material material{

@@ -170,7 +170,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     setup.coverage0 = LayerCoverage<P>(shader.material.opacity);
     setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
     setup.filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
-    setup.colorOnly = shader.material.acceptsShadows == 2;
+    setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
     setup.pairLighting = pairLighting;

@@ -55,6 +55,13 @@ struct SY_LightDesc {
 
 // How a best-quality layer's texture is sampled. The values are the host engine's, which the
 // layer record keeps as it reports them.
+// Whether a layer is darkened by shadows; "only" draws nothing but the shadows on it.
+enum SY_AcceptsShadows : uint8_t {
+    kSY_AcceptsShadowsOff = 0,
+    kSY_AcceptsShadowsOn = 1,
+    kSY_AcceptsShadowsOnly = 2,
+};
+
 enum class SY_SamplingFilter : uint8_t {
     kNearest = 0,
     kBilinear = 1,
@@ -78,7 +85,7 @@ struct SY_Material {
     bool renders = true;
     bool wireframe = false;
     bool castsShadows = false;
-    uint8_t acceptsShadows = 0;  // 0 off, 1 on, 2 only
+    uint8_t acceptsShadows = kSY_AcceptsShadowsOff;
     bool acceptsLights = true;
     bool bestQuality = false;                                    // false: draft
     SY_SamplingFilter engineFlag = SY_SamplingFilter::kNearest;  // used at best quality only

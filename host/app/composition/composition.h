@@ -39,7 +39,12 @@ enum class TrackMatte : int32_t {
 };
 
 // Shadow casting and accepting; the values are the host's stream values (2: only shadows).
-enum class ShadowMode : int32_t { kOff = 0, kOn = 1, kOnly = 2 };
+// The values are the host's shadow switch values.
+enum class ShadowMode : int32_t {
+    kOff = kQNGP_ShadowsOff,
+    kOn = kQNGP_ShadowsOn,
+    kOnly = kQNGP_ShadowsOnly,
+};
 
 // The values are the host's light types.
 enum class LightType : int32_t {

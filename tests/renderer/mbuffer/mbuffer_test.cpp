@@ -1,58 +1,165 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <limits>
+#include <type_traits>
 #include <vector>
 
 #include "mbuffer_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/mbuffer/shadow_fragments.h"
+#include "renderer/scene/row_work.h"
 
 namespace {
 
 using ostrel_test::AccountedBytesCheck;
-using ostrel_test::PixelIs;
+using ostrel_test::Channels;
 using ostrel_test::PixelOf;
-using ostrel_test::RecordingProgress;
 
-TEST(MBuffer, QualityFollowsTheFlags) {
+constexpr M_LRect kRow{0, 0, 16, 1};
+
+template <class P>
+class FragmentArrayByDepth : public ::testing::Test {};
+TYPED_TEST_SUITE(FragmentArrayByDepth, ostrel_test::PixelTypes);
+
+// A source of zero alpha is dropped whatever the coverage; otherwise coverage goes to the
+// stored alpha only (colour stays straight), and only a normal-mode record at full alpha is
+// opaque.
+TYPED_TEST(FragmentArrayByDepth, CoverageFoldsIntoAlphaAndDecidesOpacity) {
+    using P = TypeParam;
+    using C = SY_Coverage<P>;
+    const C full = PF_PixelTraits<P>::kMax, half = full / 2;
+    const C justBelow = std::is_floating_point_v<C> ? C(0.9999999f) : C(full - 1);
     struct Case {
-        bool antialias, motionBlur;
-        SY_MBufferQuality quality;
+        float alpha;
+        C coverage;
+        int32_t mode;
+        bool stored, opaque;
     };
-    using Q = SY_MBufferQuality;
     const Case cases[] = {
-        {false, false, Q::kDraft},
-        {true, false, Q::kAntialiased},
-        {false, true, Q::kMotionBlur},
-        {true, true, Q::kMotionBlur},
+        {0, half, 2, false, false}, {0, full, 2, false, false},     {1, 0, 2, true, false},
+        {1, full, 2, true, true},   {1, justBelow, 2, true, false}, {1, full, 130, true, false},
+        {1, full, 5, true, false},
     };
-    for (const Case& c : cases)
-        EXPECT_EQ(SY_MBufferQualityFor(c.antialias, c.motionBlur), c.quality)
-            << c.antialias << c.motionBlur;
+    SY_FragmentArray<SY_FragmentDraftX<P>> array(kRow);
+    for (int32_t x = 0; x < 7; ++x) {
+        const Case& c = cases[x];
+        const P p = PixelOf<P>(c.alpha, 1, 0.5f, 0.25f);
+        array.AddFragment(&p, c.coverage, c.mode, 1.0f, array.HeadAt(x, 0), 0);
+        const auto* record = *array.HeadAt(x, 0);
+        ASSERT_EQ(record != nullptr, c.stored) << x;
+        if (!record) continue;
+        EXPECT_EQ(record->color.alpha, c.coverage) << x;  // full alpha times the coverage
+        EXPECT_EQ(record->color.red, p.red) << x;
+        EXPECT_EQ(record->mode, c.mode) << x;
+        EXPECT_EQ(record->opaque, c.opaque) << x;
+    }
 }
 
-// Best-quality requests get a buffer whose class answers for itself, so the spans add to it
-// with the AddFragment its answers choose; a draft request gets the draft buffer of its depth.
-TEST(MBuffer, EveryRequestGetsABufferThatDescribesItself) {
+// t / 255 rounded for 8 bits: 255·254 = 64770 → 254; 128·128 = 16384 → 64.25 → 64;
+// 1·127 → 0.498 → 0; 1·128 → 0.502 → 1. (a·c + 16383) >> 15 for 16 bits: 1·16384 → 0;
+// 1·16385 → 1; 16384·16384 → 8192.
+TEST(FragmentArray, AlphaTimesCoverageRoundsToNearest) {
+    const int32_t eight[][3] = {{255, 254, 254}, {128, 128, 64}, {1, 127, 0}, {1, 128, 1}};
+    for (const auto& [a, c, stored] : eight)
+        EXPECT_EQ(SY_ChannelMath<PF_Pixel8>::ScaleByCoverage(a, c), stored) << a << " × " << c;
+    const int32_t sixteen[][3] = {{1, 16384, 0}, {1, 16385, 1}, {16384, 16384, 8192}};
+    for (const auto& [a, c, stored] : sixteen)
+        EXPECT_EQ(SY_ChannelMath<PF_Pixel16>::ScaleByCoverage(a, c), stored) << a << " × " << c;
+    // A float alpha that is not a number is not zero: it is stored.
+    SY_FragmentArray<SY_FragmentDraftX<PF_PixelFloat>> array(kRow);
+    const PF_PixelFloat nan{std::numeric_limits<float>::quiet_NaN(), 0, 0, 0};
+    array.AddFragment(&nan, 1.0f, 2, 0.0f, array.HeadAt(0, 0), 0);
+    EXPECT_NE(*array.HeadAt(0, 0), nullptr);
+}
+
+// Arrival i has depth depths[i]. Object lists ascend (the camera's nearest last), occluder
+// lists descend (the light's nearest first); both keep ties in the order they came in. Every
+// occluder is kept, even one without alpha.
+TEST(FragmentArray, ListsKeepDepthOrderAndTiesInArrivalOrder) {
+    const float depths[] = {5, 5, 2, 9, 5};
+    SY_FragmentArray<SY_FragmentDraftX<PF_Pixel8>> objects(kRow);
+    SY_ShadowFragmentArray occluders(kRow);
+    for (uint8_t i = 0; i < 5; ++i) {
+        const PF_Pixel8 p{255, i, 0, 0};
+        objects.AddFragment(&p, 255, 2, depths[i], objects.HeadAt(7, 0), 0);
+        const PF_Pixel16 t{0, i, 7, 8};
+        occluders.AddShadowFragment(&t, depths[i], 0.5f, 0xFFFF, occluders.HeadAt(7, 0), 0);
+    }
+    std::vector<int32_t> objectOrder, occluderOrder;
+    for (auto* r = *objects.HeadAt(7, 0); r; r = r->next)
+        objectOrder.push_back(r->color.red);
+    for (auto* r = *occluders.HeadAt(7, 0); r; r = r->next)
+        occluderOrder.push_back(r->red);
+    EXPECT_EQ(objectOrder, (std::vector<int32_t>{2, 0, 1, 4, 3}));
+    EXPECT_EQ(occluderOrder, (std::vector<int32_t>{3, 0, 1, 4, 2}));
+    EXPECT_EQ(occluders.fragmentCount.load(), 5u);
+}
+
+TEST(ShadowFragments, CompactionDropsEmptyArraysAndKeepsOrder) {
     AccountedBytesCheck memory;
-    for (int16_t depth : {8, 16, 32}) {
-        for (bool antialias : {false, true}) {
-            for (bool motionBlur : {false, true}) {
-                SCOPED_TRACE(testing::Message() << depth << antialias << motionBlur);
-                auto buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, antialias, motionBlur);
-                ASSERT_NE(buffer, nullptr);
+    SY_ShadowFragmentArrayList list;
+    const PF_Pixel16 t{0, 1, 1, 1};
+    for (int32_t i = 0; i < 5; ++i) {
+        SY_ShadowFragmentArray* array = list.Append({0, 0, i + 1, 1});
+        if (i % 2 == 1) array->AddShadowFragment(&t, 1.0f, 0.0f, 0, array->HeadAt(0, 0), 0);
+    }
+    list.Compact();
+    ASSERT_EQ(list.Count(), 2);
+    EXPECT_EQ(list[0]->Bounds().right, 2);
+    EXPECT_EQ(list[1]->Bounds().right, 4);
+}
+
+// Four workers draw the rows of one draft buffer through their own pools, eight layers a row,
+// layer l at key (37·l) mod 8 so that each list's order differs from the order of drawing.
+using Buffer = SY_MBufferDraftX<PF_Pixel16>;
+constexpr M_LRect kBounds{3, 5, 131, 133};  // 128 × 128 pixels: 49 blocks of records
+
+void DrawRow(const void* closure, int32_t row, int32_t, int32_t thread) {
+    Buffer* buffer = *static_cast<Buffer* const*>(closure);
+    for (uint16_t layer = 0; layer < 8; ++layer) {
+        const PF_Pixel16 color{32768, layer, 0, 0};
+        for (int32_t x = kBounds.left; x < kBounds.right; ++x)
+            buffer->AddFragment(&color, 32768, 2, float(layer * 37 % 8), buffer->HeadAt(x, row),
+                                thread);
+    }
+}
+
+TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {
+    AccountedBytesCheck memory;
+    ostrel_test::ThreadedFrame<4> frame;
+    auto owner = SY_MBuffer::New(kBounds, 16, false, false);
+    Buffer* buffer = static_cast<Buffer*>(owner.get());
+    ASSERT_EQ(buffer->PoolCount(), 4);
+    EXPECT_EQ(buffer->Pool(3).lock, SY_GetAllocationLock());
+    ostrel_test::RecordingProgress progress;
+    SY_RunRowWork({frame.iterate, &progress, kBounds.top, 128, 0, &DrawRow, &buffer});
+    int32_t wrong = 0;
+    for (int32_t y = kBounds.top; y < kBounds.bottom; ++y) {
+        for (int32_t x = kBounds.left; x < kBounds.right; ++x) {
+            int32_t count = 0;
+            for (const Buffer::Record* r = *buffer->HeadAt(x, y); r; r = r->next, ++count)
+                wrong += r->depth != float(count) || r->color.red * 37 % 8 != count;
+            wrong += count != 8;
+        }
+    }
+    EXPECT_EQ(wrong, 0);
+}
+
+// Until the classes that split pixels exist, every request is drawn by the draft buffer of its
+// depth. Motion blur implies anti-aliasing.
+TEST(MBuffer, EveryRequestGetsTheDraftBufferOfItsDepth) {
+    AccountedBytesCheck memory;
+    using Q = SY_MBufferQuality;
+    for (const int16_t depth : {8, 16, 32}) {
+        for (const bool antialias : {false, true}) {
+            for (const bool blur : {false, true}) {
+                SCOPED_TRACE(testing::Message() << depth << antialias << blur);
+                EXPECT_EQ(SY_MBufferQualityFor(antialias, blur),
+                          blur ? Q::kMotionBlur : (antialias ? Q::kAntialiased : Q::kDraft));
+                auto buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, antialias, blur);
                 EXPECT_EQ(buffer->GetBitDepth(), depth);
-                auto* container = dynamic_cast<PF_PixelContainerBase*>(buffer.get());
-                ASSERT_NE(container, nullptr);
-                EXPECT_EQ(container->GetBitDepth(), buffer->GetBitDepth());
-                if (!antialias && !motionBlur) {
-                    EXPECT_FALSE(buffer->IsAntialiased());
-                }
-                if (buffer->IsAntialiased()) continue;
-                EXPECT_FALSE(buffer->HasMotionBlur());
-                bool draft = dynamic_cast<SY_MBufferDraftX<PF_Pixel8>*>(buffer.get()) ||
-                             dynamic_cast<SY_MBufferDraftX<PF_Pixel16>*>(buffer.get()) ||
-                             dynamic_cast<SY_MBufferDraftX<PF_PixelFloat>*>(buffer.get());
-                EXPECT_TRUE(draft);
+                EXPECT_FALSE(buffer->IsAntialiased() || buffer->HasMotionBlur());
             }
         }
     }
@@ -60,78 +167,41 @@ TEST(MBuffer, EveryRequestGetsABufferThatDescribesItself) {
 
 template <class P>
 class MBufferDraftByDepth : public ::testing::Test {};
-using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
-TYPED_TEST_SUITE(MBufferDraftByDepth, PixelTypes);
+TYPED_TEST_SUITE(MBufferDraftByDepth, ostrel_test::PixelTypes);
 
-// Two opaque layers crossing over a row of eight pixels: A's key is x + 0.25, B's 7.25 − x, so B
-// is nearer (larger key) up to x = 3 and A from x = 4. Whichever layer is drawn first, each
-// pixel shows the nearer one; pixels outside the buffer stay as they were.
-TYPED_TEST(MBufferDraftByDepth, CrossingLayersShowTheNearerOneAtEachPixel) {
+// Lists of 0 to 3 opaque records along a row of five (odd, so the resolve's pairwise walk has
+// a tail): the nearest record (largest key) shows whichever order they came in. The last one
+// keeps the alpha beneath; the empty pixel and pixels outside the buffer keep what they had.
+TYPED_TEST(MBufferDraftByDepth, TheNearestRecordShowsWhateverTheOrder) {
     using P = TypeParam;
-    using Buffer = SY_MBufferDraftX<P>;
-    const P red = PixelOf<P>(1, 1, 0, 0), blue = PixelOf<P>(1, 0, 0, 1);
-    const P grey = PixelOf<P>(1, 0.5f, 0.5f, 0.5f);
-    const auto full = static_cast<SY_Coverage<P>>(PF_PixelTraits<P>::kMax);
-    for (bool aFirst : {true, false}) {
+    const P colors[] = {PixelOf<P>(1, 1, 0, 0), PixelOf<P>(1, 0, 1, 0), PixelOf<P>(1, 0, 0, 1)};
+    const P before = PixelOf<P>(0.5f, 0.5f, 0.5f, 0.5f);
+    const int32_t lengths[] = {0, 1, 2, 3, 1};
+    for (bool nearestFirst : {true, false}) {
         AccountedBytesCheck memory;
-        PF_WorldX<P> world(10, 3);
-        for (int32_t y = 0; y < 3; ++y) {
-            for (int32_t x = 0; x < 10; ++x)
-                world.At(x, y) = grey;
-        }
+        PF_WorldX<P> world(7, 3);
+        for (int32_t i = 0; i < 21; ++i)
+            world.At(i % 7, i / 7) = before;
         {
-            auto owner = SY_MBuffer::New({1, 1, 9, 2}, PF_PixelTraits<P>::kBitDepth, false, false);
-            auto* buffer = static_cast<Buffer*>(owner.get());
-            for (int32_t pass = 0; pass < 2; ++pass) {
-                const bool a = (pass == 0) == aFirst;
-                for (int32_t x = 1; x < 9; ++x) {
-                    const float key = a ? (x - 1) + 0.25f : 7.25f - (x - 1);
-                    buffer->AddFragment(a ? &red : &blue, full, 2, key, buffer->HeadAt(x, 1), 0);
+            auto owner = SY_MBuffer::New({1, 1, 6, 2}, PF_PixelTraits<P>::kBitDepth, false, false);
+            auto* buffer = static_cast<SY_MBufferDraftX<P>*>(owner.get());
+            for (int32_t x = 1; x < 6; ++x) {
+                const int32_t n = lengths[x - 1], mode = x == 5 ? 2 | 128 : 2;
+                for (int32_t i = 0; i < n; ++i) {
+                    const int32_t k = nearestFirst ? n - 1 - i : i;
+                    buffer->AddFragment(&colors[k], PF_PixelTraits<P>::kMax, mode, float(k),
+                                        buffer->HeadAt(x, 1), 0);
                 }
             }
             owner->Resolve(nullptr, nullptr, world);
         }
-        for (int32_t x = 1; x < 9; ++x)
-            EXPECT_TRUE(PixelIs(world.At(x, 1), x - 1 <= 3 ? blue : red)) << "x " << x;
-        EXPECT_TRUE(PixelIs(world.At(0, 1), grey));
-        EXPECT_TRUE(PixelIs(world.At(9, 1), grey));
-        EXPECT_TRUE(PixelIs(world.At(4, 0), grey));
+        for (int32_t i = 0; i < 21; ++i) {
+            const int32_t x = i % 7, y = i / 7, n = y == 1 && x >= 1 && x < 6 ? lengths[x - 1] : 0;
+            P expected = n ? colors[n - 1] : before;
+            if (y == 1 && x == 5) expected.alpha = before.alpha;
+            EXPECT_EQ(Channels(world.At(x, y)), Channels(expected)) << x << "," << y;
+        }
     }
-}
-
-TYPED_TEST(MBufferDraftByDepth, KeepAlphaChangesColorNotAlpha) {
-    using P = TypeParam;
-    PF_WorldX<P> world(2, 1);
-    const P halfGrey = PixelOf<P>(0.5f, 0.5f, 0.5f, 0.5f);
-    world.At(0, 0) = halfGrey;
-    world.At(1, 0) = halfGrey;
-    SY_MBufferDraftX<P> buffer({0, 0, 2, 1});
-    const P red = PixelOf<P>(1, 1, 0, 0);
-    const auto full = static_cast<SY_Coverage<P>>(PF_PixelTraits<P>::kMax);
-    buffer.AddFragment(&red, full, 2 | 128, 0.0f, buffer.HeadAt(0, 0), 0);
-    buffer.AddFragment(&red, full, 2, 0.0f, buffer.HeadAt(1, 0), 0);
-    buffer.Resolve(nullptr, nullptr, world);
-    EXPECT_TRUE(PixelIs(world.At(0, 0), PixelOf<P>(0.5f, 1, 0, 0)));
-    EXPECT_TRUE(PixelIs(world.At(1, 0), red));
-}
-
-// A draft resolve blends the tables never: with them the result is the same.
-TEST(MBufferDraft, ResolveIgnoresBlendingTables) {
-    PF_LinearBlendingTables tables;
-    PF_BuildLinearBlendingTablesGamma(2.2f, &tables);
-    const PF_Pixel8 half{128, 255, 0, 0};
-    std::vector<PF_Pixel8> results;
-    for (const PF_LinearBlendingTables* t :
-         {static_cast<PF_LinearBlendingTables*>(nullptr), &tables}) {
-        PF_WorldX<PF_Pixel8> world(1, 1);
-        world.At(0, 0) = {255, 0, 0, 255};
-        SY_MBufferDraftX<PF_Pixel8> buffer({0, 0, 1, 1});
-        buffer.AddFragment(&half, 255, 2, 0.0f, buffer.HeadAt(0, 0), 0);
-        buffer.Resolve(nullptr, t, world);
-        results.push_back(world.At(0, 0));
-    }
-    EXPECT_TRUE(PixelIs(results[1], results[0]));
-    EXPECT_TRUE(PixelIs(results[0], PF_Pixel8{255, 128, 0, 127}));
 }
 
 TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
@@ -147,64 +217,75 @@ TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
     for (const Case& c : cases) {
         PF_WorldX<PF_Pixel8> world(2, c.bounds.bottom);
         SY_MBufferDraftX<PF_Pixel8> buffer(c.bounds);
-        RecordingProgress progress;
+        ostrel_test::RecordingProgress progress;
         buffer.Resolve(&progress, nullptr, world);
         EXPECT_EQ(progress.rows, c.reports) << "rows from " << c.bounds.top;
     }
 }
 
-TEST(MBufferDraft, CancelFromProgressEndsTheResolve) {
-    struct Cancel : SY_ProgressAbort {
-        void ReportRenderables(int32_t, int32_t) override {}
+// A draft blends plainly whatever tables it is handed: half-alpha red over opaque blue is
+// 255 − 127.5 → 128 red and 127 blue. A cancel thrown from the report before row 32 leaves
+// the rows above it resolved.
+TEST(MBufferDraft, ResolveBlendsWithoutTablesAndStopsAtACancel) {
+    struct Cancel : ostrel_test::RecordingProgress {
         void ReportRows(int32_t row, int32_t) override {
             if (row > 0) throw int32_t{7};
         }
     } cancel;
+    PF_LinearBlendingTables tables;
+    PF_BuildLinearBlendingTablesGamma(2.2f, &tables);
     PF_WorldX<PF_Pixel8> world(1, 64);
+    world.At(0, 0) = {255, 0, 0, 255};
     SY_MBufferDraftX<PF_Pixel8> buffer({0, 0, 1, 64});
-    const PF_Pixel8 red{255, 255, 0, 0};
+    const PF_Pixel8 red{255, 255, 0, 0}, halfRed{128, 255, 0, 0};
     for (int32_t y = 0; y < 64; ++y)
-        buffer.AddFragment(&red, 255, 2, 0.0f, buffer.HeadAt(0, y), 0);
-    EXPECT_THROW(buffer.Resolve(&cancel, nullptr, world), int32_t);
-    EXPECT_TRUE(PixelIs(world.At(0, 31), red));
-    EXPECT_TRUE(PixelIs(world.At(0, 32), PF_Pixel8{}));
+        buffer.AddFragment(y ? &red : &halfRed, 255, 2, 0.0f, buffer.HeadAt(0, y), 0);
+    EXPECT_THROW(buffer.Resolve(&cancel, &tables, world), int32_t);
+    EXPECT_EQ(Channels(world.At(0, 0)), Channels(PF_Pixel8{255, 128, 0, 127}));
+    EXPECT_EQ(Channels(world.At(0, 31)), Channels(red));
+    EXPECT_EQ(Channels(world.At(0, 32)), Channels(PF_Pixel8{}));
 }
 
-TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
-    using Buffer = SY_MBufferDraftX<PF_Pixel16>;
+// A draft buffer made with three render threads, each filling a row one record longer than a
+// block holds: records never straddle blocks, so each row takes two.
+void FillBuffer() {
     constexpr int32_t kPerBlock = kSY_FragmentRecordBytes / sizeof(Buffer::Record);
-    const M_LRect bounds{0, 0, kPerBlock, 3};  // three full blocks
+    auto owner = SY_MBuffer::New({0, 0, kPerBlock + 1, 3}, 16, false, false);
+    auto* buffer = static_cast<Buffer*>(owner.get());
     const PF_Pixel16 p{32768, 1, 2, 3};
-    int32_t failures = scene_test::FailEachAllocationInTurn([&](auto fail) {
-        auto failing = fail();
-        auto owner = SY_MBuffer::New(bounds, 16, false, false);
-        auto* buffer = static_cast<Buffer*>(owner.get());
-        for (int32_t y = 0; y < bounds.bottom; ++y) {
-            for (int32_t x = 0; x < bounds.right; ++x)
-                buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), 0);
-        }
-    });
-    EXPECT_EQ(failures, 1 + 1 + 1 + 1 + 3);  // object, pool array, pool, head table, blocks
+    for (int32_t y = 0; y < 3; ++y) {
+        for (int32_t x = 0; x <= kPerBlock; ++x)
+            buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), y);
+    }
 }
 
-// Lists of 0 to 3 opaque records over a row of five: the nearest (largest key) shows, whatever
-// the order of adding, and the empty pixel keeps what it had.
-TEST(MBufferDraft, ListsOfEveryLengthBlendFarthestFirst) {
-    const PF_Pixel8 colors[] = {{255, 255, 0, 0}, {255, 0, 255, 0}, {255, 0, 0, 255}};
-    const int32_t lengths[] = {0, 1, 2, 3, 1};
-    PF_WorldX<PF_Pixel8> world(5, 1);
-    const PF_Pixel8 before{128, 10, 20, 30};
-    for (int32_t x = 0; x < 5; ++x)
-        world.At(x, 0) = before;
-    SY_MBufferDraftX<PF_Pixel8> buffer({0, 0, 5, 1});
-    for (int32_t x = 0; x < 5; ++x) {
-        for (int32_t k = lengths[x] - 1; k >= 0; --k)  // nearest first
-            buffer.AddFragment(&colors[k], 255, 2, static_cast<float>(k), buffer.HeadAt(x, 0), 0);
+void AppendShadowArrays() {
+    SY_ShadowFragmentArrayList list;
+    for (int32_t i = 0; i < 3; ++i)
+        list.Append({0, 0, 8, 8});
+}
+
+// Every allocation of each piece of work failed in turn: each failure is error 4 and leaves
+// nothing allocated.
+TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
+    ostrel_test::ThreadedFrame<3> frame;
+    const struct {
+        const char* what;
+        void (*work)();
+        int32_t failures;
+    } cases[] = {
+        // Object, pool array, three pools, head table, two blocks in each pool.
+        {"draft buffer", &FillBuffer, 1 + 1 + 3 + 1 + 6},
+        // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
+        {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
+    };
+    for (const auto& c : cases) {
+        int32_t failures = scene_test::FailEachAllocationInTurn([&](auto fail) {
+            auto failing = fail();
+            c.work();
+        });
+        EXPECT_EQ(failures, c.failures) << c.what;
     }
-    buffer.Resolve(nullptr, nullptr, world);
-    EXPECT_TRUE(PixelIs(world.At(0, 0), before));
-    for (int32_t x = 1; x < 5; ++x)
-        EXPECT_TRUE(PixelIs(world.At(x, 0), colors[lengths[x] - 1])) << "x " << x;
 }
 
 }  // namespace

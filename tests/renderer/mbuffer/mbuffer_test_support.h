@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cstdint>
 
 #include "pf_pixel.h"
@@ -13,6 +14,8 @@
 
 namespace ostrel_test {
 
+using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
+
 // A pixel from channel values given as fractions of the type's maximum.
 template <class P>
 P PixelOf(float alpha, float red, float green, float blue) {
@@ -21,48 +24,29 @@ P PixelOf(float alpha, float red, float green, float blue) {
     return {C(alpha * kMax), C(red * kMax), C(green * kMax), C(blue * kMax)};
 }
 
+// Alpha, red, green, blue: compared and printed as one value.
 template <class P>
-bool SamePixel(const P& a, const P& b) {
-    return a.alpha == b.alpha && a.red == b.red && a.green == b.green && a.blue == b.blue;
-}
-
-template <class P>
-::testing::AssertionResult PixelIs(const P& actual, const P& expected) {
-    if (SamePixel(actual, expected)) return ::testing::AssertionSuccess();
-    return ::testing::AssertionFailure()
-           << "got (" << +actual.alpha << ", " << +actual.red << ", " << +actual.green << ", "
-           << +actual.blue << "), expected (" << +expected.alpha << ", " << +expected.red << ", "
-           << +expected.green << ", " << +expected.blue << ")";
+std::array<double, 4> Channels(const P& p) {
+    return {double(p.alpha), double(p.red), double(p.green), double(p.blue)};
 }
 
 // Frames run on kThreads workers with the shared lock live while it exists; single-threaded
 // again afterwards, as every other test expects.
 template <int32_t kThreads>
-class ThreadedFrame {
-public:
-    ThreadedFrame() { iterate_ = SY_PrepareThreads(true, ThreadedIterateSuite<kThreads>::Suite()); }
+struct ThreadedFrame {
+    ThreadedFrame() { iterate = SY_PrepareThreads(true, ThreadedIterateSuite<kThreads>::Suite()); }
     ~ThreadedFrame() { SY_PrepareThreads(false, nullptr); }
     ThreadedFrame(const ThreadedFrame&) = delete;
     ThreadedFrame& operator=(const ThreadedFrame&) = delete;
 
-    PF_IterateFunction Iterate() const { return iterate_; }
-
-private:
-    PF_IterateFunction iterate_;
+    PF_IterateFunction iterate;
 };
 
 // Fails the test when the accounted byte count is not back where it was at construction.
-class AccountedBytesCheck {
-public:
-    AccountedBytesCheck() : start_(U_AccountedBytes()) {}
-    ~AccountedBytesCheck() { EXPECT_EQ(U_AccountedBytes(), start_) << "memory left accounted"; }
-    AccountedBytesCheck(const AccountedBytesCheck&) = delete;
-    AccountedBytesCheck& operator=(const AccountedBytesCheck&) = delete;
+struct AccountedBytesCheck {
+    ~AccountedBytesCheck() { EXPECT_EQ(U_AccountedBytes(), start) << "memory left accounted"; }
 
-    int64_t Taken() const { return U_AccountedBytes() - start_; }
-
-private:
-    int64_t start_;
+    const int64_t start = U_AccountedBytes();
 };
 
 }  // namespace ostrel_test

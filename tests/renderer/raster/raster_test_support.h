@@ -2,9 +2,10 @@
 // reader can recompute, layers placed in front of the default camera, and a frame runner.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <cstdint>
 #include <memory>
-#include <vector>
 
 #include "../scene/frame_test_support.h"
 #include "../scene/memory_texture_fetcher.h"
@@ -15,21 +16,18 @@
 
 namespace raster_test {
 
-// A channel value given as an 8-bit code, in the range of P.
-template <class P>
-typename PF_PixelTraits<P>::Channel Code(uint32_t code) {
-    using Traits = PF_PixelTraits<P>;
-    if constexpr (Traits::kIsFloat)
-        return static_cast<float>(code) / 255.0f;
-    else if constexpr (Traits::kBitDepth == 16)
-        return PF_8To16(code);
-    else
-        return static_cast<uint8_t>(code);
-}
+using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
 
+// An opaque pixel of colour channels given as 8-bit codes, in the range of P.
 template <class P>
 P Opaque(uint32_t r, uint32_t g, uint32_t b) {
-    return {Code<P>(255), Code<P>(r), Code<P>(g), Code<P>(b)};
+    using Traits = PF_PixelTraits<P>;
+    auto code = [](uint32_t c) -> typename Traits::Channel {
+        if constexpr (Traits::kIsFloat) return static_cast<float>(c) / 255.0f;
+        if constexpr (Traits::kBitDepth == 16) return PF_8To16(c);
+        return static_cast<typename Traits::Channel>(c);
+    };
+    return {code(255), code(r), code(g), code(b)};
 }
 
 // Opaque texel (i, j) of the test pattern: neighbours differ in every channel.
@@ -38,24 +36,23 @@ P PatternTexel(int32_t i, int32_t j) {
     return Opaque<P>((i * 37 + j * 11) % 251, (i * 5 + j * 29) % 241, (i * 13 + j * 7) % 239);
 }
 
-template <class P>
-std::unique_ptr<PF_WorldX<P>> PatternTexture(int32_t width, int32_t height) {
+// A world whose pixel (i, j) is pixelAt(i, j).
+template <class P, class PixelAt>
+std::unique_ptr<PF_WorldX<P>> WorldOf(int32_t width, int32_t height, PixelAt pixelAt) {
     auto world = std::make_unique<PF_WorldX<P>>(width, height);
-    for (int32_t j = 0; j < height; ++j) {
-        for (int32_t i = 0; i < width; ++i)
-            world->At(i, j) = PatternTexel<P>(i, j);
-    }
+    for (int32_t k = 0; k < width * height; ++k)
+        world->At(k % width, k / width) = pixelAt(k % width, k / width);
     return world;
 }
 
 template <class P>
+std::unique_ptr<PF_WorldX<P>> PatternTexture(int32_t width, int32_t height) {
+    return WorldOf<P>(width, height, PatternTexel<P>);
+}
+
+template <class P>
 std::unique_ptr<PF_WorldX<P>> FilledWorld(int32_t width, int32_t height, const P& pixel) {
-    auto world = std::make_unique<PF_WorldX<P>>(width, height);
-    for (int32_t j = 0; j < height; ++j) {
-        for (int32_t i = 0; i < width; ++i)
-            world->At(i, j) = pixel;
-    }
-    return world;
+    return WorldOf<P>(width, height, [&](int32_t, int32_t) { return pixel; });
 }
 
 template <class P>
@@ -73,7 +70,7 @@ inline constexpr double kDistance = 400;
 
 // A frame of layers in front of the default camera, all drawn into one destination.
 struct Frame {
-    Frame(int32_t w, int32_t h, int32_t layerCount) : width(w), height(h) {
+    Frame(int32_t w, int32_t h, int32_t layerCount) {
         ostrel_test::SetDefaultCamera(&scene, w, h, kDistance);
         scene.layers.Allocate(layerCount);
         for (int32_t i = 0; i < layerCount; ++i) {
@@ -97,7 +94,6 @@ struct Frame {
                        nullptr);
     }
 
-    int32_t width, height;
     SY_SceneDesc scene;
     ostrel_test::MemoryTextureFetcher fetcher;
     ostrel_test::RecordingProgress progress;

@@ -6,160 +6,111 @@
 
 namespace {
 
-using raster_test::Code;
 using raster_test::Equal;
+using raster_test::FilledWorld;
 using raster_test::IsClear;
 using raster_test::Opaque;
 using raster_test::PatternTexel;
-using raster_test::PatternTexture;
 
-template <class P>
-class Samplers : public ::testing::Test {};
+using Filter = SY_SamplingFilter;
 
-using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
-TYPED_TEST_SUITE(Samplers, PixelTypes);
-
-// The identity mapping of screen to texture: U = x, V = y, W = 1.
-M_Matrix3 Identity() {
+// Screen to texture: U = s·x, V = s·y, W = 1.
+M_Matrix3 Scaled(double s) {
     M_Matrix3 m{};
-    m.mat[0][0] = m.mat[1][1] = m.mat[2][2] = 1;
+    m.mat[0][0] = m.mat[1][1] = s;
+    m.mat[2][2] = 1;
     return m;
 }
 
-template <class P>
-void StartTexture(const PF_World& world, SY_SamplingFilter filter, bool perspective,
-                  SY_SpanTexture* t) {
-    t->world = &world;
-    t->samplingFilter = filter;
-    t->sampling.src = &world;
-    t->perspective = perspective;
+template <class State>
+void StartTexture(const PF_World& texture, Filter filter, bool perspective, State* state) {
+    state->texture.world = state->texture.sampling.src = &texture;
+    state->texture.samplingFilter = filter;
+    state->texture.perspective = perspective;
 }
 
+template <class P, class State>
+P Take(State& state, Filter filter) {
+    P got;
+    filter == Filter::kNearest ? SY_SampleNearest(state, &got) : SY_SampleFiltered(state, &got);
+    return got;
+}
+
+// The sample at screen point (x, y) through m with the given filter.
+template <class P>
+P Sample(const PF_World& texture, Filter filter, const M_Matrix3& m, double x, double y,
+         bool perspective = false) {
+    SY_SpanSampleState<P> state;
+    StartTexture(texture, filter, perspective, &state);
+    state.mapping.Start(m, x, y, perspective, 1.0f);
+    return Take<P>(state, filter);
+}
+
+template <class P>
+class Samplers : public ::testing::Test {};
+TYPED_TEST_SUITE(Samplers, raster_test::PixelTypes);
+
+// Nearest: the floored texel, nothing beyond the texture (column = width, row = height, and
+// −0.25 floors to −1).
 TYPED_TEST(Samplers, NearestTakesTheFlooredTexelAndNothingOutside) {
     using P = TypeParam;
-    auto texture = PatternTexture<P>(8, 4);
-    struct Case {
-        double x, y;
-        bool inside;
-        int32_t i, j;
-    };
-    const Case cases[] = {
-        {0.5, 0.5, true, 0, 0},    {7.99, 3.99, true, 7, 3},
-        {3.0, 2.0, true, 3, 2},    {8.0, 1.5, false, 0, 0},  // column = width
-        {1.5, 4.0, false, 0, 0},                             // row = height
-        {-0.25, 1.5, false, 0, 0},                           // floor, not truncation
-    };
-    for (const Case& c : cases) {
-        SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, SY_SamplingFilter::kNearest, false, &state.texture);
-        state.mapping.Start(Identity(), c.x, c.y, false, 1.0f);
-        P got;
-        SY_SampleNearest(state, &got);
-        if (c.inside)
-            EXPECT_TRUE(Equal(got, PatternTexel<P>(c.i, c.j))) << c.x << "," << c.y;
-        else
-            EXPECT_TRUE(IsClear(got)) << c.x << "," << c.y;
+    auto texture = raster_test::PatternTexture<P>(8, 4);
+    const double cases[][3] = {{0.5, 0.5, 1}, {7.99, 3.99, 1}, {3.0, 2.0, 1},
+                               {8.0, 1.5, 0}, {1.5, 4.0, 0},   {-0.25, 1.5, 0}};
+    for (const auto& [x, y, inside] : cases) {
+        const P got = Sample<P>(*texture, Filter::kNearest, Scaled(1), x, y);
+        EXPECT_TRUE(inside ? Equal(got, PatternTexel<P>(int32_t(x), int32_t(y))) : IsClear(got))
+            << x << "," << y;
     }
 }
 
-TYPED_TEST(Samplers, FilteredAtATexelCentreIsTheTexelForBothQualities) {
+// Filtered at a texel centre with one texel to a pixel (a footprint of half a texel, still
+// interpolated) is the texel, bilinear or bicubic. Three texels to two pixels average a box of
+// 1.5 texels, which mixes in the neighbours of a lone white texel.
+TYPED_TEST(Samplers, FilteredInterpolatesSmallFootprintsAndAveragesWideOnes) {
     using P = TypeParam;
-    auto texture = PatternTexture<P>(8, 8);
-    for (SY_SamplingFilter filter : {SY_SamplingFilter::kBilinear, SY_SamplingFilter::kBicubic}) {
-        SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, filter, false, &state.texture);
-        state.mapping.Start(Identity(), 4, 3, false, 1.0f);
-        P got;
-        SY_SampleFiltered(state, &got);
-        EXPECT_TRUE(Equal(got, PatternTexel<P>(4, 3))) << filter;
-    }
+    auto pattern = raster_test::PatternTexture<P>(8, 8);
+    for (Filter filter : {Filter::kBilinear, Filter::kBicubic})
+        EXPECT_TRUE(Equal(Sample<P>(*pattern, filter, Scaled(1), 4, 3), PatternTexel<P>(4, 3)));
+    const P white = Opaque<P>(255, 255, 255);
+    auto dot = FilledWorld<P>(8, 8, Opaque<P>(0, 0, 0));
+    dot->At(4, 3) = white;
+    EXPECT_TRUE(Equal(Sample<P>(*dot, Filter::kBilinear, Scaled(1), 4, 3), white));
+    EXPECT_FALSE(Equal(Sample<P>(*dot, Filter::kBilinear, Scaled(1.5), 4 / 1.5, 3 / 1.5), white));
 }
 
-// One texel to a pixel is a footprint of half a texel: still interpolated. Three texels to two
-// pixels average a box of 1.5 texels, which mixes in the neighbours.
-TYPED_TEST(Samplers, HalfATexelFootprintInterpolatesAndWiderAverages) {
-    using P = TypeParam;
-    auto texture = raster_test::FilledWorld<P>(8, 8, Opaque<P>(0, 0, 0));
-    texture->At(4, 3) = Opaque<P>(255, 255, 255);
-    for (double scale : {1.0, 1.5}) {
-        M_Matrix3 m = Identity();
-        m.mat[0][0] = m.mat[1][1] = scale;
-        SY_SpanSampleState<P> state;
-        StartTexture<P>(*texture, SY_SamplingFilter::kBilinear, false, &state.texture);
-        state.mapping.Start(m, 4 / scale, 3 / scale, false, 1.0f);
-        P got;
-        SY_SampleFiltered(state, &got);
-        EXPECT_EQ(Equal(got, Opaque<P>(255, 255, 255)), scale == 1.0) << scale;
-    }
-}
-
+// W = 0.1 + 0.2·x, with U and V following W so they stay inside the texture: at x = 0 the
+// pixel's W range reaches below zero and the sample is transparent; at x = 2 it is not.
 TYPED_TEST(Samplers, FootprintReachingTheEyePlaneIsTransparent) {
     using P = TypeParam;
-    auto texture = raster_test::FilledWorld<P>(8, 8, Opaque<P>(10, 20, 30));
-    // W = 0.1 + 0.2·x: at x = 0 the pixel's W range [W − 0.2·½·2, …] reaches below zero.
-    M_Matrix3 m = Identity();
-    m.mat[0][2] = 0.2;
-    m.mat[2][2] = 0.1;
-    m.mat[0][0] = 0.2;  // U and V follow W so that u, v stay inside the texture
-    m.mat[1][1] = 0;
-    m.mat[2][1] = 0.1;
-    SY_SpanSampleState<P> state;
-    StartTexture<P>(*texture, SY_SamplingFilter::kBilinear, true, &state.texture);
-    state.mapping.Start(m, 0.0, 0.5, true, 1.0f);
-    P got;
-    SY_SampleFiltered(state, &got);
-    EXPECT_TRUE(IsClear(got));
-    state.mapping.Start(m, 2.0, 0.5, true, 1.0f);
-    SY_SampleFiltered(state, &got);
-    EXPECT_FALSE(IsClear(got));
+    auto texture = FilledWorld<P>(8, 8, Opaque<P>(10, 20, 30));
+    M_Matrix3 m{};
+    m.mat[0][0] = m.mat[0][2] = 0.2;
+    m.mat[2][1] = m.mat[2][2] = 0.1;
+    EXPECT_TRUE(IsClear(Sample<P>(*texture, Filter::kBilinear, m, 0.0, 0.5, true)));
+    EXPECT_FALSE(IsClear(Sample<P>(*texture, Filter::kBilinear, m, 2.0, 0.5, true)));
 }
 
 // Two subsamples, the second absent: alpha is halved, the colour stays. With both absent the
 // sample is transparent.
 TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
     using P = TypeParam;
-    const P color = {Code<P>(255), Code<P>(200), Code<P>(100), Code<P>(50)};
-    auto texture = raster_test::FilledWorld<P>(8, 8, color);
-    for (SY_SamplingFilter filter : {SY_SamplingFilter::kNearest, SY_SamplingFilter::kBilinear}) {
+    constexpr double kMax = PF_PixelTraits<P>::kMax;
+    const P color = Opaque<P>(200, 100, 50);
+    auto texture = FilledWorld<P>(8, 8, color);
+    for (Filter filter : {Filter::kNearest, Filter::kBilinear}) {
         SY_SpanSubsampleState<P> state;
-        StartTexture<P>(*texture, filter, false, &state.texture);
+        StartTexture(*texture, filter, false, &state);
         state.count = 2;
-        state.first = 0;
         state.last = 1;
-        state.mappings[0].Start(Identity(), 4, 4, false, 0.5f);
+        state.mappings[0].Start(Scaled(1), 4, 4, false, 0.5f);
         state.mappings[1].StartAbsent();
-        P got;
-        if (filter == SY_SamplingFilter::kNearest)
-            SY_SampleNearest(state, &got);
-        else
-            SY_SampleFiltered(state, &got);
-        EXPECT_NEAR(got.alpha, PF_PixelTraits<P>::kMax / 2, PF_PixelTraits<P>::kMax / 255.0);
-        EXPECT_EQ(got.red, color.red);
-        EXPECT_EQ(got.green, color.green);
-        EXPECT_EQ(got.blue, color.blue);
-
+        const P got = Take<P>(state, filter);
+        EXPECT_NEAR(got.alpha, kMax / 2, kMax / 255) << filter;
+        EXPECT_TRUE(Equal(P{got.alpha, color.red, color.green, color.blue}, got)) << filter;
         state.mappings[0].StartAbsent();
-        if (filter == SY_SamplingFilter::kNearest)
-            SY_SampleNearest(state, &got);
-        else
-            SY_SampleFiltered(state, &got);
-        EXPECT_TRUE(IsClear(got));
+        EXPECT_TRUE(IsClear(Take<P>(state, filter))) << filter;
     }
-}
-
-// A mapping whose x slope of W is below 1e-12 keeps W exactly constant along the row.
-TEST(SpanMapping, TinyWSlopeKeepsWConstant) {
-    M_Matrix3 m = Identity();
-    m.mat[0][2] = 1e-13;
-    m.mat[2][2] = 2;
-    SY_SpanMapping mapping;
-    mapping.Start(m, 0.5, 0.5, true, 1.0f);
-    double w = mapping.w;
-    for (int i = 0; i < 100; ++i)
-        mapping.Step(true);
-    EXPECT_EQ(mapping.dwdx, 0.0f);
-    EXPECT_EQ(mapping.w, w);
-    EXPECT_EQ(mapping.u, 100.5);
 }
 
 }  // namespace

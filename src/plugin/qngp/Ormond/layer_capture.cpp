@@ -5,11 +5,13 @@
 #include "layer_streams.h"
 #include "track_matte_fetcher.h"
 
-namespace {
-
-constexpr int32_t kAcceptsShadowsOnly = 2;
-
-}  // namespace
+// The renderer's switches carry the host's stream values and filters.
+static_assert(kSY_AcceptsShadowsOff == kQNGP_ShadowsOff &&
+              kSY_AcceptsShadowsOn == kQNGP_ShadowsOn &&
+              kSY_AcceptsShadowsOnly == kQNGP_ShadowsOnly);
+static_assert(static_cast<uint8_t>(SY_SamplingFilter::kNearest) == kQNGP_SamplingNearest &&
+              static_cast<uint8_t>(SY_SamplingFilter::kBilinear) == kQNGP_SamplingBilinear &&
+              static_cast<uint8_t>(SY_SamplingFilter::kBicubic) == kQNGP_SamplingBicubic);
 
 uint8_t ORM_StoredTransferMode(const QNGP_LayerTransferMode& mode, const QNGP_EngineLayer& engine) {
     auto stored =
@@ -26,16 +28,16 @@ void ORM_ApplyQuality(int16_t quality, const ORM_ShadowStreams& streams, SY_Mate
         material->renders = false;
         material->wireframe = true;
         material->castsShadows = false;
-        material->acceptsShadows = 0;
+        material->acceptsShadows = kSY_AcceptsShadowsOff;
         material->acceptsLights = false;
         return;
     }
     material->wireframe = false;
     material->renders = true;
     material->castsShadows = streams.castsShadows != 0;
-    if (streams.castsShadows > 1.0) material->renders = false;
+    if (streams.castsShadows > kQNGP_ShadowsOn) material->renders = false;
     material->acceptsShadows = static_cast<uint8_t>(static_cast<int32_t>(streams.acceptsShadows));
-    if (material->acceptsShadows == kAcceptsShadowsOnly) {
+    if (material->acceptsShadows == kSY_AcceptsShadowsOnly) {
         material->acceptsLights = false;
         material->mode = kORM_ShadowsOnlyMode;
     } else {
@@ -89,8 +91,7 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     QNGP_EngineLayer engine{};
     ORM_Check(layers.GetEngineLayer(layer, &engine));
     material.mode = ORM_StoredTransferMode(transfer, engine);
-    // The renderer's sampling filters carry the engine's values.
-    material.engineFlag = engine.isAVLayer ? static_cast<SY_SamplingFilter>(engine.samplingQuality)
+    material.engineFlag = engine.isAVLayer ? static_cast<SY_SamplingFilter>(engine.samplingFilter)
                                            : SY_SamplingFilter::kNearest;
     ORM_Check(canvas.GetRenderOpacity(render, layerContext, &now, &material.opacity));
 
@@ -100,7 +101,7 @@ void CaptureLayer(ORM_RenderContext& context, const ORM_CaptureFrame& frame, int
     if (quality != kQNGP_QualityWireframe) {
         streams.castsShadows = ORM_StreamNumber(suites, layer, kQNGP_StreamCastsShadows, now);
         streams.acceptsShadows = ORM_StreamNumber(suites, layer, kQNGP_StreamAcceptsShadows, now);
-        if (static_cast<int32_t>(streams.acceptsShadows) != kAcceptsShadowsOnly) {
+        if (static_cast<int32_t>(streams.acceptsShadows) != kQNGP_ShadowsOnly) {
             streams.acceptsLights = ORM_StreamNumber(suites, layer, kQNGP_StreamAcceptsLights, now);
         }
     }

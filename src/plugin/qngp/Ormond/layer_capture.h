@@ -20,8 +20,8 @@ uint8_t ORM_StoredTransferMode(const QNGP_LayerTransferMode& mode, const QNGP_En
 // The shadow and light switches of a layer as its streams read them.
 struct ORM_ShadowStreams {
     double castsShadows;    // 0 off, 1 on, 2 (above 1) casts only
-    double acceptsShadows;  // 0 off, 1 on, 2 only
-    double acceptsLights;   // read only when acceptsShadows is not 2
+    double acceptsShadows;  // a kQNGP_Shadows… value
+    double acceptsLights;   // read only when acceptsShadows is not "only"
 };
 
 // Sets renders, wireframe, bestQuality and the shadow and light switches from the layer's
