@@ -4,8 +4,8 @@
 #include <optional>
 #include <tuple>
 
-#include "served_frame.h"
 #include "qngp_suites.h"
+#include "served_frame.h"
 #include "suites/suite_registry.h"
 #include "u_memory.h"
 #include "world_pixels.h"
@@ -36,39 +36,6 @@ const std::string kLayers = R"(
 const std::string kSettings =
     R"("pixelAspect": 0.9, "lightsAndDepthOfField": false,
        "motionBlur": {"enabled": true, "samplesPerFrame": 12})";
-
-TEST(CanvasSuite, MattesTexturesAndWholeLayersComeFromTheLayerSources) {
-    int64_t startBytes = U_AccountedBytes();
-    {
-        RenderSettings settings;
-        settings.downsampleX = 2;
-        settings.downsampleY = 3;
-        ServedFrame frame(CompJson(kSettings, kLayers), 0, settings);
-        const QNGP_CanvasSuite13& canvas = *CanvasSuite();
-        QNGP_RenderContextH render = frame.Render();
-        QNGP_LayerContextH card = nullptr, matte = nullptr;
-        ASSERT_EQ(canvas.GetNthLayerContext(render, 0, &card), 0);
-        ASSERT_EQ(canvas.GetTrackMatteContext(render, card, &matte), 0);
-        ASSERT_NE(matte, nullptr);
-
-        // The 101 × 51 stencil at a downsample of 2 × 3: ceil(101 / 2) × ceil(51 / 3).
-        PF_World* world = nullptr;
-        ASSERT_EQ(canvas.RenderLayer(render, frame.Layer(3), matte, kQNGP_RenderMatte, &world), 0);
-        std::unique_ptr<PF_World> owned(world);
-        EXPECT_EQ(std::tuple(world->width, world->height, world->bitDepth),
-                  std::tuple(51, 17, int16_t{8}));
-        EXPECT_EQ(canvas.RenderLayer(render, frame.Layer(3), matte, 7, &world), kQNGP_ErrBadArgument);
-
-        M_Matrix3 source{};
-        ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
-        EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(100, 34));
-        EXPECT_EQ(canvas.DisposeTexture(render, card, world), 0);
-        EXPECT_EQ(canvas.DisposeTexture(render, card, owned.get()), kQNGP_ErrBadHandle);
-        // One left out: the session takes it back when it ends.
-        ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
-    }
-    EXPECT_EQ(U_AccountedBytes(), startBytes);
-}
 
 // Frames of one run share each layer's texture, made once.
 TEST(CanvasSuite, TexturesAreSharedAcrossTheFramesOfARun) {
@@ -101,7 +68,7 @@ const std::string kBackdrop = R"(
   {"name": "veil", "kind": "solid", "threeD": true,
    "source": {"color": "#ffffff", "unbounded": true}},
   {"name": "card", "kind": "solid", "threeD": true, "trackMatte": "alpha",
-   "source": {"color": "#ff0000", "width": 64, "height": 32}},
+   "source": {"color": "#ff0000", "width": 65, "height": 33}},
   {"name": "wall", "kind": "solid", "threeD": true,
    "source": {"color": "#336699", "unbounded": true}}
 )";
@@ -114,12 +81,24 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
         std::optional<M_LRect> region;
         int32_t width, height;                // the output
         int32_t textureWidth, textureHeight;  // the comp at the downsample
+        int32_t cardWidth, cardHeight;        // the 65 × 33 card: rounded up
         Channels wall;                        // #336699, opaque
     };
     const Case kCases[] = {
-        {"8 bits", 8, 1, 1, std::nullopt, 960, 540, 960, 540, {255, 51, 102, 153}},
+        {"8 bits", 8, 1, 1, std::nullopt, 960, 540, 960, 540, 65, 33, {255, 51, 102, 153}},
         // trunc(c × 32768 + 0.5) of 0.2, 0.4 and 0.6.
-        {"16 bits, 2 × 3", 16, 2, 3, std::nullopt, 480, 180, 480, 180, {32768, 6554, 13107, 19661}},
+        {"16 bits, 2 × 3",
+         16,
+         2,
+         3,
+         std::nullopt,
+         480,
+         180,
+         480,
+         180,
+         33,
+         11,
+         {32768, 6554, 13107, 19661}},
         // The 301 × 200 region at half size: ceil(301 / 2) × 100.
         {"float, region, 2 × 2",
          32,
@@ -130,6 +109,8 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
          100,
          480,
          270,
+         33,
+         17,
          {1, 0.2f, 0.4f, 0.6f}},
     };
     const QNGP_CanvasSuite13& canvas = *CanvasSuite();
@@ -170,6 +151,15 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             EXPECT_EQ(std::tuple(matte->width, matte->height), std::tuple(c.width, c.height));
             double max = c.wall[0];
             EXPECT_EQ(PixelsOtherThan(*matte, {max, max, max, max}), 0);
+            EXPECT_EQ(canvas.RenderLayer(render, frame.Layer(0), veil, 7, &world),
+                      kQNGP_ErrBadArgument);
+            EXPECT_EQ(canvas.DisposeTexture(render, wall, matte.get()), kQNGP_ErrBadHandle);
+            ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
+            EXPECT_EQ(std::tuple(world->width, world->height),
+                      std::tuple(c.cardWidth, c.cardHeight));
+            EXPECT_EQ(canvas.DisposeTexture(render, card, world), 0);
+            // A texture left out: the session takes it back when it ends.
+            ASSERT_EQ(canvas.RenderTexture(render, wall, 1, nullptr, nullptr, &source, &world), 0);
         }
         EXPECT_EQ(U_AccountedBytes(), startBytes);
     }

@@ -10,116 +10,125 @@
 #include <sstream>
 #include <string>
 #include <tuple>
+#include <vector>
 
 #include "test_files.h"
 
 namespace ostrel {
 namespace {
 
-const std::filesystem::path kExamples = OSTREL_EXAMPLES_DIR;
+namespace fs = std::filesystem;
 
-struct Outcome {
-    int status;
-    std::string out;
-    std::string err;
-};
-
-std::string ReadAll(const std::filesystem::path& file) {
-    std::ifstream in(file);
+std::string ReadAll(const fs::path& file) {
     std::stringstream text;
-    text << in.rdbuf();
+    text << std::ifstream(file).rdbuf();
     return text.str();
 }
 
-// Runs the program with the arguments (already quoted for the shell) from the folder.
-Outcome Ostrel(const TempFolder& folder, const std::string& arguments) {
-    std::filesystem::path out = folder.Path() / "stdout.txt";
-    std::filesystem::path err = folder.Path() / "stderr.txt";
-    std::string command = "cd '" + folder.Path().string() + "' && '" OSTREL_PROGRAM "' " +
-                          arguments + " >'" + out.string() + "' 2>'" + err.string() + "'";
-    int status = std::system(command.c_str());
-    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, ReadAll(out), ReadAll(err)};
+size_t FilesIn(const fs::path& folder) {
+    size_t count = 0;
+    for (const auto& entry : fs::recursive_directory_iterator(folder))
+        count += entry.is_regular_file();
+    return count;
 }
 
-std::string Quote(const std::filesystem::path& path) {
-    std::string quoted = "'";
-    quoted += path.string();
-    quoted += '\'';
-    return quoted;
-}
-
-// Files the run left in the folder, beside its own captured output.
-std::vector<std::string> Images(const TempFolder& folder) {
-    std::vector<std::string> names;
-    for (const auto& entry : std::filesystem::recursive_directory_iterator(folder.Path())) {
-        std::string name = entry.path().filename().string();
-        if (entry.is_regular_file() && name.find(".png") != std::string::npos) {
-            names.push_back(name);
-        }
-    }
-    return names;
-}
-
-TEST(OstrelProgram, WithoutAnOutputPatternFramesGoBesideTheComposition) {
-    TempFolder folder;
-    std::filesystem::copy(kExamples / "cards", folder.Path() / "shot");
-    Outcome run = Ostrel(folder, "render shot/cards.json --frames 2-3 --threads 2 --stats");
-    ASSERT_EQ(run.status, 0) << run.err;
-    EXPECT_EQ(run.err, "");
-    auto in = OIIO::ImageInput::open((folder.Path() / "shot" / "cards.0002.png").string());
-    ASSERT_TRUE(in);
-    EXPECT_EQ(std::tuple(in->spec().width, in->spec().height, in->spec().format.basetype),
-              std::tuple(960, 540, OIIO::TypeDesc::UINT8));
-    EXPECT_EQ(Images(folder).size(), 4u);  // the two frames and the example's own images
-    // Not on a terminal: one line for each frame, and the statistics.
-    EXPECT_EQ(run.out.rfind("frame 2: ", 0), 0u) << run.out;
-    for (const char* part : {"3 layers -> shot/cards.0002.png\n", "frame 3 split: ", "plug-in ",
-                             "total, 2 frames with loading: "}) {
-        EXPECT_NE(run.out.find(part), std::string::npos) << part << "\n" << run.out;
-    }
-}
-
-TEST(OstrelProgram, BadInputEndsWithAMessageAndNoOutput) {
+// Each run starts in a fresh folder holding a copy of the cards example in shot/ and a
+// composition that is not JSON.
+TEST(OstrelProgram, RunsAsTheArgumentsSay) {
+    using OIIO::TypeDesc;
+    struct Frames {
+        int count = 0;     // how many it writes
+        const char* file;  // one of them
+        int width, height;
+        TypeDesc::BASETYPE type;
+    };
     struct Case {
         const char* name;
-        const char* composition;  // written as comp.json; empty: the cards example
-        const char* options;
-        int status;           // 101 stands for any status above 100, a usage error
-        const char* message;  // a part of the message
+        std::string arguments;
+        int status;                    // 101 stands for any status above 100, a usage error
+        std::vector<std::string> out;  // parts of the standard output, in order
+        const char* err;               // a part of the error output; "": none at all
+        Frames frames;
     };
     const Case kCases[] = {
-        {"malformed JSON", R"({"width": 64, "height": )", "--frames 0", 1,
-         "comp.json: malformed JSON"},
-        {"unwritable output", "", "--frames 0 -o stdout.txt/cards.####.png", 1,
-         "ostrel: stdout.txt/cards.0000.png"},
-        {"usage", "", "--depth 12", 101, "--help"},
+        // Not on a terminal: one line for each frame, and the statistics.
+        {"frames beside the composition",
+         "render shot/cards.json --frames 2-3 --threads 2 --stats",
+         0,
+         {"frame 2: ", "3 layers -> shot/cards.0002.png\n", "frame 3 split: ", "plug-in ",
+          "total, 2 frames with loading: "},
+         "",
+         {2, "shot/cards.0002.png", 960, 540, TypeDesc::UINT8}},
+        {"float to OpenEXR",
+         "render shot/cards.json --frames 0 --depth 32 -o f.####.exr",
+         0,
+         {" s, 3 layers -> f.0000.exr"},
+         "",
+         {1, "f.0000.exr", 960, 540, TypeDesc::FLOAT}},
+        {"region and downsample, interlaced, one thread",
+         "render shot/cards.json --frames 0 -o f.####.png --region 100,50,301,150 "
+         "--downsample 2x1 --fields upper --multiprocessing off --threads 1",
+         0,
+         {" s, 3 layers -> f.0000.png"},
+         "",
+         {1, "f.0000.png", 101, 100, TypeDesc::UINT8}},
+        {"info",
+         "info shot/cards.json",
+         0,
+         {"960 x 540", "8 bits", "frames       0-47 at 24 fps", "\"camera\", perspective",
+          "\"key light\" (spot, casts shadows)", "\"fill light\" (ambient)", "\"disc\"", "\"grid\"",
+          "\"floor\""},
+         "",
+         {}},
+        {"about", "about", 0, {"Ostrel 3D\n"}, "", {}},
+        {"malformed JSON",
+         "render broken.json --frames 0",
+         1,
+         {},
+         "ostrel: broken.json: malformed JSON",
+         {}},
+        // A frame that cannot be written whole is not left behind in part.
+        {"unwritable output",
+         "render shot/cards.json --frames 0 -o stdout.txt/c.####.png",
+         1,
+         {},
+         "ostrel: stdout.txt/c.0000.png",
+         {}},
+        {"usage", "render shot/cards.json --depth 12", 101, {}, "--help", {}},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.name);
         TempFolder folder;
-        std::string comp = Quote(kExamples / "cards" / "cards.json");
-        if (*c.composition) comp = Quote(folder.WriteText("comp.json", c.composition));
-        Outcome run = Ostrel(folder, "render " + comp + " " + c.options);
-        EXPECT_EQ(std::min(run.status, 101), c.status);
-        EXPECT_EQ(run.err.rfind(c.status == 1 ? "ostrel: " : "", 0), 0u) << run.err;
-        EXPECT_NE(run.err.find(c.message), std::string::npos) << run.err;
-        EXPECT_TRUE(Images(folder).empty());
+        fs::copy(fs::path(OSTREL_EXAMPLES_DIR) / "cards", folder.Path() / "shot");
+        folder.WriteText("broken.json", R"({"width": 64, "height": )");
+        size_t before = FilesIn(folder.Path());
+        fs::path out = folder.Path() / "stdout.txt", err = folder.Path() / "stderr.txt";
+        std::string command = "cd '" + folder.Path().string() + "' && '" OSTREL_PROGRAM "' " +
+                              c.arguments + " >'" + out.string() + "' 2>'" + err.string() + "'";
+        int status = std::system(command.c_str());
+        std::string printed = ReadAll(out), errors = ReadAll(err);
+        EXPECT_EQ(std::min(WIFEXITED(status) ? WEXITSTATUS(status) : -1, 101), c.status) << errors;
+        if (*c.err) {
+            EXPECT_NE(errors.find(c.err), std::string::npos) << errors;
+        } else {
+            EXPECT_EQ(errors, "");
+        }
+        if (c.status == 1) {
+            EXPECT_EQ(errors.rfind("ostrel: ", 0), 0u) << errors;
+        }
+        size_t at = 0;
+        for (const std::string& part : c.out) {
+            at = printed.find(part, at);
+            ASSERT_NE(at, std::string::npos) << part << "\n" << printed;
+        }
+        // Besides the captured output, only the frames it was asked for.
+        EXPECT_EQ(FilesIn(folder.Path()), before + 2 + c.frames.count);
+        if (!c.frames.count) continue;
+        auto in = OIIO::ImageInput::open((folder.Path() / c.frames.file).string());
+        ASSERT_TRUE(in);
+        EXPECT_EQ(std::tuple(in->spec().width, in->spec().height, in->spec().format.basetype),
+                  std::tuple(c.frames.width, c.frames.height, c.frames.type));
     }
-}
-
-TEST(OstrelProgram, InfoAndAboutShowWhatWillRender) {
-    TempFolder folder;
-    Outcome run = Ostrel(folder, "info " + Quote(kExamples / "cards" / "cards.json"));
-    ASSERT_EQ(run.status, 0) << run.err;
-    for (const char* part :
-         {"960 x 540", "8 bits", "frames       0-47 at 24 fps", "\"camera\", perspective",
-          "\"key light\" (spot, casts shadows)", "\"fill light\" (ambient)", "\"grid\""}) {
-        EXPECT_NE(run.out.find(part), std::string::npos) << part << "\n" << run.out;
-    }
-    EXPECT_LT(run.out.find("\"disc\""), run.out.find("\"floor\""));
-    run = Ostrel(folder, "about");
-    ASSERT_EQ(run.status, 0) << run.err;
-    EXPECT_EQ(run.out.rfind("Ostrel 3D\n", 0), 0u) << run.out;
 }
 
 }  // namespace

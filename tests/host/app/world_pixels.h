@@ -4,6 +4,7 @@
 #include <array>
 #include <cstdint>
 
+#include "pf_bit_depth.h"
 #include "pf_world.h"
 
 namespace ostrel {
@@ -11,22 +12,11 @@ namespace ostrel {
 // Alpha, red, green, blue, in the world's own units (up to 255, 32768 or 1.0).
 using Channels = std::array<double, 4>;
 
-template <class P>
-Channels ChannelsAtX(const PF_World& world, int32_t x, int32_t y) {
-    const P& p = *world.PixelAt<P>(x, y);
-    return {static_cast<double>(p.alpha), static_cast<double>(p.red), static_cast<double>(p.green),
-            static_cast<double>(p.blue)};
-}
-
 inline Channels ChannelsAt(const PF_World& world, int32_t x, int32_t y) {
-    switch (world.bitDepth) {
-        case 8:
-            return ChannelsAtX<PF_Pixel8>(world, x, y);
-        case 16:
-            return ChannelsAtX<PF_Pixel16>(world, x, y);
-        default:
-            return ChannelsAtX<PF_PixelFloat>(world, x, y);
-    }
+    return PF_DispatchBitDepth(world.bitDepth, [&]<class P>() {
+        const P& p = *world.PixelAt<P>(x, y);
+        return Channels{double(p.alpha), double(p.red), double(p.green), double(p.blue)};
+    });
 }
 
 // How many pixels of the world are not exactly the colour.

@@ -1,15 +1,66 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <functional>
 
+#include "pf_sampling.h"
+#include "pf_tables.h"
 #include "u_memory.h"
 
 namespace {
 
-int gPurges = 0;
-bool CountPurge() {
-    ++gPurges;
-    return true;
+struct Tracked : U_MemTrackedObject {
+    double payload[8];
+};
+
+// Every allocation of the pixel and utility libraries that can fail: the failure is thrown and
+// the accounted bytes return to where they were before the work began.
+TEST(Memory, FailedAllocationsGiveEverythingBack) {
+    struct Case {
+        const char* name;
+        std::function<void()> run;  // sets up, then makes the next allocation fail
+    };
+    const Case kCases[] = {
+        {"tracked object",
+         [] {
+             U_FailAllocationAfter(1);
+             delete new Tracked;
+         }},
+        {"summed-area table",
+         [] {
+             PF_WorldX<PF_PixelFloat> world(10, 6);
+             U_FailAllocationAfter(1);
+             PF_SummedAreaTable(world, false);
+         }},
+        {"horizontal sum table",
+         [] {
+             PF_WorldX<PF_PixelFloat> world(10, 6);
+             U_FailAllocationAfter(1);
+             PF_HorizontalSumTable<PF_PixelFloat>(world, 0, 0, 0.0, 0, 0, 0, 1, 0, false, nullptr,
+                                                  false);
+         }},
+        {"area-sampling table",
+         [] {
+             PF_WorldX<PF_Pixel8> world(32, 16);
+             PF_SampPB pb;
+             pb.src = &world;
+             PF_Pixel8 out;
+             U_FailAllocationAfter(1);
+             PF_AreaSample(1 << 16, 1 << 16, pb, &out);
+         }},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.name);
+        int64_t start = U_AccountedBytes();
+        EXPECT_THROW(c.run(), std::bad_alloc);
+        EXPECT_EQ(U_AccountedBytes(), start);
+    }
+    // Held objects are accounted while they live.
+    int64_t start = U_AccountedBytes();
+    auto* object = new Tracked;
+    EXPECT_EQ(U_AccountedBytes(), start + static_cast<int64_t>(sizeof(Tracked)));
+    delete object;
+    EXPECT_EQ(U_AccountedBytes(), start);
 }
 
 TEST(Memory, ResizeKeepsContentsAndAFailureKeepsTheBlock) {
@@ -25,74 +76,44 @@ TEST(Memory, ResizeKeepsContentsAndAFailureKeepsTheBlock) {
     U_FreePtr(block);
 }
 
+int gPurges = 0;
+bool gRetryFails = false;
+bool Purge() {
+    ++gPurges;
+    if (gRetryFails) U_FailAllocationAfter(1);
+    return true;
+}
+
+// The purge loop retries once after the host purges; a retry that fails too is reported in the
+// record, not thrown.
 TEST(Memory, PurgeLoopRetriesOnceAfterPurging) {
     struct Case {
         int64_t failAfter;
-        bool succeeds;
-        int purges;
+        bool retryFails;
+        int32_t error;
     };
-    for (const Case& c : {Case{0, true, 0}, Case{1, true, 1}}) {
+    for (const Case& c : {Case{0, false, 0}, Case{1, false, 0}, Case{1, true, kU_ErrOutOfMemory}}) {
+        SCOPED_TRACE(c.failAfter + c.retryFails);
         gPurges = 0;
-        U_SetPurgeHandler(&CountPurge);
+        gRetryFails = c.retryFails;
+        U_SetPurgeHandler(&Purge);
         U_FailAllocationAfter(c.failAfter);
         U_PurgeRecord record;
         record.count = 4;
         EXPECT_EQ(U_PurgeLoop(
                       4 * sizeof(int), [](void* e) { *static_cast<int*>(e) = 7; }, &record, 0),
                   0);
-        EXPECT_EQ(record.array != nullptr, c.succeeds);
-        EXPECT_EQ(gPurges, c.purges);
+        EXPECT_EQ(gPurges, c.failAfter);
+        EXPECT_EQ(record.error, c.error);
+        if (c.error) {
+            EXPECT_EQ(record.array, nullptr);
+            continue;
+        }
         ASSERT_NE(record.array, nullptr);
         EXPECT_EQ(static_cast<int*>(record.array)[3], 7);
         U_FreePtr(record.array);
     }
     U_SetPurgeHandler(nullptr);
-}
-
-TEST(Memory, PurgeLoopReportsExhaustionInTheRecord) {
-    U_FailAllocationAfter(1);
-    // The second allocation (the retry) fails too: make the countdown hit both.
-    U_PurgeRecord record;
-    record.count = 1;
-    U_SetPurgeHandler([] {
-        U_FailAllocationAfter(1);
-        return true;
-    });
-    EXPECT_EQ(U_PurgeLoop(16, nullptr, &record, 0), 0);
-    EXPECT_EQ(record.error, kU_ErrOutOfMemory);
-    EXPECT_EQ(record.array, nullptr);
-    U_SetPurgeHandler(nullptr);
-}
-
-// A frame asks for the blocks the frame before it freed: large ones come back as they were
-// left, small ones and other sizes do not.
-TEST(Memory, LargeBlocksFreedByOneFrameServeTheNext) {
-    constexpr size_t kLarge = 3 << 20;
-    void* first = U_AllocatePtr(0, "frame", kLarge);
-    ASSERT_NE(first, nullptr);
-    static_cast<char*>(first)[kLarge - 1] = 1;
-    U_FreePtr(first);
-    void* other = U_AllocatePtr(0, "frame", kLarge + 16);
-    void* again = U_AllocatePtr(0, "frame", kLarge);
-    EXPECT_NE(other, first);
-    EXPECT_EQ(again, first);
-    U_FreePtr(other);
-    U_FreePtr(again);
-}
-
-struct Tracked : U_MemTrackedObject {
-    double payload[8];
-};
-
-TEST(Memory, TrackedObjectsAreAccounted) {
-    int64_t start = U_AccountedBytes();
-    auto* object = new Tracked;
-    EXPECT_EQ(U_AccountedBytes(), start + static_cast<int64_t>(sizeof(Tracked)));
-    delete object;
-    EXPECT_EQ(U_AccountedBytes(), start);
-    U_FailAllocationAfter(1);
-    EXPECT_THROW(new Tracked, std::bad_alloc);
-    EXPECT_EQ(U_AccountedBytes(), start);
 }
 
 }  // namespace

@@ -1,11 +1,11 @@
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <string>
 #include <vector>
 
 #include "u_report.h"
 #include "u_strings.h"
+#include "zel_ui.h"
 
 namespace {
 
@@ -22,6 +22,9 @@ TEST(Strings, CacheLooksUpDefaultTextsByIndex) {
     EXPECT_EQ(U_ZUnregisterLStrCache(cache), 0);
     EXPECT_STREQ(U_ZLookupLStrCache(cache, 0, 0, 0), "");
     EXPECT_EQ(U_ZUnregisterLStrCache(cache), kU_ErrUnknownCache);
+    EXPECT_EQ(U_ZStringToMBString("$$$/QN/Tessary3d/OptionDlg/ShadowMapSize/750=750"), "750");
+    EXPECT_EQ(U_ZStringToMBString("a=b=c"), "b=c");
+    EXPECT_EQ(U_ZStringToMBString("plain"), "plain");
 }
 
 TEST(Strings, SubStringFillsPlaceholdersWithinTheBuffer) {
@@ -74,6 +77,23 @@ TEST(Reporting, ExceptionsBecomeCodesAndReports) {
     ASSERT_EQ(gTexts.size(), 3u);
     EXPECT_NE(gTexts[1].find("bad thing"), std::string::npos);
     EXPECT_EQ(gCodes[2], 0x13A80002);
+}
+
+// Without a presenter a note prints its title, then its text with line breaks; an installed
+// presenter receives it instead.
+TEST(NoteBox, PrintedOrPresented) {
+    namespace box = zelui::dialogs::messagebox;
+    testing::internal::CaptureStdout();
+    box::ShowNote(nullptr, u"Ostrel 3D", u"First line#{cr}Zweite Zeile \u00e4", nullptr);
+    EXPECT_EQ(testing::internal::GetCapturedStdout(),
+              "Ostrel 3D\nFirst line\nZweite Zeile \xc3\xa4\n");
+    static std::u16string shown;
+    auto previous =
+        box::SetNotePresenter([](void*, const std::u16string& title, const std::u16string& text,
+                                 void*) { shown = title + u"|" + text; });
+    box::ShowNote(nullptr, u"T", u"x", nullptr);
+    box::SetNotePresenter(previous);
+    EXPECT_EQ(shown, u"T|x");
 }
 
 }  // namespace

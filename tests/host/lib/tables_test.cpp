@@ -33,7 +33,10 @@ TYPED_TEST(SummedAreaTables, BoxesEqualBruteForce) {
                          {20, 10, 30, 25},
                          {2.25f, 3.5f, 11.75f, 9.1f},
                          {7.3f, 7.3f, 7.6f, 7.9f},
-                         {-1.5f, 15.5f, 4.5f, 18.25f}};
+                         {-1.5f, 15.5f, 4.5f, 18.25f},
+                         // Empty boxes are clear.
+                         {3, 1, 2, 2},
+                         {2, 2, 2, 3}};
     double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-4 : 1.01 * Step<P>();
     for (bool doubleSums : {false, true}) {
         PF_SummedAreaTable table(world, doubleSums);
@@ -65,36 +68,6 @@ TYPED_TEST(SummedAreaTables, BoxesEqualBruteForce) {
     }
 }
 
-TEST(SummedAreaTable, EmptyBoxesAreTransparent) {
-    PF_WorldX<PF_Pixel8> world(4, 4);
-    pixel_test::FillRandom(world, 1, false);
-    PF_SummedAreaTable table(world, true);
-    PF_Pixel8 out = {1, 2, 3, 4};
-    PF_SummedAreaTable_SampleDraft(4, 4, table.DoubleSums(), 2, 2, 2, 3, &out);
-    EXPECT_EQ(out.alpha + out.red + out.green + out.blue, 0);
-    out = {1, 2, 3, 4};
-    PF_SummedAreaTable_SampleAA(4, 4, table.DoubleSums(), 3.0f, 1.0f, 2.0f, 2.0f, &out);
-    EXPECT_EQ(out.alpha + out.red + out.green + out.blue, 0);
-}
-
-TEST(SummedAreaTable, MemoryIsAccountedAndReturned) {
-    PF_WorldX<PF_PixelFloat> world(10, 6);
-    int64_t withWorld = U_AccountedBytes();
-    {
-        auto* table = new PF_SummedAreaTable(world, true);
-        EXPECT_EQ(U_AccountedBytes() - withWorld,
-                  int64_t(11 * 7 * sizeof(PF_PixelDouble) + sizeof(PF_SummedAreaTable)));
-        delete table;
-    }
-    U_FailAllocationAfter(1);
-    EXPECT_THROW(PF_SummedAreaTable(world, false), std::bad_alloc);
-    U_FailAllocationAfter(1);
-    EXPECT_THROW(PF_HorizontalSumTable<PF_PixelFloat>(world, 0, 0, 0.0, 0, 0, 0, 1, 0, false,
-                                                      nullptr, false),
-                 std::bad_alloc);
-    EXPECT_EQ(U_AccountedBytes(), withWorld);
-}
-
 template <class P>
 class HorizontalSumTables : public ::testing::Test {};
 TYPED_TEST_SUITE(HorizontalSumTables, PixelTypes);
@@ -123,38 +96,51 @@ TYPED_TEST(HorizontalSumTables, SegmentsSumTheirPixels) {
 }
 
 // Pixels above the threshold gain up to highlightGain, ramping in between the threshold and
-// full scale; saturation pushes channels away from the luminosity.
-TEST(HorizontalSumTable, HighlightsAreBoosted) {
-    PF_WorldX<PF_PixelFloat> world(3, 1);
-    world.At(0, 0) = {1, 1, 1, 1};              // luminosity 1: full boost
-    world.At(1, 0) = {1, 0.75f, 0.75f, 0.75f};  // halfway between 0.5 and 1: half boost
-    world.At(2, 0) = {0.5f, 0.4f, 0.4f, 0.4f};  // below the threshold: as it is
-    PF_HorizontalSumTable<PF_PixelFloat> table(world, 0, 0, 0.0, 1.0, 0.5, 0.0, 1, 0, false,
-                                               nullptr, false);
-    EXPECT_NEAR(table.SegmentSum(0, 0, 1).red, 2.0, 1e-6);
-    EXPECT_NEAR(table.SegmentSum(0, 1, 2).red, 0.75 * 1.5, 1e-6);
-    EXPECT_NEAR(table.SegmentSum(0, 2, 3).red, 0.5 * 0.4, 1e-6);
-    EXPECT_NEAR(table.SegmentSum(0, 2, 3).alpha, 0.5, 1e-6);
-
-    PF_WorldX<PF_PixelFloat> red(1, 1);
-    red.At(0, 0) = {1, 1, 0.5f, 0.5f};  // luminosity 0.3 + 0.295 + 0.055 = 0.65
-    PF_HorizontalSumTable<PF_PixelFloat> saturated(red, 0, 0, 0.0, 0.0, 0.0, 1.0, 1, 0, false,
-                                                   nullptr, false);
-    // Ramp 0.65: spread 1.65 about 0.65.
-    EXPECT_NEAR(saturated.SegmentSum(0, 0, 1).red, 0.65 + 0.35 * 1.65, 1e-6);
-    EXPECT_NEAR(saturated.SegmentSum(0, 0, 1).green, 0.65 - 0.15 * 1.65, 1e-6);
-
-    // One stop of exposure doubles colour; float colour above 1 is clipped unless kept.
-    PF_HorizontalSumTable<PF_PixelFloat> exposed(world, 0, 0, 1.0, 0, 0, 0, 1, 0, false, nullptr,
-                                                 false);
-    EXPECT_NEAR(exposed.SegmentSum(0, 2, 3).red, 0.5 * 0.8, 1e-6);
-    world.At(2, 0).red = 3.0f;
-    PF_HorizontalSumTable<PF_PixelFloat> clipped(world, 0, 0, 0.0, 0, 0, 0, 1, 0, false, nullptr,
-                                                 false);
-    PF_HorizontalSumTable<PF_PixelFloat> kept(world, 0, 0, 0.0, 0, 0, 0, 1, 0, false, nullptr,
-                                              true);
-    EXPECT_NEAR(clipped.SegmentSum(0, 2, 3).red, 0.5, 1e-6);
-    EXPECT_NEAR(kept.SegmentSum(0, 2, 3).red, 1.5, 1e-6);
+// full scale; saturation pushes channels away from the luminosity; exposure comes first, in
+// stops; float colour above 1 is clipped unless kept. Sums are premultiplied.
+TEST(HorizontalSumTable, ExposureHighlightsAndRange) {
+    struct Case {
+        const char* what;
+        PF_PixelFloat pixel;
+        double exposure, gain, threshold, saturation;
+        bool keep;
+        double red, green;
+    };
+    const Case kCases[] = {
+        {"luminosity 1: full boost", {1, 1, 1, 1}, 0, 1, 0.5, 0, false, 2.0, 2.0},
+        {"halfway to full: half boost",
+         {1, 0.75f, 0.75f, 0.75f},
+         0,
+         1,
+         0.5,
+         0,
+         false,
+         1.125,
+         1.125},
+        {"below the threshold", {0.5f, 0.4f, 0.4f, 0.4f}, 0, 1, 0.5, 0, false, 0.2, 0.2},
+        // Luminosity 0.3 + 0.295 + 0.055 = 0.65, ramp 0.65: spread 1.65 about 0.65.
+        {"saturation",
+         {1, 1, 0.5f, 0.5f},
+         0,
+         0,
+         0,
+         1,
+         false,
+         0.65 + 0.35 * 1.65,
+         0.65 - 0.15 * 1.65},
+        {"one stop", {0.5f, 0.4f, 0.4f, 0.4f}, 1, 0, 0, 0, false, 0.4, 0.4},
+        {"clipped", {0.5f, 3, 0.4f, 0.4f}, 0, 0, 0, 0, false, 0.5, 0.2},
+        {"kept", {0.5f, 3, 0.4f, 0.4f}, 0, 0, 0, 0, true, 1.5, 0.2},
+    };
+    for (const Case& c : kCases) {
+        SCOPED_TRACE(c.what);
+        PF_WorldX<PF_PixelFloat> world(1, 1);
+        world.At(0, 0) = c.pixel;
+        PF_HorizontalSumTable<PF_PixelFloat> table(world, 0, 0, c.exposure, c.gain, c.threshold,
+                                                   c.saturation, 1, 0, false, nullptr, c.keep);
+        EXPECT_NEAR(table.SegmentSum(0, 0, 1).red, c.red, 1e-6);
+        EXPECT_NEAR(table.SegmentSum(0, 0, 1).green, c.green, 1e-6);
+    }
 }
 
 TEST(HorizontalSumTable, LinearLightUsesTheTablesExponent) {
