@@ -12,23 +12,6 @@ M_Matrix4 Identity() {
     return m;
 }
 
-TEST(Matrix, InverseAndConcatenation) {
-    M_Matrix4 m = Identity();
-    M_ScaleMatrix4(2, 4, 8, &m);
-    M_RotateMatrix4XYZ(0.3, -0.7, 1.1, &m);
-    M_TranslateMatrix4(5, -6, 7, &m);
-    M_Matrix4 inverse, product;
-    ASSERT_EQ(M_InverseMatrix4Quiet(&m, &inverse), 0);
-    ASSERT_EQ(M_ConcatMatrix4(&m, &inverse, &product), 0);
-    for (int i = 0; i < 4; ++i) {
-        for (int j = 0; j < 4; ++j)
-            EXPECT_NEAR(product.mat[i][j], i == j ? 1 : 0, 1e-12);
-    }
-    // In place, too.
-    ASSERT_EQ(M_InverseMatrix4Quiet(&m, &m), 0);
-    EXPECT_NEAR(m.mat[3][0], inverse.mat[3][0], 1e-15);
-}
-
 TEST(Matrix, SingularInverseFails) {
     M_Matrix4 m = Identity();
     M_ScaleMatrix4(1, 0, 1, &m);

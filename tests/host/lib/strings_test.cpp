@@ -3,7 +3,6 @@
 #include <string>
 #include <vector>
 
-#include "u_report.h"
 #include "u_strings.h"
 #include "zel_ui.h"
 
@@ -46,37 +45,6 @@ TEST(Strings, SubStringFillsPlaceholdersWithinTheBuffer) {
         EXPECT_STREQ(buffer.data(), c.expected);
         EXPECT_EQ(buffer[c.capacity], 'X') << "wrote past the buffer";
     }
-}
-
-std::vector<std::string> gTexts;
-std::vector<int32_t> gCodes;
-void Capture(const U_Report& report) {
-    gTexts.emplace_back(report.text);
-    gCodes.push_back(report.code);
-}
-
-TEST(Reporting, ExceptionsBecomeCodesAndReports) {
-    gTexts.clear();
-    gCodes.clear();
-    U_Reporter previous = U_SetReporter(&Capture);
-    int32_t memory = 0, other = 0;
-    try {
-        throw std::bad_alloc();
-    } catch (...) {
-        memory = U_TranslateAndReportException();
-    }
-    try {
-        throw std::runtime_error("bad thing");
-    } catch (...) {
-        other = U_TranslateAndReportException();
-    }
-    Up_ReportErrString(0x13A80002, 8, "Ostrel 3D: Could not acquire TOMA suite.");
-    U_SetReporter(previous);
-    EXPECT_EQ(memory, 4);
-    EXPECT_EQ(other, kU_ErrInternal);
-    ASSERT_EQ(gTexts.size(), 3u);
-    EXPECT_NE(gTexts[1].find("bad thing"), std::string::npos);
-    EXPECT_EQ(gCodes[2], 0x13A80002);
 }
 
 // Without a presenter a note prints its title, then its text with line breaks; an installed
