@@ -166,8 +166,9 @@ TEST(AreaTable, FloatTexelsThatAreNotNumbersAddNothing) {
 }
 
 // Many threads take their first area sample of a texture at once: one table is built and
-// every thread sees it whole.
+// every thread sees it whole. It is given back with its world.
 TEST(AreaTableThreads, ConcurrentFirstUse) {
+    const int64_t start = U_AccountedBytes();
     for (int round = 0; round < 20; ++round) {
         PF_WorldX<PF_Pixel8> world(64, 48);
         pixel_test::FillRandom(world, 100 + round);
@@ -191,6 +192,7 @@ TEST(AreaTableThreads, ConcurrentFirstUse) {
             EXPECT_EQ(std::tuple(r.alpha, r.red, r.blue),
                       std::tuple(results[0].alpha, results[0].red, results[0].blue));
     }
+    EXPECT_EQ(U_AccountedBytes(), start);
 }
 
 }  // namespace
