@@ -1,26 +1,18 @@
 #include <gtest/gtest.h>
 
-#include <cmath>
-
 #include "m_matrix.h"
 
 namespace {
 
-M_Matrix4 Identity() {
-    M_Matrix4 m;
-    M_IdentityMatrix4(&m);
-    return m;
-}
-
 TEST(Matrix, SingularInverseFails) {
-    M_Matrix3 flat{};
-    M_Matrix3 flatOut;
-    EXPECT_EQ(M_InverseMatrix(&flat, &flatOut), kM_ErrSingularMatrix);
+    M_Matrix3 flat{}, out;
+    EXPECT_EQ(M_InverseMatrix(&flat, &out), kM_ErrSingularMatrix);
 }
 
 TEST(Matrix, ProjectMapsTheZoomPlaneOneToOne) {
     // Eye point (x, y, z): screen x = x·zoom/z, depth = zoom/z (nearer is larger).
-    M_Matrix4 m = Identity();
+    M_Matrix4 m;
+    M_IdentityMatrix4(&m);
     m.Project(1000);
     double out[4];
     double at[4] = {30, -40, 1000, 1};

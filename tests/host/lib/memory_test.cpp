@@ -9,10 +9,6 @@
 
 namespace {
 
-struct Tracked : U_MemTrackedObject {
-    double payload[8];
-};
-
 // Every allocation of the pixel and utility libraries that can fail: the failure is thrown and
 // the accounted bytes return to where they were before the work began.
 TEST(Memory, FailedAllocationsGiveEverythingBack) {
@@ -21,11 +17,6 @@ TEST(Memory, FailedAllocationsGiveEverythingBack) {
         std::function<void()> run;  // sets up, then makes the next allocation fail
     };
     const Case kCases[] = {
-        {"tracked object",
-         [] {
-             U_FailAllocationAfter(1);
-             delete new Tracked;
-         }},
         {"summed-area table",
          [] {
              PF_WorldX<PF_PixelFloat> world(10, 6);
