@@ -9,23 +9,6 @@ TEST(Matrix, SingularInverseFails) {
     EXPECT_EQ(M_InverseMatrix(&flat, &out), kM_ErrSingularMatrix);
 }
 
-TEST(Matrix, ProjectMapsTheZoomPlaneOneToOne) {
-    // Eye point (x, y, z): screen x = x·zoom/z, depth = zoom/z (nearer is larger).
-    M_Matrix4 m;
-    M_IdentityMatrix4(&m);
-    m.Project(1000);
-    double out[4];
-    double at[4] = {30, -40, 1000, 1};
-    M_TransformVector4NoDivide(&m, at, out);
-    EXPECT_DOUBLE_EQ(out[0] / out[3], 30);
-    EXPECT_DOUBLE_EQ(out[1] / out[3], -40);
-    EXPECT_DOUBLE_EQ(out[2] / out[3], 1);
-    double far[4] = {30, -40, 2000, 1};
-    M_TransformVector4NoDivide(&m, far, out);
-    EXPECT_DOUBLE_EQ(out[0] / out[3], 15);
-    EXPECT_DOUBLE_EQ(out[2] / out[3], 0.5);
-}
-
 TEST(Matrix, TranslateMatrix3MovesMappedPoints) {
     M_Matrix3 m;
     M_SetIdentityMatrix(&m);
