@@ -86,15 +86,9 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
         {"{\n  \"width\": 10,\n  \"height\" 10\n}",
          "bad.json: malformed JSON: line 3, column 13: syntax error while parsing object "
          "separator"},
-        {R"({"width": "wide", "height": 10, "duration": 1})",
-         "bad.json: width: expected a number, got a string"},
-        {R"({"width": 0, "height": 10, "duration": 1})",
-         "bad.json: width: must be between 1 and 30000, got 0"},
         {R"({"width": 10, "duration": 1})", "bad.json: height: is required"},
         {R"({"width": 10, "height": 10, "duration": 1, "bitDepth": 12})",
          "bad.json: bitDepth: must be 8, 16 or 32, got 12"},
-        {R"({"width": 10, "height": 10, "duration": 1, "hieght": 5})",
-         "bad.json: unknown key \"hieght\" (did you mean \"height\"?)"},
         {WithLayers(R"({"kind": "sprite"})"),
          "bad.json: layers[0].kind: unknown value \"sprite\"; expected one of \"image\", "
          "\"solid\""},
@@ -109,8 +103,6 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
              R"(, "transform": {"opacity": {"keyframes": [{"time": 1, "value": 5}, {"time": 1, "value": 6}]}}})"),
          "bad.json: layers[0].transform.opacity.keyframes[1].time: keyframe times must increase, "
          "got 1 after 1"},
-        {WithLayers(R"({"kind": "solid", "source": {"color": [1, 1, 2]}})"),
-         "bad.json: layers[0].source.color[2]: must be between 0 and 1, got 2"},
         {WithLayers("{" + solid + R"(, "in": 2, "out": 1})"),
          "bad.json: layers[0].out: must be after the in time"},
         {WithLayers(R"({"kind": "camera", "material": {}})"),
@@ -125,8 +117,6 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
          "from"},
         {WithLayers(R"({"name": "n", "kind": "null"}, {)" + solid + R"(, "trackMatte": "alpha"})"),
          "bad.json: layers[1].trackMatte: layer \"n\" has no pixels to make a matte from"},
-        {WithLayers(R"({"kind": "image", "source": "missing.png"})"),
-         "bad.json: layers[0].source: cannot read image '"},
         {WithLayers(
              R"({"kind": "solid", "source": {"color": "#336699", "unbounded": true, "width": 20}})"),
          "bad.json: layers[0].source.width: an unbounded solid has no size"},
