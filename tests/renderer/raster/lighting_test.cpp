@@ -6,11 +6,11 @@
 #include <tuple>
 #include <vector>
 
-#include "../scene/frame_test_support.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
 #include "renderer/scene/renderable.h"
 #include "renderer/scene/specular_table.h"
+#include "tests/renderer/renderer_test_support.h"
 #include "u_memory.h"
 
 namespace {
@@ -238,7 +238,7 @@ TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
     auto shader = LitShader({&ambient, &onSurface});
     shader->material.ambient = 1;
     shader->material.diffuse = 1;
-    ostrel_test::ReportCapture capture;
+    renderer_test::ReportCapture capture;
     EXPECT_NEAR(LightAt(*shader, 5, 5).diffuse[0], 0.2, 1e-6);
     EXPECT_TRUE(capture.reports().empty());
     shader->eye[2] = 0;
