@@ -257,13 +257,6 @@ TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
     EXPECT_THROW(shader->LightTwoPixels(elsewhere, onEye, kFront, &a, &b), int32_t);
 }
 
-SY_TRLayer Renderable(const SY_LayerDesc& layer, std::vector<const SY_LightState*> lights) {
-    SY_TRLayer renderable(layer);
-    renderable.lights.Allocate(static_cast<int32_t>(lights.size()));
-    std::copy(lights.begin(), lights.end(), renderable.lights.begin());
-    return renderable;
-}
-
 // Which work a layer's pixels need, by its switches and lights, and what the frame adds to
 // its material: the camera as the eye, a depth offset that puts later layers (here the fifth)
 // behind, filtered shadow edges for best quality (every other case), and the table of the
@@ -307,7 +300,10 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
             layer.material.acceptsLights = c.acceptsLights;
             layer.material.acceptsShadows = c.acceptsShadows;
             layer.material.specular = c.specular;
-            auto shader = SY_MakeLayerShader(&context, Renderable(layer, c.lights));
+            SY_TRLayer renderable(layer);
+            renderable.lights.Allocate(static_cast<int32_t>(c.lights.size()));
+            std::copy(c.lights.begin(), c.lights.end(), renderable.lights.begin());
+            auto shader = SY_MakeLayerShader(&context, std::move(renderable));
             EXPECT_EQ(shader->shaded, c.shaded) << c.what;
             EXPECT_EQ(shader->NeedsSurfacePoint(), c.needsPoint) << c.what;
             EXPECT_EQ(shader->specularTable != nullptr, c.table) << c.what;
