@@ -185,6 +185,25 @@ TYPED_TEST(MBufferDraftByDepth, TheNearestRecordShowsWhateverTheOrder) {
     }
 }
 
+TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
+    struct Case {
+        M_LRect bounds;
+        std::vector<std::pair<int32_t, int32_t>> reports;
+    };
+    const Case cases[] = {
+        {{0, 0, 2, 70}, {{0, 70}, {32, 70}, {64, 70}}},
+        {{0, 40, 2, 100}, {{24, 60}, {56, 60}}},  // a band from row 40 first reports at 64
+        {{0, 33, 2, 63}, {}},
+    };
+    for (const Case& c : cases) {
+        PF_WorldX<PF_Pixel8> world(2, c.bounds.bottom);
+        SY_MBufferDraftX<PF_Pixel8> buffer(c.bounds);
+        renderer_test::RecordingProgress progress;
+        buffer.Resolve(&progress, nullptr, world);
+        EXPECT_EQ(progress.rows, c.reports) << "rows from " << c.bounds.top;
+    }
+}
+
 // A draft blends plainly whatever tables it is handed: half-alpha red over opaque blue is
 // 255 − 127.5 → 128 red and 127 blue. A cancel thrown from the report before row 32 leaves
 // the rows above it resolved.

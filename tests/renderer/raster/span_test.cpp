@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <type_traits>
 
 #include "raster_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
@@ -174,6 +175,17 @@ TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     }
 }
 
+// Under a perspective camera W = 1 − x/8 falls to 0 at x = 8: the plane lies behind the camera
+// from there on and the image span draws nothing.
+TYPED_TEST(Span, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
+    using P = TypeParam;
+    this->SetPlane(Plane(1, -0.125), true);
+    PF_WorldX<P> destination(kWidth, kHeight);
+    this->Draw(true, SY_RenderTarget(destination), 0, kWidth, 0);
+    for (int32_t x = 0; x < kWidth; ++x)
+        EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
+}
+
 // W = 2 + x/4: a fragment's key is W at its pixel's top-left corner less one W extent (¼),
 // plus the layer's offset (−⅛), from either dispatcher; a transparent image pixel adds none.
 // Two subsamples whose W differ by −2 over the shutter key from the smaller W at the pixel
@@ -209,6 +221,23 @@ TYPED_TEST(Span, FragmentKeysLieOneExtentBelowThePixelsCorner) {
             EXPECT_FLOAT_EQ(f->depth, c.keyAtZero + x * 0.25) << x << " case " << &c - cases;
             EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
         }
+    }
+}
+
+// Both dispatchers refuse a texture whose depth differs from the target's: reported, thrown 3.
+TYPED_TEST(Span, TextureOfAnotherDepthIsReportedAndThrowsThree) {
+    using Other = std::conditional_t<std::is_same_v<TypeParam, PF_Pixel8>, PF_Pixel16, PF_Pixel8>;
+    PF_WorldX<Other> destination(kWidth, kHeight);
+    for (bool image : {false, true}) {
+        renderer_test::ReportCapture capture;
+        int32_t thrown = 0;
+        try {
+            this->Draw(image, SY_RenderTarget(destination), 0, 4, 0);
+        } catch (int32_t code) {
+            thrown = code;
+        }
+        EXPECT_EQ(thrown, 3) << image;
+        EXPECT_EQ(capture.reports().size(), 1u) << image;
     }
 }
 

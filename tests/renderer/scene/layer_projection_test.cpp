@@ -139,4 +139,17 @@ TEST(LayerProjection, LayersThatCannotBeSeenProjectToNothing) {
     }
 }
 
+TEST(LayerProjection, MismatchedSubsampleCountsReportMessageOne) {
+    M_Matrix4 cameras[3] = {DefaultCamera(kWidth, kHeight, kDistance, true), cameras[0],
+                            cameras[0]};
+    Projection p(20, 20, {Translation(50, 40, 0), Translation(60, 40, 0)});
+    SY_TRLayer renderable(p.layer);
+    renderer_test::ReportCapture capture;
+    EXPECT_THROW(SY_SetUpRenderable(p.layer, {cameras, 3, true}, OutputOptions(), &renderable),
+                 int32_t);
+    ASSERT_EQ(capture.reports().size(), 1u);
+    EXPECT_EQ(capture.reports()[0].text,
+              "Tessary 3D: Layer and camera geometry subsamples do not match.");
+}
+
 }  // namespace
