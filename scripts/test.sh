@@ -9,11 +9,13 @@ bash scripts/setup.sh
 
 # Under the thread sanitizer only the programs with threaded cases are built and run.
 run_preset() {
-    local preset=$1
+    local preset=$1 start=$SECONDS built
     shift
     cmake --preset "$preset" >/dev/null
     cmake --build --preset "$preset" "$@"
+    built=$SECONDS
     ctest --preset "$preset"
+    echo "== $preset: built in $((built - start)) s, tested in $((SECONDS - built)) s"
 }
 
 run_preset default

@@ -7,10 +7,8 @@
 #include "instance_options.h"
 #include "qngp_suites.h"
 #include "render_context.h"
-#include "render_entry.h"
 #include "renderer/scene/messages.h"
 #include "renderer/scene/scene_print.h"
-#include "resources/ormond_strings.h"
 #include "scene_assembly.h"
 #include "served_frame.h"
 #include "suites/memory_suite.h"
@@ -44,15 +42,6 @@ const QNGP_InData kInData{SuiteRegistry::BasicSuite(), 1};
 
 class Capture : public testing::Test {
 protected:
-    void SetUp() override {
-        ASSERT_EQ(ORM_RegisterStrings(), 0);
-        ASSERT_EQ(SY_RegisterStrings(), 0);
-    }
-    void TearDown() override {
-        SY_UnregisterStrings();
-        ORM_UnregisterStrings();
-    }
-
     // The render context of a frame for as long as a test needs it, as the render entry makes it.
     class Frame {
     public:
@@ -132,19 +121,13 @@ const std::string kOrthographicCamera = R"(
      "irisShape": "hexagon", "irisRoundness": 30, "highlightThreshold": 200}}},
 )";
 
-TEST_F(Capture, OrthographicCameraRegionAndDownsample) {
+TEST_F(Capture, OrthographicCameraAndDownsampleReachTheDepthOfField) {
     RenderSettings settings;
     settings.downsampleX = 2;
     settings.downsampleY = 4;
-    settings.region = M_LRect{100, 50, 500, 450};
     ServedFrame frame(CompJson("", kOrthographicCamera + kMovingCard), 0, settings);
     SY_SceneDesc scene;
     Assemble(frame, &scene);
-    // The comp's centre (480, 270) is the eye's axis: on screen it lands at
-    // ((480 − 100) / 2, (270 − 50) / 4).
-    const M_Matrix4& screen = scene.frameProjection;
-    EXPECT_EQ(std::tuple(screen.mat[3][0], screen.mat[3][1], screen.mat[0][0], screen.mat[1][1]),
-              std::tuple(190, 55, 0.5, 0.25));
     EXPECT_EQ(std::tuple(scene.downsampleX, scene.dof.downsampleY), std::tuple(2, 4));
     // An orthographic camera has no zoom; the depth of field's percentages become fractions.
     EXPECT_FALSE(scene.perspective);
@@ -250,38 +233,6 @@ TEST_F(Capture, TrackMatteFetchedFromTheMatteLayer) {
         scene.layers[0].trackMatte->Release();
     }
     EXPECT_EQ(U_AccountedBytes(), startBytes);
-}
-
-TEST_F(Capture, FramesThroughTheEntryLeaveNothingBehind) {
-    const std::string kOdd = R"(
-      {"name": "fine", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
-      {"name": "odd", "kind": "solid", "threeD": true, "transferMode": "sparkle",
-       "source": {"color": "#ffffff"}})";
-    struct Case {
-        const char* name;
-        std::string layers;
-        int32_t frame, result;
-    };
-    const Case kCases[] = {
-        {"a frame that renders", kLitCards + "," + kMovingCard, 12, 0},
-        {"a frame that fails in capture", kOdd, 3, kQNGP_ErrHostFailure},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(c.name);
-        int64_t startBytes = U_AccountedBytes();
-        int64_t startHandles = LiveMemoryHandles();
-        {
-            ServedFrame frame(CompJson(kBlur, c.layers), c.frame);
-            Options options;
-            EXPECT_EQ(ORM_Render(&kInData, nullptr, nullptr, frame.Render(), nullptr, options.Get(),
-                                 nullptr),
-                      c.result);
-            EXPECT_EQ(LockedMemoryHandles(), 0);
-            EXPECT_EQ(SuiteRegistry::Instance().Outstanding(), 0);
-        }
-        EXPECT_EQ(LiveMemoryHandles(), startHandles);
-        EXPECT_EQ(U_AccountedBytes(), startBytes);
-    }
 }
 
 }  // namespace

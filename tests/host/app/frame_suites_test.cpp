@@ -13,36 +13,23 @@
 namespace ostrel {
 namespace {
 
-// Top to bottom: a camera, a light that reaches only the layers below it, a null, two 3-D
-// solids (the second matted by the first), a 2-D solid, and a switched-off 3-D solid.
-const std::string kLayers = R"(
-  {"name": "cam", "kind": "camera", "transform": {"position": [480, 270, -1000]},
-   "camera": {"orthographic": true}},
-  {"name": "sun", "kind": "light", "light": {"type": "spot", "intensity": 50,
-   "color": [1, 0.5, 0.25], "lightsOnlyLayersBelow": true}},
-  {"name": "rig", "kind": "null", "threeD": true, "transform": {"position": [100, 0, 0]}},
-  {"name": "stencil", "kind": "solid", "threeD": true,
-   "source": {"color": "#ffffff", "width": 101, "height": 51}},
-  {"name": "card", "kind": "solid", "threeD": true, "parent": "rig", "motionBlur": true,
-   "collapse": true, "preserveTransparency": true, "trackMatte": "luma-inverted",
-   "quality": "draft", "sampling": "bicubic",
-   "source": {"color": "#ff0000", "width": 200, "height": 100},
-   "transform": {"anchorPoint": [0, 0, 0], "position": [10, 20, 30],
-                 "scale": [50, 25, 100], "opacity": 40}},
-  {"name": "flat", "kind": "solid", "source": {"color": "#00ff00"}},
-  {"name": "off", "kind": "solid", "threeD": true, "on": false, "source": {"color": "#0000ff"}}
+// Top to bottom: an unbounded white veil that serves as the card's matte, the card, and an
+// unbounded wall behind it.
+const std::string kBackdrop = R"(
+  {"name": "veil", "kind": "solid", "threeD": true,
+   "source": {"color": "#ffffff", "unbounded": true}},
+  {"name": "card", "kind": "solid", "threeD": true, "trackMatte": "alpha",
+   "source": {"color": "#ff0000", "width": 65, "height": 33}},
+  {"name": "wall", "kind": "solid", "threeD": true,
+   "source": {"color": "#336699", "unbounded": true}}
 )";
-
-const std::string kSettings =
-    R"("pixelAspect": 0.9, "lightsAndDepthOfField": false,
-       "motionBlur": {"enabled": true, "samplesPerFrame": 12})";
 
 // Frames of one run share each layer's texture, made once.
 TEST(CanvasSuite, TexturesAreSharedAcrossTheFramesOfARun) {
     int64_t startBytes = U_AccountedBytes();
     {
         HostSuites suites;
-        Composition comp = ParseComposition(CompJson(kSettings, kLayers), "test.json");
+        Composition comp = ParseComposition(CompJson("", kBackdrop), "test.json");
         ImageCache images;
         // Both frames hold the texture at once: without sharing they would hold two worlds.
         FrameSession first(comp, images, {}, 0), second(comp, images, {}, 1);
@@ -62,60 +49,26 @@ TEST(CanvasSuite, TexturesAreSharedAcrossTheFramesOfARun) {
     EXPECT_EQ(U_AccountedBytes(), startBytes);
 }
 
-// Top to bottom: an unbounded white veil that serves as the card's matte, the card, and an
-// unbounded wall behind it.
-const std::string kBackdrop = R"(
-  {"name": "veil", "kind": "solid", "threeD": true,
-   "source": {"color": "#ffffff", "unbounded": true}},
-  {"name": "card", "kind": "solid", "threeD": true, "trackMatte": "alpha",
-   "source": {"color": "#ff0000", "width": 65, "height": 33}},
-  {"name": "wall", "kind": "solid", "threeD": true,
-   "source": {"color": "#336699", "unbounded": true}}
-)";
-
 TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
+    using Size = std::tuple<int32_t, int32_t>;
     struct Case {
-        const char* name;
-        int16_t bitDepth;
-        int16_t dx, dy;
+        int16_t bitDepth, dx, dy;
         std::optional<M_LRect> region;
-        int32_t width, height;                // the output
-        int32_t textureWidth, textureHeight;  // the comp at the downsample
-        int32_t cardWidth, cardHeight;        // the 65 × 33 card: rounded up
-        Channels wall;                        // #336699, opaque
+        Size output, texture;  // the texture: the comp at the downsample
+        Size card;             // the 65 × 33 card: rounded up
+        Channels wall;         // #336699, opaque
     };
+    const M_LRect kRegion{100, 50, 401, 250};
     const Case kCases[] = {
-        {"8 bits", 8, 1, 1, std::nullopt, 960, 540, 960, 540, 65, 33, {255, 51, 102, 153}},
-        // trunc(c × 32768 + 0.5) of 0.2, 0.4 and 0.6.
-        {"16 bits, 2 × 3",
-         16,
-         2,
-         3,
-         std::nullopt,
-         480,
-         180,
-         480,
-         180,
-         33,
-         11,
-         {32768, 6554, 13107, 19661}},
+        {8, 1, 1, {}, {960, 540}, {960, 540}, {65, 33}, {255, 51, 102, 153}},
+        // At 2 × 3; trunc(c × 32768 + 0.5) of 0.2, 0.4 and 0.6.
+        {16, 2, 3, {}, {480, 180}, {480, 180}, {33, 11}, {32768, 6554, 13107, 19661}},
         // The 301 × 200 region at half size: ceil(301 / 2) × 100.
-        {"float, region, 2 × 2",
-         32,
-         2,
-         2,
-         M_LRect{100, 50, 401, 250},
-         151,
-         100,
-         480,
-         270,
-         33,
-         17,
-         {1, 0.2f, 0.4f, 0.6f}},
+        {32, 2, 2, kRegion, {151, 100}, {480, 270}, {33, 17}, {1, .2f, .4f, .6f}},
     };
     const QNGP_CanvasSuite13& canvas = *CanvasSuite();
     for (const Case& c : kCases) {
-        SCOPED_TRACE(c.name);
+        SCOPED_TRACE(c.bitDepth);
         int64_t startBytes = U_AccountedBytes();
         {
             RenderSettings settings;
@@ -131,15 +84,14 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             ASSERT_EQ(
                 canvas.RenderLayer(render, frame.Layer(2), wall, kQNGP_RenderWholeLayer, &world),
                 0);
-            EXPECT_EQ(std::tuple(world->width, world->height), std::tuple(c.width, c.height));
+            EXPECT_EQ(Size(world->width, world->height), c.output);
             EXPECT_EQ(PixelsOtherThan(*world, c.wall), 0);
             EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
 
             // Textures (which frames do not ask for) cover the source rectangle.
             M_Matrix3 source{};
             ASSERT_EQ(canvas.RenderTexture(render, wall, 1, nullptr, nullptr, &source, &world), 0);
-            EXPECT_EQ(std::tuple(world->width, world->height),
-                      std::tuple(c.textureWidth, c.textureHeight));
+            EXPECT_EQ(Size(world->width, world->height), c.texture);
             EXPECT_EQ(canvas.DisposeTexture(render, wall, world), 0);
 
             // The veil as the card's matte: output-sized, white and opaque everywhere.
@@ -148,15 +100,14 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
             ASSERT_EQ(canvas.RenderLayer(render, frame.Layer(0), veil, kQNGP_RenderMatte, &world),
                       0);
             std::unique_ptr<PF_World> matte(world);
-            EXPECT_EQ(std::tuple(matte->width, matte->height), std::tuple(c.width, c.height));
+            EXPECT_EQ(Size(matte->width, matte->height), c.output);
             double max = c.wall[0];
             EXPECT_EQ(PixelsOtherThan(*matte, {max, max, max, max}), 0);
             EXPECT_EQ(canvas.RenderLayer(render, frame.Layer(0), veil, 7, &world),
                       kQNGP_ErrBadArgument);
             EXPECT_EQ(canvas.DisposeTexture(render, wall, matte.get()), kQNGP_ErrBadHandle);
             ASSERT_EQ(canvas.RenderTexture(render, card, 1, nullptr, nullptr, &source, &world), 0);
-            EXPECT_EQ(std::tuple(world->width, world->height),
-                      std::tuple(c.cardWidth, c.cardHeight));
+            EXPECT_EQ(Size(world->width, world->height), c.card);
             EXPECT_EQ(canvas.DisposeTexture(render, card, world), 0);
             // A texture left out: the session takes it back when it ends.
             ASSERT_EQ(canvas.RenderTexture(render, wall, 1, nullptr, nullptr, &source, &world), 0);
@@ -165,20 +116,12 @@ TEST(CanvasSuite, UnboundedLayersComeInOutputCoordinates) {
     }
 }
 
-TEST(CanvasSuite, RegionDownsampleAndFieldsShapeTheFrame) {
+TEST(CanvasSuite, LowerFieldFirstRendersOddRowsThenEvenRowsHalfAFrameLater) {
     RenderSettings settings;
-    settings.downsampleX = 2;
-    settings.downsampleY = 2;
-    settings.region = M_LRect{100, 50, 401, 250};
     settings.fields = RenderSettings::Fields::kLowerFirst;
-    ServedFrame frame(CompJson("", kLayers), 24, settings);
+    ServedFrame frame(CompJson("", kBackdrop), 24, settings);
     const QNGP_CanvasSuite13& canvas = *CanvasSuite();
     QNGP_RenderContextH render = frame.Render();
-    PF_World* destination = nullptr;
-    ASSERT_EQ(canvas.GetCompDestination(render, frame.Comp(), &destination), 0);
-    EXPECT_EQ(std::tuple(destination->width, destination->height), std::tuple(151, 100));
-
-    // Lower field first: odd rows at the frame's time, then even rows half a frame later.
     ASSERT_EQ(frame.Session().PassCount(), 2);
     const std::tuple<int32_t, double> kPasses[] = {{2, 1.0}, {1, 1.0 + 1.0 / 48}};
     for (int32_t pass = 0; pass < 2; ++pass) {
@@ -196,7 +139,7 @@ TEST(CanvasSuite, ProgressAnswersTheUsersCancel) {
         bool Renderables(int32_t done, int32_t) override { return done < 2; }
         bool Rows(int32_t, int32_t) override { return true; }
     } progress;
-    ServedFrame frame(CompJson("", kLayers));
+    ServedFrame frame(CompJson("", kBackdrop));
     const QNGP_CanvasSuite13& canvas = *CanvasSuite();
     frame.Session().SetProgress(&progress);
     EXPECT_EQ(canvas.ReportRenderProgress(frame.Render(), 1, 3), 0);

@@ -52,20 +52,6 @@ TEST_F(ImageCacheTest, GreyFileFillsAllThreeColors) {
               (Channels{255, 77, 77, 77}));
 }
 
-TEST_F(ImageCacheTest, DownsampleAveragesBlocksByAlpha) {
-    // 3 × 2 at 2 × 2 gives 2 × 1. The left block holds opaque red and blue and two clear
-    // pixels: half covered, half red and half blue, nothing of the clear pixels' colour. The
-    // right block, cut short by the edge, is opaque green.
-    auto file = folder_.WriteImage<uint8_t>("blocks.png", 3, 2, 4,
-                                            {255, 0, 0,   255, 0,   255, 255, 0, 0, 255, 0, 255,  //
-                                             0,   0, 255, 255, 255, 255, 0,   0, 0, 255, 0, 255});
-    auto world = LayerSource(cache_, ImageLayer(file, 3, 2), 8, 2, 2);
-    ASSERT_EQ(world->width, 2);
-    ASSERT_EQ(world->height, 1);
-    EXPECT_EQ(ChannelsAt(*world, 0, 0), (Channels{128, 128, 0, 128}));
-    EXPECT_EQ(ChannelsAt(*world, 1, 0), (Channels{255, 0, 255, 0}));
-}
-
 TEST_F(ImageCacheTest, WorldsReturnTheirMemoryAlsoWhenAllocationFails) {
     auto file = folder_.WriteImage<uint8_t>("memory.png", 4, 4, 4, std::vector<uint8_t>(64, 9));
     Layer layer = ImageLayer(file, 4, 4);

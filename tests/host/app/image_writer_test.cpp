@@ -46,30 +46,6 @@ TEST(ImageWriter, FloatToOpenEXRIsPremultiplied) {
               (std::vector<float>{0.125f, 1.0f, 0.0f, 0.5f}));
 }
 
-TEST(ImageWriter, AFailedWriteLeavesNoFile) {
-    TempFolder folder;
-    PF_WorldX<PF_Pixel8> world(4, 4);
-    struct Case {
-        fs::path path;
-        const char* problem;
-    };
-    const Case cases[] = {
-        {folder.Path() / "missing-folder" / "frame.png", "cannot write the image"},
-        {folder.Path() / "frame.unknownformat", "cannot write images of this kind"},
-    };
-    for (const Case& c : cases) {
-        try {
-            ostrel::WriteWorld(world, c.path);
-            ADD_FAILURE() << c.path << " was written";
-        } catch (const ostrel::HostError& e) {
-            std::string message = e.what();
-            EXPECT_EQ(message.rfind(c.path.string(), 0), 0u) << message;
-            EXPECT_NE(message.find(c.problem), std::string::npos) << message;
-        }
-    }
-    EXPECT_EQ(FileCount(folder), 0u);
-}
-
 // Frames written behind the render: a failed write comes back from the next call, naming
 // its file, and the frames around it are written whole.
 TEST(ImageWriter, FrameWriterReportsAFailureOnTheNextCall) {

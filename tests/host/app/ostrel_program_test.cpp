@@ -81,12 +81,6 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
          "",
          {}},
         {"about", "about", 0, {"Ostrel 3D\n"}, "", {}},
-        {"malformed JSON",
-         "render broken.json --frames 0",
-         1,
-         {},
-         "ostrel: broken.json: malformed JSON",
-         {}},
         // A frame that cannot be written whole is not left behind in part.
         {"unwritable output",
          "render shot/cards.json --frames 0 -o stdout.txt/c.####.png",

@@ -49,14 +49,5 @@ TEST(Timing, ShutterIntervals) {
     }
 }
 
-TEST(Timing, FramesAndSamples) {
-    Composition comp = WithRate("[24000, 1001]", R"({"samplesPerFrame": 7})");
-    EXPECT_TRUE(SameTime(comp.FrameDuration(), {1001, 24000}));
-    EXPECT_TRUE(SameTime(comp.FrameTime(24), {1001, 1000}));
-    // 10 s at 23.976 fps is 239.76 frames, rounded to 240.
-    EXPECT_EQ(comp.FrameCount(), 240);
-    EXPECT_EQ(MotionBlurSamples(comp), 7);
-}
-
 }  // namespace
 }  // namespace ostrel

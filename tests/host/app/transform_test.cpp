@@ -36,59 +36,6 @@ TEST(Transform, AnchorScaleAndPositionByHand) {
     ExpectPoint(Apply(LayerToWorld(comp, 0, 0.0), {0, 0, 7}), {200, 187.5, 7});
 }
 
-TEST(Transform, OrientationComesBeforeTheRotationsInXYZOrder) {
-    struct Case {
-        const char* transform;
-        Vec<3> point;
-        Vec<3> expected;
-    };
-    // Rotation about x turns +y toward +z; about y turns +z toward +x; about z turns +x
-    // toward +y. Each case gives a different answer if the order were reversed.
-    const Case cases[] = {
-        // x: orientation 90° about x leaves it, then 90° about y takes it to −z.
-        {R"("orientation": [90, 0, 0], "rotationY": 90)", {1, 0, 0}, {0, 0, -1}},
-        // The other way round, y then x, ends on +y.
-        {R"("orientation": [0, 90, 0], "rotationX": 90)", {1, 0, 0}, {0, 1, 0}},
-        // Within the rotations X comes before Z: +y → +z, which Z leaves alone.
-        {R"("rotationX": 90, "rotationZ": 90)", {0, 1, 0}, {0, 0, 1}},
-        // Within the orientation, likewise.
-        {R"("orientation": [90, 0, 90])", {0, 1, 0}, {0, 0, 1}},
-    };
-    for (const Case& c : cases) {
-        Composition comp =
-            Parse(std::string(
-                      R"({"kind": "null", "threeD": true, "transform": {"position": [0, 0, 0], )") +
-                  c.transform + "}}");
-        SCOPED_TRACE(c.transform);
-        ExpectPoint(Apply(LayerToWorld(comp, 0, 0.0), c.point), c.expected);
-    }
-}
-
-TEST(Transform, TwoNodeCameraAimsItsZAxisAtThePointOfInterest) {
-    struct Case {
-        const char* camera;
-        Vec<3> zAxis;
-    };
-    const Case cases[] = {
-        // From above (y is down), looking down along +y.
-        {R"("position": [0, -100, 0]}, "camera": {"pointOfInterest": [0, 0, 0]})", {0, 1, 0}},
-        // A one-node camera keeps its own +z, turned only by its rotations.
-        {R"("position": [100, 0, 0], "rotationY": -90}, "camera": {"type": "one-node"})",
-         {-1, 0, 0}},
-    };
-    for (const Case& c : cases) {
-        Composition comp =
-            Parse(std::string(R"({"kind": "camera", "transform": {)") + c.camera + "}");
-        SCOPED_TRACE(c.camera);
-        M_Matrix4 eye = LayerToWorld(comp, 0, 0.0);
-        ExpectPoint({eye.mat[2][0], eye.mat[2][1], eye.mat[2][2]}, c.zAxis);
-        // No roll: the eye's x axis stays level.
-        EXPECT_NEAR(eye.mat[0][1], 0.0, kTolerance);
-        ExpectPoint({eye.mat[3][0], eye.mat[3][1], eye.mat[3][2]},
-                    Apply(LayerToWorld(comp, 0, 0.0), {0, 0, 0}));
-    }
-}
-
 TEST(Transform, DefaultCameraIsA50mmLensOverTheCompWidth) {
     Composition comp = Parse("");
     // 720 × 50 / 36 = 1000 pixels.

@@ -5,22 +5,22 @@
 #include <type_traits>
 #include <vector>
 
-#include "mbuffer_test_support.h"
 #include "renderer/mbuffer/mbuffer.h"
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/scene/row_work.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using ostrel_test::AccountedBytesCheck;
-using ostrel_test::Channels;
-using ostrel_test::PixelOf;
+using renderer_test::AccountedBytesCheck;
+using renderer_test::Channels;
+using renderer_test::PixelOf;
 
 constexpr M_LRect kRow{0, 0, 16, 1};
 
 template <class P>
 class FragmentArrayByDepth : public ::testing::Test {};
-TYPED_TEST_SUITE(FragmentArrayByDepth, ostrel_test::PixelTypes);
+TYPED_TEST_SUITE(FragmentArrayByDepth, renderer_test::PixelTypes);
 
 // A source of zero alpha is dropped whatever the coverage; otherwise coverage goes to the
 // stored alpha only (colour stays straight), and only a normal-mode record at full alpha is
@@ -127,12 +127,12 @@ void DrawRow(const void* closure, int32_t row, int32_t, int32_t thread) {
 
 TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {
     AccountedBytesCheck memory;
-    ostrel_test::ThreadedFrame<4> frame;
+    renderer_test::ThreadedFrame<4> frame;
     auto owner = SY_MBuffer::New(kBounds, 16, false, false);
     Buffer* buffer = static_cast<Buffer*>(owner.get());
     ASSERT_EQ(buffer->PoolCount(), 4);
     EXPECT_EQ(buffer->Pool(3).lock, SY_GetAllocationLock());
-    ostrel_test::RecordingProgress progress;
+    renderer_test::RecordingProgress progress;
     SY_RunRowWork({frame.iterate, &progress, kBounds.top, 128, 0, &DrawRow, &buffer});
     int32_t wrong = 0;
     for (int32_t y = kBounds.top; y < kBounds.bottom; ++y) {
@@ -146,28 +146,9 @@ TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {
     EXPECT_EQ(wrong, 0);
 }
 
-// Until the classes that split pixels exist, every request is drawn by the draft buffer of its
-// depth. Motion blur implies anti-aliasing.
-TEST(MBuffer, EveryRequestGetsTheDraftBufferOfItsDepth) {
-    AccountedBytesCheck memory;
-    using Q = SY_MBufferQuality;
-    for (const int16_t depth : {8, 16, 32}) {
-        for (const bool antialias : {false, true}) {
-            for (const bool blur : {false, true}) {
-                SCOPED_TRACE(testing::Message() << depth << antialias << blur);
-                EXPECT_EQ(SY_MBufferQualityFor(antialias, blur),
-                          blur ? Q::kMotionBlur : (antialias ? Q::kAntialiased : Q::kDraft));
-                auto buffer = SY_MBuffer::New({0, 0, 4, 4}, depth, antialias, blur);
-                EXPECT_EQ(buffer->GetBitDepth(), depth);
-                EXPECT_FALSE(buffer->IsAntialiased() || buffer->HasMotionBlur());
-            }
-        }
-    }
-}
-
 template <class P>
 class MBufferDraftByDepth : public ::testing::Test {};
-TYPED_TEST_SUITE(MBufferDraftByDepth, ostrel_test::PixelTypes);
+TYPED_TEST_SUITE(MBufferDraftByDepth, renderer_test::PixelTypes);
 
 // Lists of 0 to 3 opaque records along a row of five (odd, so the resolve's pairwise walk has
 // a tail): the nearest record (largest key) shows whichever order they came in. The last one
@@ -217,7 +198,7 @@ TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
     for (const Case& c : cases) {
         PF_WorldX<PF_Pixel8> world(2, c.bounds.bottom);
         SY_MBufferDraftX<PF_Pixel8> buffer(c.bounds);
-        ostrel_test::RecordingProgress progress;
+        renderer_test::RecordingProgress progress;
         buffer.Resolve(&progress, nullptr, world);
         EXPECT_EQ(progress.rows, c.reports) << "rows from " << c.bounds.top;
     }
@@ -227,7 +208,7 @@ TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
 // 255 − 127.5 → 128 red and 127 blue. A cancel thrown from the report before row 32 leaves
 // the rows above it resolved.
 TEST(MBufferDraft, ResolveBlendsWithoutTablesAndStopsAtACancel) {
-    struct Cancel : ostrel_test::RecordingProgress {
+    struct Cancel : renderer_test::RecordingProgress {
         void ReportRows(int32_t row, int32_t) override {
             if (row > 0) throw int32_t{7};
         }
@@ -268,7 +249,7 @@ void AppendShadowArrays() {
 // Every allocation of each piece of work failed in turn: each failure is error 4 and leaves
 // nothing allocated.
 TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
-    ostrel_test::ThreadedFrame<3> frame;
+    renderer_test::ThreadedFrame<3> frame;
     const struct {
         const char* what;
         void (*work)();
@@ -280,7 +261,7 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
         {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
     };
     for (const auto& c : cases) {
-        int32_t failures = scene_test::FailEachAllocationInTurn([&](auto fail) {
+        int32_t failures = renderer_test::FailEachAllocationInTurn([&](auto fail) {
             auto failing = fail();
             c.work();
         });

@@ -3,16 +3,16 @@
 #include <cstdint>
 #include <vector>
 
-#include "mbuffer_test_support.h"
 #include "renderer/mbuffer/depth_groups.h"
 #include "renderer/mbuffer/fragment_array.h"
 #include "renderer/mbuffer/pair_mix.h"
 #include "renderer/mbuffer/region_writeback.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using ostrel_test::Channels;
-using ostrel_test::PixelOf;
+using renderer_test::Channels;
+using renderer_test::PixelOf;
 
 template <class P>
 SY_FragmentAAX<P> RecordOf(const P& color, uint8_t mode = 2) {
@@ -61,7 +61,7 @@ TEST(ResolveSteps, DepthGroupsChainOverlappingRanges) {
 
 template <class P>
 class PairMixByDepth : public ::testing::Test {};
-TYPED_TEST_SUITE(PairMixByDepth, ostrel_test::PixelTypes);
+TYPED_TEST_SUITE(PairMixByDepth, renderer_test::PixelTypes);
 
 // Opaque red A and opaque blue B: A in front all the way (f = 0) is red and B (f = 1) blue,
 // exactly, with or without tables, over translucent green. Halfway without tables: 8-bit

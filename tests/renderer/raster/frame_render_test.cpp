@@ -13,7 +13,7 @@ using raster_test::Frame;
 using raster_test::IsClear;
 using raster_test::PatternTexel;
 using raster_test::PatternTexture;
-using scene_test::Translation;
+using renderer_test::Translation;
 
 // Output 64 × 48; the plane z = 0 is seen 1:1.
 constexpr int32_t kWidth = 64, kHeight = 48;
@@ -21,7 +21,7 @@ constexpr int32_t kLeft = 7, kTop = 5;
 
 template <class P>
 class FrameRender : public ::testing::Test {};
-TYPED_TEST_SUITE(FrameRender, raster_test::PixelTypes);
+TYPED_TEST_SUITE(FrameRender, renderer_test::PixelTypes);
 
 // The layer point each pixel centre's ray meets: the placement's rows are the layer's axes, its
 // normal and its origin, and the ray of pixel centre (sx, sy) leaves the camera at
@@ -52,9 +52,10 @@ TYPED_TEST(FrameRender, EachPixelShowsTheTexelItsRayMeets) {
         M_Matrix4 placement;
         bool best;
         int32_t pixels;  // checked at least
-    } cases[] = {{Translation(kLeft, kTop, 0), false, 32 * 32},
-                 {Translation(kLeft, kTop, 0), true, 32 * 32},
-                 {scene_test::Turned(16, 16, 0, 0.5, kWidth / 2.0, kHeight / 2.0, 50), false, 300}};
+    } cases[] = {
+        {Translation(kLeft, kTop, 0), false, 32 * 32},
+        {Translation(kLeft, kTop, 0), true, 32 * 32},
+        {renderer_test::Turned(16, 16, 0, 0.5, kWidth / 2.0, kHeight / 2.0, 50), false, 300}};
     for (const auto& c : cases) {
         Frame frame(kWidth, kHeight, 1);
         SY_LayerDesc& layer = frame.Layer(0, texture.get(), c.placement);
@@ -111,7 +112,7 @@ TYPED_TEST(FrameRender, TrackMatteIsReadOnlyWhereItHasPixels) {
     for (bool unbounded : {false, true}) {
         for (bool outsideIsClear : {true, false}) {
             Frame frame(kWidth, kHeight, 1);
-            SY_LayerDesc& layer = frame.Layer(0, texture.get(), scene_test::Identity());
+            SY_LayerDesc& layer = frame.Layer(0, texture.get(), renderer_test::Identity());
             layer.unbounded = unbounded;
             auto owned = std::make_unique<WorldMatte>(matte.get(), outsideIsClear);
             const WorldMatte& fetcher = *owned;
@@ -171,13 +172,13 @@ TEST(FrameRender, WireframeOutlinesTheLayerButNotTheOutputBorder) {
 // A fetch that fails and a cancel from the progress report both end the frame with their code,
 // hand the textures back and leave the accounted bytes as they were.
 TEST(FrameRender, FailuresFreeWhatTheFrameTook) {
-    struct FailingFetcher : ostrel_test::MemoryTextureFetcher {
+    struct FailingFetcher : renderer_test::MemoryTextureFetcher {
         int32_t Fetch(int32_t, bool, const double*, const M_LRect*, M_Matrix3*,
                       PF_World**) override {
             return 7;
         }
     };
-    struct CancellingProgress : ostrel_test::RecordingProgress {
+    struct CancellingProgress : renderer_test::RecordingProgress {
         void ReportRows(int32_t, int32_t) override { throw int32_t{9}; }
     };
     auto texture = PatternTexture<PF_Pixel16>(20, 20);
@@ -205,7 +206,7 @@ TEST(FrameRender, FailuresFreeWhatTheFrameTook) {
 
 template <class P>
 class FrameRenderThreads : public ::testing::Test {};
-TYPED_TEST_SUITE(FrameRenderThreads, raster_test::PixelTypes);
+TYPED_TEST_SUITE(FrameRenderThreads, renderer_test::PixelTypes);
 
 // Layers of every kind the span routines know (plain, turned bilinear, bicubic multiplied at
 // 70 %, moving), drawn over three threads and over one: the frames are equal byte for byte.
@@ -215,25 +216,26 @@ TYPED_TEST(FrameRenderThreads, ThreadedFrameEqualsSingleThreadedFrame) {
     auto render = [&](PF_WorldX<P>* destination, const QNGP_IterateSuite1* iterate) {
         Frame frame(kWidth, kHeight, 4);
         frame.Layer(0, plain.get(), Translation(2, 3, 0));
-        SY_LayerDesc& turned = frame.Layer(
-            1, large.get(), scene_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
+        SY_LayerDesc& turned =
+            frame.Layer(1, large.get(),
+                        renderer_test::Turned(32, 32, 0.3, 0.6, kWidth / 2.0, kHeight / 2.0, 80));
         turned.material.bestQuality = true;
         turned.material.engineFlag = SY_SamplingFilter::kBilinear;
         SY_LayerDesc& bicubic =
-            frame.Layer(2, plain.get(), scene_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
+            frame.Layer(2, plain.get(), renderer_test::Turned(15, 10, 0, 0.4, 40, 30, 20));
         bicubic.material.bestQuality = true;
         bicubic.material.engineFlag = SY_SamplingFilter::kBicubic;
         bicubic.material.opacity = 0.7;
         bicubic.material.mode = kPF_XferMultiply;
         SY_LayerDesc& moving = frame.Layer(3, plain.get(), Translation(30, 5, 0));
-        scene_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
+        renderer_test::SetPlacements(&moving, {Translation(30, 5, 0), Translation(34, 9, -30)});
         moving.material.motionBlur = moving.material.bestQuality = true;
         moving.material.engineFlag = SY_SamplingFilter::kBilinear;
         frame.Render(destination, iterate);
     };
     PF_WorldX<P> single(kWidth, kHeight), threaded(kWidth, kHeight);
     render(&single, nullptr);
-    render(&threaded, ostrel_test::ThreadedIterateSuite<3>::Suite());
+    render(&threaded, renderer_test::ThreadedIterateSuite<3>::Suite());
     int32_t drawn = 0;
     for (int32_t y = 0; y < kHeight; ++y) {
         ASSERT_EQ(std::memcmp(single.Row(y), threaded.Row(y), sizeof(P) * kWidth), 0) << y;

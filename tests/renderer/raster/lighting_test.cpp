@@ -6,11 +6,11 @@
 #include <tuple>
 #include <vector>
 
-#include "../scene/frame_test_support.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
 #include "renderer/scene/renderable.h"
 #include "renderer/scene/specular_table.h"
+#include "tests/renderer/renderer_test_support.h"
 #include "u_memory.h"
 
 namespace {
@@ -238,7 +238,7 @@ TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
     auto shader = LitShader({&ambient, &onSurface});
     shader->material.ambient = 1;
     shader->material.diffuse = 1;
-    ostrel_test::ReportCapture capture;
+    renderer_test::ReportCapture capture;
     EXPECT_NEAR(LightAt(*shader, 5, 5).diffuse[0], 0.2, 1e-6);
     EXPECT_TRUE(capture.reports().empty());
     shader->eye[2] = 0;
@@ -255,13 +255,6 @@ TEST(Lighting, SurfacePointOnALightOrOnTheEye) {
     SY_Lighting a, b;
     EXPECT_THROW(shader->LightTwoPixels(onEye, elsewhere, kFront, &a, &b), int32_t);
     EXPECT_THROW(shader->LightTwoPixels(elsewhere, onEye, kFront, &a, &b), int32_t);
-}
-
-SY_TRLayer Renderable(const SY_LayerDesc& layer, std::vector<const SY_LightState*> lights) {
-    SY_TRLayer renderable(layer);
-    renderable.lights.Allocate(static_cast<int32_t>(lights.size()));
-    std::copy(lights.begin(), lights.end(), renderable.lights.begin());
-    return renderable;
 }
 
 // Which work a layer's pixels need, by its switches and lights, and what the frame adds to
@@ -307,7 +300,10 @@ TEST(LayerShader, WhichWorkThePixelsNeed) {
             layer.material.acceptsLights = c.acceptsLights;
             layer.material.acceptsShadows = c.acceptsShadows;
             layer.material.specular = c.specular;
-            auto shader = SY_MakeLayerShader(&context, Renderable(layer, c.lights));
+            SY_TRLayer renderable(layer);
+            renderable.lights.Allocate(static_cast<int32_t>(c.lights.size()));
+            std::copy(c.lights.begin(), c.lights.end(), renderable.lights.begin());
+            auto shader = SY_MakeLayerShader(&context, std::move(renderable));
             EXPECT_EQ(shader->shaded, c.shaded) << c.what;
             EXPECT_EQ(shader->NeedsSurfacePoint(), c.needsPoint) << c.what;
             EXPECT_EQ(shader->specularTable != nullptr, c.table) << c.what;

@@ -2,21 +2,15 @@
 // reader can recompute, layers placed in front of the default camera, and a frame runner.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <cstdint>
 #include <memory>
 
-#include "../scene/frame_test_support.h"
-#include "../scene/memory_texture_fetcher.h"
-#include "../scene/scene_fixtures.h"
 #include "pf_world.h"
 #include "pf_xfer.h"
 #include "renderer/frame/frame_driver.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace raster_test {
-
-using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
 
 // An opaque pixel of colour channels given as 8-bit codes, in the range of P.
 template <class P>
@@ -71,7 +65,7 @@ inline constexpr double kDistance = 400;
 // A frame of layers in front of the default camera, all drawn into one destination.
 struct Frame {
     Frame(int32_t w, int32_t h, int32_t layerCount) {
-        ostrel_test::SetDefaultCamera(&scene, w, h, kDistance);
+        renderer_test::SetDefaultCamera(&scene, w, h, kDistance);
         scene.layers.Allocate(layerCount);
         for (int32_t i = 0; i < layerCount; ++i) {
             scene.layers[i].material.renderIndex = i;
@@ -83,8 +77,8 @@ struct Frame {
     // image of layer point (0, 0).
     SY_LayerDesc& Layer(int32_t i, PF_World* texture, const M_Matrix4& placement) {
         SY_LayerDesc& layer = scene.layers[i];
-        scene_test::SetPlacements(&layer, {placement});
-        scene_test::SetRect(&layer, 0, 0, texture->width, texture->height);
+        renderer_test::SetPlacements(&layer, {placement});
+        renderer_test::SetRect(&layer, 0, 0, texture->width, texture->height);
         fetcher.Add(i, texture);
         return layer;
     }
@@ -95,8 +89,8 @@ struct Frame {
     }
 
     SY_SceneDesc scene;
-    ostrel_test::MemoryTextureFetcher fetcher;
-    ostrel_test::RecordingProgress progress;
+    renderer_test::MemoryTextureFetcher fetcher;
+    renderer_test::RecordingProgress progress;
 };
 
 }  // namespace raster_test

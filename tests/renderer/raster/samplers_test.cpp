@@ -48,7 +48,7 @@ P Sample(const PF_World& texture, Filter filter, const M_Matrix3& m, double x, d
 
 template <class P>
 class Samplers : public ::testing::Test {};
-TYPED_TEST_SUITE(Samplers, raster_test::PixelTypes);
+TYPED_TEST_SUITE(Samplers, renderer_test::PixelTypes);
 
 // Nearest: the floored texel, nothing beyond the texture (column = width, row = height, and
 // −0.25 floors to −1).

@@ -55,14 +55,14 @@ protected:
                                            0);
     }
 
-    ostrel_test::MemoryTextureFetcher fetcher_;
+    renderer_test::MemoryTextureFetcher fetcher_;
     std::unique_ptr<PF_WorldX<P>> texture_;
     SY_ScreenGeometry geometry_;
     SY_LayerShader shader_;
     SY_SpanBlend blend_;
 };
 
-TYPED_TEST_SUITE(Span, raster_test::PixelTypes);
+TYPED_TEST_SUITE(Span, renderer_test::PixelTypes);
 
 // A span draws exactly its pixels, each showing the texel under it; an image span only those
 // the image has. A store target takes them at its image's origin (3, 1), unblended; targets a
@@ -229,7 +229,7 @@ TYPED_TEST(Span, TextureOfAnotherDepthIsReportedAndThrowsThree) {
     using Other = std::conditional_t<std::is_same_v<TypeParam, PF_Pixel8>, PF_Pixel16, PF_Pixel8>;
     PF_WorldX<Other> destination(kWidth, kHeight);
     for (bool image : {false, true}) {
-        ostrel_test::ReportCapture capture;
+        renderer_test::ReportCapture capture;
         int32_t thrown = 0;
         try {
             this->Draw(image, SY_RenderTarget(destination), 0, 4, 0);

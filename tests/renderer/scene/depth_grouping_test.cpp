@@ -7,11 +7,11 @@
 #include <deque>
 #include <vector>
 
-#include "tests/renderer/scene/scene_fixtures.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using namespace scene_test;
+using namespace renderer_test;
 
 struct Point {
     double x, y;

@@ -1,19 +1,16 @@
 #include <gtest/gtest.h>
 
-#include "frame_test_support.h"
-#include "memory_texture_fetcher.h"
 #include "pf_world.h"
 #include "renderer/frame/frame_driver.h"
-#include "renderer/scene/render_context.h"
-#include "scene_fixtures.h"
+#include "tests/renderer/renderer_test_support.h"
 #include "u_memory.h"
 
 namespace {
 
-using ostrel_test::RecordingProgress;
-using ostrel_test::ReportCapture;
-using ostrel_test::SetDefaultCamera;
-using namespace scene_test;
+using renderer_test::RecordingProgress;
+using renderer_test::ReportCapture;
+using renderer_test::SetDefaultCamera;
+using namespace renderer_test;
 
 struct CameraFault {
     const char* name;
@@ -64,42 +61,6 @@ TEST(FrameDriver, CameraFaultsAreReportedAndThrown) {
     }
 }
 
-TEST(FrameDriver, IdenticalCameraSubsamplesCollapseToOne) {
-    SY_SceneDesc scene;
-    SetDefaultCamera(&scene, 64, 48, 100, 5);
-    SY_RenderContext context;
-    SY_SetUpContext(&context, scene, nullptr, nullptr, nullptr, false, nullptr);
-    EXPECT_EQ(context.worldToScreen.Count(), 1);
-    EXPECT_DOUBLE_EQ(context.projectionW[0], 0.01);
-
-    M_TranslateMatrix4(1, 0, 0, &scene.cameraPlacements[4]);
-    SY_RenderContext moving;
-    SY_SetUpContext(&moving, scene, nullptr, nullptr, nullptr, false, nullptr);
-    EXPECT_EQ(moving.worldToScreen.Count(), 5);
-}
-
-TEST(FrameDriver, AFrameWithoutLayersLeavesTheDestinationUntouched) {
-    int64_t start = U_AccountedBytes();
-    {
-        SY_SceneDesc scene;
-        SetDefaultCamera(&scene, 16, 8, 100);
-        PF_WorldX<PF_Pixel16> destination(16, 8);
-        for (int32_t y = 0; y < 8; ++y) {
-            for (int32_t x = 0; x < 16; ++x)
-                destination.At(x, y) = {32768, uint16_t(x), uint16_t(y), 7};
-        }
-        RecordingProgress progress;
-        SY_RenderFrame(scene, nullptr, &progress, nullptr, false, &destination, nullptr);
-        for (int32_t y = 0; y < 8; ++y) {
-            for (int32_t x = 0; x < 16; ++x) {
-                const PF_Pixel16& p = destination.At(x, y);
-                EXPECT_TRUE(p.alpha == 32768 && p.red == x && p.green == y && p.blue == 7);
-            }
-        }
-    }
-    EXPECT_EQ(U_AccountedBytes(), start);
-}
-
 // Every allocation of a frame in turn fails for good: each failure is code 4 (or bad_alloc from
 // the layer shaders, which are tracked objects) and leaves nothing behind.
 TEST(FrameDriver, AnInjectedAllocationFailureFreesEverything) {
@@ -125,7 +86,7 @@ TEST(FrameDriver, AnInjectedAllocationFailureFreesEverything) {
             }
             PF_WorldX<PF_Pixel8> destination(64, 64);
             PF_WorldX<PF_Pixel8> texture(32, 32);
-            ostrel_test::MemoryTextureFetcher fetcher;
+            renderer_test::MemoryTextureFetcher fetcher;
             for (int32_t i = 0; i < 3; ++i)
                 fetcher.Add(i, &texture);
             RecordingProgress progress;

@@ -6,12 +6,11 @@
 #include <optional>
 #include <vector>
 
-#include "tests/renderer/scene/frame_test_support.h"
-#include "tests/renderer/scene/scene_fixtures.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using namespace scene_test;
+using namespace renderer_test;
 
 constexpr double kWidth = 400, kHeight = 300, kDistance = 400;
 constexpr double kTolerance = 1e-9;
@@ -145,7 +144,7 @@ TEST(LayerProjection, MismatchedSubsampleCountsReportMessageOne) {
                             cameras[0]};
     Projection p(20, 20, {Translation(50, 40, 0), Translation(60, 40, 0)});
     SY_TRLayer renderable(p.layer);
-    ostrel_test::ReportCapture capture;
+    renderer_test::ReportCapture capture;
     EXPECT_THROW(SY_SetUpRenderable(p.layer, {cameras, 3, true}, OutputOptions(), &renderable),
                  int32_t);
     ASSERT_EQ(capture.reports().size(), 1u);

@@ -5,11 +5,11 @@
 #include <cmath>
 #include <vector>
 
-#include "tests/renderer/scene/scene_fixtures.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using namespace scene_test;
+using namespace renderer_test;
 
 TEST(RenderableList, KeepsTheLayersThatAreDrawnInRenderOrder) {
     struct Case {

@@ -2,14 +2,14 @@
 
 #include <vector>
 
-#include "frame_test_support.h"
 #include "renderer/scene/row_work.h"
 #include "renderer/scene/threads.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
-using ostrel_test::RecordingProgress;
-using ostrel_test::ThreadedIterateSuite;
+using renderer_test::RecordingProgress;
+using renderer_test::ThreadedIterateSuite;
 
 // Runs work over `rows` rows in a field mode and returns the rows drawn; row `failing` throws 4,
 // which comes back negated after the rows drawn.

@@ -2,12 +2,9 @@
 
 #include <gtest/gtest.h>
 
-#include "frame_test_support.h"
-#include "memory_texture_fetcher.h"
 #include "renderer/scene/layer_projection.h"
 #include "renderer/scene/render_context.h"
-#include "scene_fixtures.h"
-#include "u_memory.h"
+#include "tests/renderer/renderer_test_support.h"
 
 namespace {
 
@@ -17,11 +14,11 @@ constexpr int32_t kWidth = 200, kHeight = 100;
 // geometry of a 64 × 32 layer built in it.
 struct Fixture {
     explicit Fixture(const M_Matrix4& placement) {
-        ostrel_test::SetDefaultCamera(&scene, kWidth, kHeight, 400, 1, false);
+        renderer_test::SetDefaultCamera(&scene, kWidth, kHeight, 400, 1, false);
         SY_SetUpContext(&context, scene, &fetcher, nullptr, nullptr, false, nullptr);
         fetcher.Add(0, &texture);
-        scene_test::SetPlacements(&layer, {placement});
-        scene_test::SetRect(&layer, 0, 0, 64, 32);
+        renderer_test::SetPlacements(&layer, {placement});
+        renderer_test::SetRect(&layer, 0, 0, 64, 32);
         SY_SetUpOptions options;
         options.output = {0, 0, kWidth, kHeight};
         SY_CameraView camera{context.frameWorldToScreen.Data(), 1, false};
@@ -38,7 +35,7 @@ struct Fixture {
     }
 
     SY_SceneDesc scene;
-    ostrel_test::MemoryTextureFetcher fetcher;
+    renderer_test::MemoryTextureFetcher fetcher;
     SY_RenderContext context;
     PF_WorldX<PF_Pixel8> texture{64, 32};
     SY_LayerDesc layer;
@@ -48,26 +45,11 @@ struct Fixture {
 
 // Without a perspective divide, w carries the plane's eye depth for lighting and depth tests.
 TEST(ScreenGeometry, OrthographicWFollowsThePlaneDepth) {
-    Fixture f(scene_test::Turned(32, 16, 0, 0.5, 100, 50, 30));
+    Fixture f(renderer_test::Turned(32, 16, 0, 0.5, 100, 50, 30));
     const SY_Subsample& subsample = f.renderable.subsamples[0];
     EXPECT_NEAR(f.WAt(101, 50) - f.WAt(100, 50), subsample.plane[0] / subsample.plane[2], 1e-12);
     EXPECT_NEAR(f.WAt(100, 50), -subsample.DepthAt(100, 50), 1e-9);
     EXPECT_EQ(f.geometry.projectionW, -1.0);
-}
-
-TEST(ScreenGeometry, DestructionHandsTheTextureBack) {
-    int64_t start = U_AccountedBytes();
-    {
-        Fixture f(scene_test::Translation(0, 0, 0));
-        {
-            SY_ScreenGeometry second;
-            second.Build(f.context, f.renderable, f.context.frameWorldToScreen.Data(), 1, {});
-            EXPECT_EQ(f.fetcher.UseCount(0), 2);
-        }
-        EXPECT_EQ(f.fetcher.UseCount(0), 1);
-        EXPECT_EQ(f.fetcher.releases, 0);
-    }
-    EXPECT_EQ(U_AccountedBytes(), start);
 }
 
 }  // namespace

@@ -39,16 +39,9 @@ TEST(CameraPair, EyeAndScreenFollowTheViewAndTheCameraLayer) {
         SCOPED_TRACE(testing::Message() << "camera " << c.camera << " aspect " << c.view.aspect
                                         << " region " << c.view.top << "," << c.view.left
                                         << " downsample " << c.view.dx << "×" << c.view.dy);
-        ORM_CameraView view{};
-        view.width = 100;
-        view.height = 50;
-        view.pixelAspect = c.view.aspect;
-        view.regionTop = c.view.top;
-        view.regionLeft = c.view.left;
-        view.downsampleX = c.view.dx;
-        view.downsampleY = c.view.dy;
-        view.defaultDistance = 200;
-        view.perspective = c.camera != kOrthographic;
+        const ORM_CameraView view{100,         50,        c.view.aspect,
+                                  c.view.dx,   c.view.dy, c.view.top,
+                                  c.view.left, 200,       c.camera != kOrthographic};
         M_Matrix4 cameraToWorld;
         M_IdentityMatrix4(&cameraToWorld);
         M_TranslateMatrix4(7, 8, -300, &cameraToWorld);

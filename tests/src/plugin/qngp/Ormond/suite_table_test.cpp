@@ -14,26 +14,6 @@ namespace {
 
 using ormond_test::FakeHost;
 
-const QNGP_CompSuite9 kComp9{};
-const QNGP_CompSuite14 kComp14{};
-const QNGP_ItemSuite7 kItem7{};
-
-TEST(SuiteTable, AcquiresOncePerNameAndVersionAndReleasesEach) {
-    FakeHost host;
-    host.Serve(kQNGP_CompSuite, 9, &kComp9);
-    host.Serve(kQNGP_CompSuite, 14, &kComp14);
-    host.Serve(kQNGP_ItemSuite, 7, &kItem7);
-    {
-        ORM_SuiteTable suites(host.Basic());
-        EXPECT_EQ(host.Held(), 0);
-        EXPECT_EQ(&suites.Get<QNGP_CompSuite9>(), &kComp9);
-        EXPECT_EQ(&suites.Get<QNGP_CompSuite14>(), &kComp14);
-        EXPECT_EQ(&suites.Get<QNGP_CompSuite9>(), &kComp9);
-        EXPECT_EQ(host.Held(), 2);
-    }
-    EXPECT_EQ(host.Held(), 0);
-}
-
 TEST(SuiteTable, SuiteThatCannotBeAcquiredIsReportedAndThrowsThirteen) {
     struct Case {
         const char* name;
