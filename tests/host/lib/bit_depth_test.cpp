@@ -18,33 +18,23 @@ void Collect(const U_Report& report) {
 // host's own code gets PF_UnexpectedBitDepth with a message for the user; plug-in and renderer
 // code gets a failed-verification report and the error code 3.
 TEST(BitDepthDispatch, KnownDepthsNameTheirTypeAndOthersThrow) {
-    struct Case {
-        int32_t depth;
-        int32_t chosen;  // the depth of the pixel type the body is run with; 0: none
-    };
-    const Case cases[] = {{8, 8}, {16, 16}, {32, 32}, {0, 0}, {1, 0}, {24, 0}, {64, 0}, {-8, 0}};
     auto chosen = []<class P>() { return int32_t{PF_PixelTraits<P>::kBitDepth}; };
+    for (int32_t depth : {8, 16, 32})
+        EXPECT_EQ(PF_DispatchBitDepth(depth, chosen), depth);
     U_Reporter previous = U_SetReporter(&Collect);
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.depth);
+    for (int32_t depth : {0, 1, 24, 64, -8}) {
+        SCOPED_TRACE(depth);
         gReported.clear();
-        if (c.chosen) {
-            EXPECT_EQ(PF_DispatchBitDepth(c.depth, chosen), c.chosen);
-            EXPECT_EQ(PF_DispatchBitDepth(c.depth, chosen, U_BitDepthVerification("unused")),
-                      c.chosen);
-            EXPECT_TRUE(gReported.empty());
-            continue;
-        }
         try {
-            PF_DispatchBitDepth(c.depth, chosen);
+            PF_DispatchBitDepth(depth, chosen);
             ADD_FAILURE() << "no exception";
         } catch (const PF_UnexpectedBitDepth& error) {
             EXPECT_EQ(std::string(error.what()),
-                      "a bit depth of " + std::to_string(c.depth) + " (expected 8, 16 or 32)");
+                      "a bit depth of " + std::to_string(depth) + " (expected 8, 16 or 32)");
         }
         int32_t thrown = 0;
         try {
-            PF_DispatchBitDepth(c.depth, chosen, U_BitDepthVerification("unexpected depth"));
+            PF_DispatchBitDepth(depth, chosen, U_BitDepthVerification("unexpected depth"));
         } catch (int32_t code) {
             thrown = code;
         }

@@ -32,14 +32,6 @@ PF_LinearBlendingTables Build(const Curve& c) {
     return t;
 }
 
-TEST(LinearBlendingTables, MembersSitWhereReadersLookForThem) {
-    PF_LinearBlendingTables t;
-    auto* base = reinterpret_cast<const char*>(&t);
-    EXPECT_EQ(reinterpret_cast<const char*>(&t.inverse[0]) - base, 256 * 2);
-    EXPECT_EQ(reinterpret_cast<const char*>(&t.toLinearExponent) - base, 8708);
-    EXPECT_EQ(reinterpret_cast<const char*>(&t.fromLinearExponent) - base, 8712);
-}
-
 TEST(LinearBlendingTables, FollowTheirCurvesAndEveryCodeSurvivesTheRoundTrip) {
     for (const Curve& c : kCurves) {
         SCOPED_TRACE(c.name);

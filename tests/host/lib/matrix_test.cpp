@@ -1,58 +1,12 @@
 #include <gtest/gtest.h>
 
-#include <cmath>
-
 #include "m_matrix.h"
 
 namespace {
 
-M_Matrix4 Identity() {
-    M_Matrix4 m;
-    M_IdentityMatrix4(&m);
-    return m;
-}
-
-TEST(Matrix, InverseAndConcatenation) {
-    M_Matrix4 m = Identity();
-    M_ScaleMatrix4(2, 4, 8, &m);
-    M_RotateMatrix4XYZ(0.3, -0.7, 1.1, &m);
-    M_TranslateMatrix4(5, -6, 7, &m);
-    M_Matrix4 inverse, product;
-    ASSERT_EQ(M_InverseMatrix4Quiet(&m, &inverse), 0);
-    ASSERT_EQ(M_ConcatMatrix4(&m, &inverse, &product), 0);
-    for (int i = 0; i < 4; ++i) {
-        for (int j = 0; j < 4; ++j)
-            EXPECT_NEAR(product.mat[i][j], i == j ? 1 : 0, 1e-12);
-    }
-    // In place, too.
-    ASSERT_EQ(M_InverseMatrix4Quiet(&m, &m), 0);
-    EXPECT_NEAR(m.mat[3][0], inverse.mat[3][0], 1e-15);
-}
-
 TEST(Matrix, SingularInverseFails) {
-    M_Matrix4 m = Identity();
-    M_ScaleMatrix4(1, 0, 1, &m);
-    M_Matrix4 out;
-    EXPECT_EQ(M_InverseMatrix4Quiet(&m, &out), kM_ErrSingularMatrix);
-    M_Matrix3 flat{};
-    M_Matrix3 flatOut;
-    EXPECT_EQ(M_InverseMatrix(&flat, &flatOut), kM_ErrSingularMatrix);
-}
-
-TEST(Matrix, ProjectMapsTheZoomPlaneOneToOne) {
-    // Eye point (x, y, z): screen x = x·zoom/z, depth = zoom/z (nearer is larger).
-    M_Matrix4 m = Identity();
-    m.Project(1000);
-    double out[4];
-    double at[4] = {30, -40, 1000, 1};
-    M_TransformVector4NoDivide(&m, at, out);
-    EXPECT_DOUBLE_EQ(out[0] / out[3], 30);
-    EXPECT_DOUBLE_EQ(out[1] / out[3], -40);
-    EXPECT_DOUBLE_EQ(out[2] / out[3], 1);
-    double far[4] = {30, -40, 2000, 1};
-    M_TransformVector4NoDivide(&m, far, out);
-    EXPECT_DOUBLE_EQ(out[0] / out[3], 15);
-    EXPECT_DOUBLE_EQ(out[2] / out[3], 0.5);
+    M_Matrix3 flat{}, out;
+    EXPECT_EQ(M_InverseMatrix(&flat, &out), kM_ErrSingularMatrix);
 }
 
 TEST(Matrix, TranslateMatrix3MovesMappedPoints) {

@@ -1,7 +1,6 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <string>
 
 #include "host/lib/pixel_test_support.h"
 #include "pf_tables.h"
@@ -12,7 +11,6 @@ namespace {
 using pixel_test::BoxAverage;
 using pixel_test::ExpectChannels;
 using pixel_test::Step;
-using pixel_test::Unit;
 
 template <class P>
 class SummedAreaTables : public ::testing::Test {};
@@ -23,48 +21,42 @@ TYPED_TEST(SummedAreaTables, BoxesEqualBruteForce) {
     using P = TypeParam;
     PF_WorldX<P> world(23, 17);
     pixel_test::FillRandom(world, 5);
-    struct Box {
-        float x0, y0, x1, y1;
-    };
-    const Box boxes[] = {{0, 0, 23, 17},
-                         {3, 4, 9, 5},
-                         {5, 5, 6, 6},
-                         {-4, -2, 3, 8},
-                         {20, 10, 30, 25},
-                         {2.25f, 3.5f, 11.75f, 9.1f},
-                         {7.3f, 7.3f, 7.6f, 7.9f},
-                         {-1.5f, 15.5f, 4.5f, 18.25f},
-                         // Empty boxes are clear.
-                         {3, 1, 2, 2},
-                         {2, 2, 2, 3}};
+    // The last two are empty, and clear.
+    const float boxes[][4] = {{0, 0, 23, 17},
+                              {3, 4, 9, 5},
+                              {5, 5, 6, 6},
+                              {-4, -2, 3, 8},
+                              {20, 10, 30, 25},
+                              {2.25f, 3.5f, 11.75f, 9.1f},
+                              {7.3f, 7.3f, 7.6f, 7.9f},
+                              {-1.5f, 15.5f, 4.5f, 18.25f},
+                              {3, 1, 2, 2},
+                              {2, 2, 2, 3}};
     double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-4 : 1.01 * Step<P>();
     for (bool doubleSums : {false, true}) {
         PF_SummedAreaTable table(world, doubleSums);
         ASSERT_EQ(table.HasDoubleSums(), doubleSums);
         // Both sampling entries on either kind of sums.
-        auto sample = [&](auto&& entry, auto x0, auto y0, auto x1, auto y1) {
-            P out;
-            if (doubleSums) {
-                entry(table.Width(), table.Height(), table.DoubleSums(), x0, y0, x1, y1, &out);
-            } else {
-                entry(table.Width(), table.Height(), table.FloatSums(), x0, y0, x1, y1, &out);
+        auto check = [&](const auto* sums) {
+            for (const auto& [x0, y0, x1, y1] : boxes) {
+                SCOPED_TRACE(testing::Message() << (doubleSums ? "double" : "float") << " box "
+                                                << x0 << "," << y0 << " to " << x1 << "," << y1);
+                P aa, draft;
+                PF_SummedAreaTable_SampleAA(table.Width(), table.Height(), sums, x0, y0, x1, y1,
+                                            &aa);
+                ExpectChannels(aa, BoxAverage(world, x0, y0, x1, y1), tolerance, "AA");
+                // The draft box is the integer box around it.
+                int32_t ix0 = int32_t(std::floor(x0)), iy0 = int32_t(std::floor(y0));
+                int32_t ix1 = int32_t(std::ceil(x1)), iy1 = int32_t(std::ceil(y1));
+                PF_SummedAreaTable_SampleDraft(table.Width(), table.Height(), sums, ix0, iy0, ix1,
+                                               iy1, &draft);
+                ExpectChannels(draft, BoxAverage(world, ix0, iy0, ix1, iy1), tolerance, "draft");
             }
-            return out;
         };
-        auto aa = [](auto... a) { PF_SummedAreaTable_SampleAA(a...); };
-        auto draft = [](auto... a) { PF_SummedAreaTable_SampleDraft(a...); };
-        for (const Box& b : boxes) {
-            std::string what = std::string(doubleSums ? "double" : "float") + " box " +
-                               std::to_string(b.x0) + "," + std::to_string(b.y0) + " to " +
-                               std::to_string(b.x1) + "," + std::to_string(b.y1);
-            ExpectChannels(sample(aa, b.x0, b.y0, b.x1, b.y1),
-                           BoxAverage(world, b.x0, b.y0, b.x1, b.y1), tolerance, "AA " + what);
-            // The draft box is the integer box around it.
-            int32_t x0 = int32_t(std::floor(b.x0)), y0 = int32_t(std::floor(b.y0));
-            int32_t x1 = int32_t(std::ceil(b.x1)), y1 = int32_t(std::ceil(b.y1));
-            ExpectChannels(sample(draft, x0, y0, x1, y1), BoxAverage(world, x0, y0, x1, y1),
-                           tolerance, "draft " + what);
-        }
+        if (doubleSums)
+            check(table.DoubleSums());
+        else
+            check(table.FloatSums());
     }
 }
 
@@ -106,28 +98,13 @@ TEST(HorizontalSumTable, ExposureHighlightsAndRange) {
         bool keep;
         double red, green;
     };
+    // Saturation: luminosity 0.3 + 0.295 + 0.055 = 0.65, ramp 0.65, spread 1.65 about 0.65: red
+    // 0.65 + 0.35 × 1.65 = 1.2275, green 0.65 − 0.15 × 1.65 = 0.4025.
     const Case kCases[] = {
         {"luminosity 1: full boost", {1, 1, 1, 1}, 0, 1, 0.5, 0, false, 2.0, 2.0},
-        {"halfway to full: half boost",
-         {1, 0.75f, 0.75f, 0.75f},
-         0,
-         1,
-         0.5,
-         0,
-         false,
-         1.125,
-         1.125},
+        {"halfway: half boost", {1, 0.75f, 0.75f, 0.75f}, 0, 1, 0.5, 0, false, 1.125, 1.125},
         {"below the threshold", {0.5f, 0.4f, 0.4f, 0.4f}, 0, 1, 0.5, 0, false, 0.2, 0.2},
-        // Luminosity 0.3 + 0.295 + 0.055 = 0.65, ramp 0.65: spread 1.65 about 0.65.
-        {"saturation",
-         {1, 1, 0.5f, 0.5f},
-         0,
-         0,
-         0,
-         1,
-         false,
-         0.65 + 0.35 * 1.65,
-         0.65 - 0.15 * 1.65},
+        {"saturation", {1, 1, 0.5f, 0.5f}, 0, 0, 0, 1, false, 1.2275, 0.4025},
         {"one stop", {0.5f, 0.4f, 0.4f, 0.4f}, 1, 0, 0, 0, false, 0.4, 0.4},
         {"clipped", {0.5f, 3, 0.4f, 0.4f}, 0, 0, 0, 0, false, 0.5, 0.2},
         {"kept", {0.5f, 3, 0.4f, 0.4f}, 0, 0, 0, 0, true, 1.5, 0.2},

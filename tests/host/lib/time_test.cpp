@@ -6,23 +6,6 @@
 
 namespace {
 
-TEST(Time, ArithmeticIsExact) {
-    T_Time a{1, 3}, b{1, 6}, out{};
-    ASSERT_EQ(T_AddTimes(&a, &b, &out), 0);
-    EXPECT_EQ(out.value, 1);
-    EXPECT_EQ(out.scale, 2u);
-    T_Time frame{1001, 24000};
-    ASSERT_EQ(T_DivideTime(&frame, 64, &out), 0);
-    EXPECT_EQ(out.value, 1001);
-    EXPECT_EQ(out.scale, 1536000u);
-    ASSERT_EQ(T_MultiplyTime(&out, 64, &out), 0);
-    EXPECT_EQ(T_CompareTimes(&out, &frame), 0);
-    T_Time negative{-5, 10};
-    ASSERT_EQ(T_AddTimes(&negative, &a, &out), 0);
-    EXPECT_EQ(out.value, -1);
-    EXPECT_EQ(out.scale, 6u);
-}
-
 TEST(Time, OverflowIsReportedNotWrapped) {
     T_Time big{std::numeric_limits<int32_t>::max(), 1}, out{7, 7};
     EXPECT_EQ(T_MultiplyTime(&big, 2, &out), kT_ErrOverflow);
