@@ -42,21 +42,13 @@ const QNGP_InData kInData{SuiteRegistry::BasicSuite(), 1};
 
 class Capture : public testing::Test {
 protected:
-    // The render context of a frame for as long as a test needs it, as the render entry makes it.
-    class Frame {
-    public:
-        explicit Frame(ServedFrame& frame)
-            : context_(&kInData,
-                       {nullptr, nullptr, frame.Render(), nullptr, options_.Get(), nullptr}) {}
-        void Assemble(SY_SceneDesc* scene) { ORM_AssembleScene(context_, scene); }
-
-    private:
-        Options options_;
-        ORM_RenderContext context_;
-    };
-
-    // Scene assembly of the frame, as the render entry runs it.
-    static void Assemble(ServedFrame& frame, SY_SceneDesc* scene) { Frame(frame).Assemble(scene); }
+    // Scene assembly of the frame, with the render context the render entry makes.
+    static void Assemble(ServedFrame& frame, SY_SceneDesc* scene) {
+        Options options;
+        ORM_RenderContext context(
+            &kInData, {nullptr, nullptr, frame.Render(), nullptr, options.Get(), nullptr});
+        ORM_AssembleScene(context, scene);
+    }
 };
 
 // The comp's sample count as a test sets it, for counts a composition file cannot hold.
@@ -206,33 +198,6 @@ TEST_F(Capture, QualityAndShadowSwitches) {
                   kExpected[i])
             << "layer " << i << ": " << l;
     }
-}
-
-TEST_F(Capture, TrackMatteFetchedFromTheMatteLayer) {
-    const std::string layers = R"(
-      {"name": "stencil", "kind": "solid", "threeD": true,
-       "source": {"color": "#ffffff", "width": 64, "height": 32}},
-      {"name": "card", "kind": "solid", "threeD": true, "trackMatte": "luma",
-       "source": {"color": "#ff0000"}},
-      {"name": "free", "kind": "solid", "threeD": true, "source": {"color": "#ff0000"}})";
-    int64_t startBytes = U_AccountedBytes();
-    {
-        ServedFrame frame(CompJson("", layers));
-        Frame capture(frame);
-        SY_SceneDesc scene;
-        capture.Assemble(&scene);
-        ASSERT_EQ(scene.layers.Count(), 2);
-        EXPECT_EQ(scene.layers[1].trackMatte, nullptr);
-        ASSERT_NE(scene.layers[0].trackMatte, nullptr);
-        PF_World* matte = scene.layers[0].trackMatte->Fetch();
-        ASSERT_NE(matte, nullptr);
-        EXPECT_EQ(std::tuple(matte->width, matte->height), std::tuple(64, 32));
-        // White under a luma matte is fully opaque.
-        EXPECT_EQ(matte->Row<PF_Pixel8>(0)[0].alpha, 255);
-        EXPECT_TRUE(scene.layers[0].trackMatte->OutsideIsClear());
-        scene.layers[0].trackMatte->Release();
-    }
-    EXPECT_EQ(U_AccountedBytes(), startBytes);
 }
 
 }  // namespace

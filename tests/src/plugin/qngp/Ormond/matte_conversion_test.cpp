@@ -37,29 +37,6 @@ TEST(MatteConversion, WhiteOpaqueAtEachDepth) {
     }
 }
 
-TEST(MatteConversion, EightBitLumaRoundsAlphaTimesLumaOver255ToNearest) {
-    struct Case {
-        uint8_t alpha, grey, luma;
-    };
-    // Grey g has luma g; the matte is round(alpha × g / 255).
-    const Case kCases[] = {
-        {255, 1, 1},     // 255 / 255 = 1
-        {128, 128, 64},  // 16384 / 255 = 64.25
-        {1, 128, 1},     // 128 / 255 = 0.502
-        {1, 127, 0},     // 127 / 255 = 0.498
-        {200, 100, 78},  // 20000 / 255 = 78.43
-        {255, 0, 0},
-    };
-    for (const Case& c : kCases) {
-        SCOPED_TRACE(testing::Message() << int(c.alpha) << " × " << int(c.grey));
-        EXPECT_EQ(ConvertOne(PF_Pixel8{c.alpha, c.grey, c.grey, c.grey}, ORM_MatteType::kLuma),
-                  c.luma);
-        EXPECT_EQ(
-            ConvertOne(PF_Pixel8{c.alpha, c.grey, c.grey, c.grey}, ORM_MatteType::kInvertedLuma),
-            255 - c.luma);
-    }
-}
-
 TEST(MatteConversion, LumaWeighsTheChannelsAndFloatClampsToTheUnitRange) {
     // Pure red, green and blue at full alpha: luma is (weight × max + 16384) / 32768, truncated.
     EXPECT_EQ(ConvertOne(PF_Pixel8{255, 255, 0, 0}, ORM_MatteType::kLuma), 76);   // 76.2 + 0.5
