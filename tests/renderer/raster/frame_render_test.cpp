@@ -148,27 +148,6 @@ TEST(FrameRender, FieldModesDrawEveryOtherRow) {
     }
 }
 
-// A layer reaching over the right and bottom borders: its top and left edges are outlined,
-// the edges that the output's border cut are not, and no texture is fetched.
-TEST(FrameRender, WireframeOutlinesTheLayerButNotTheOutputBorder) {
-    auto texture = PatternTexture<PF_Pixel8>(40, 40);
-    Frame frame(kWidth, kHeight, 1);
-    SY_LayerDesc& layer = frame.Layer(0, texture.get(), Translation(40, 30, 0));
-    layer.material.renders = false;
-    layer.material.wireframe = true;
-    PF_WorldX<PF_Pixel8> destination(kWidth, kHeight);
-    frame.Render(&destination);
-    auto white = [&](int32_t x, int32_t y) { return destination.At(x, y).blue == 255; };
-    EXPECT_TRUE(white(50, 29) || white(50, 30));
-    EXPECT_TRUE(white(39, 40) || white(40, 40));
-    for (int32_t y = 32; y < kHeight; ++y)
-        EXPECT_TRUE(IsClear(destination.At(kWidth - 1, y))) << y;
-    for (int32_t x = 42; x < kWidth; ++x)
-        EXPECT_TRUE(IsClear(destination.At(x, kHeight - 1))) << x;
-    EXPECT_TRUE(IsClear(destination.At(50, 40)));  // inside: nothing rendered
-    EXPECT_EQ(frame.fetcher.fetches, 0);
-}
-
 // A fetch that fails and a cancel from the progress report both end the frame with their code,
 // hand the textures back and leave the accounted bytes as they were.
 TEST(FrameRender, FailuresFreeWhatTheFrameTook) {
