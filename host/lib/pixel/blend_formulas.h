@@ -80,11 +80,10 @@ inline float SoftLight(float cb, float cs) {
     return cb + (2.0f * cs - 1.0f) * (d - cb);
 }
 
+// Multiply and screen are blended on all lanes at once by the caller.
 template <int kMode>
 inline float Separable(float cb, float cs) {
     if constexpr (kMode == kNormal) return cs;
-    if constexpr (kMode == kMultiply) return cb * cs;
-    if constexpr (kMode == kScreen) return cb + cs - cb * cs;
     if constexpr (kMode == kOverlay) return HardLight(cs, cb);
     if constexpr (kMode == kSoftLight) return SoftLight(cb, cs);
     if constexpr (kMode == kHardLight) return HardLight(cb, cs);
