@@ -129,41 +129,25 @@ TEST_F(Capture, OrthographicCameraAndDownsampleReachTheDepthOfField) {
               std::tuple(0, 900, 1.2, 6, 0.3));
 }
 
-// Top to bottom: two cards, a null, a light of the layers below, two more cards, a light that
-// is switched off.
-const std::string kLitCards = R"(
+// A card, a light and a light that is switched off.
+const std::string kLitCard = R"(
   {"name": "a", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
-  {"name": "b", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
-  {"name": "n", "kind": "null"},
-  {"name": "lamp", "kind": "light", "light": {"type": "point", "lightsOnlyLayersBelow": true,
-   "intensity": {"keyframes": [{"time": 0, "value": 0}, {"time": 1, "value": 100}]}}},
-  {"name": "c", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
-  {"name": "d", "kind": "solid", "threeD": true, "source": {"color": "#ffffff"}},
+  {"name": "lamp", "kind": "light", "light": {"type": "point"}},
   {"name": "dark", "kind": "light", "on": false, "light": {"type": "spot"}}
 )";
 
-TEST_F(Capture, LightsReachOnlyTheLayersBelowWhenTheyAskForIt) {
+TEST_F(Capture, LightsThatAreOnUnlessTheCompSwitchesLightsOff) {
     for (bool enabled : {true, false}) {
         SCOPED_TRACE(enabled ? "lights on" : "lights switched off in the comp");
-        ServedFrame frame(CompJson(enabled ? "" : R"("lightsAndDepthOfField": false)", kLitCards));
+        ServedFrame frame(CompJson(enabled ? "" : R"("lightsAndDepthOfField": false)", kLitCard));
         SY_SceneDesc scene;
         Assemble(frame, &scene);
         EXPECT_EQ(scene.lightsEnabled, enabled);
         // The light that is off is not captured.
         ASSERT_EQ(scene.lights.Count(), enabled ? 1 : 0);
         if (enabled) {
-            EXPECT_EQ(scene.lights[0].id, 3);
-            EXPECT_EQ(scene.lights[0].type, kSY_LightPoint);
-        }
-        ASSERT_EQ(scene.layers.Count(), 4);
-        const int32_t kCompIndex[] = {0, 1, 4, 5};
-        for (int32_t i = 0; i < 4; ++i) {
-            SCOPED_TRACE(i);
-            EXPECT_EQ(scene.layers[i].compIndex, kCompIndex[i]);
-            EXPECT_EQ(scene.layers[i].material.renderIndex, i);
-            EXPECT_EQ(scene.layers[i].lightIds, enabled && kCompIndex[i] > 3
-                                                    ? std::vector<int32_t>{3}
-                                                    : std::vector<int32_t>{});
+            EXPECT_EQ(std::tuple(scene.lights[0].id, scene.lights[0].type),
+                      std::tuple(1, kSY_LightPoint));
         }
     }
 }

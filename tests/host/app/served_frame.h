@@ -27,7 +27,6 @@ public:
 
     FrameSession& Session() { return *session_; }
     QNGP_RenderContextH Render() { return session_->RenderContext(); }
-    QNGP_CompH Comp() { return session_->CompHandle(); }
     QNGP_LayerH Layer(int32_t index) { return session_->LayerHandle(index); }
 
 private:

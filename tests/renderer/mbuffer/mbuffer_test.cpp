@@ -146,45 +146,6 @@ TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {
     EXPECT_EQ(wrong, 0);
 }
 
-template <class P>
-class MBufferDraftByDepth : public ::testing::Test {};
-TYPED_TEST_SUITE(MBufferDraftByDepth, renderer_test::PixelTypes);
-
-// Lists of 0 to 3 opaque records along a row of five (odd, so the resolve's pairwise walk has
-// a tail): the nearest record (largest key) shows whichever order they came in. The last one
-// keeps the alpha beneath; the empty pixel and pixels outside the buffer keep what they had.
-TYPED_TEST(MBufferDraftByDepth, TheNearestRecordShowsWhateverTheOrder) {
-    using P = TypeParam;
-    const P colors[] = {PixelOf<P>(1, 1, 0, 0), PixelOf<P>(1, 0, 1, 0), PixelOf<P>(1, 0, 0, 1)};
-    const P before = PixelOf<P>(0.5f, 0.5f, 0.5f, 0.5f);
-    const int32_t lengths[] = {0, 1, 2, 3, 1};
-    for (bool nearestFirst : {true, false}) {
-        AccountedBytesCheck memory;
-        PF_WorldX<P> world(7, 3);
-        for (int32_t i = 0; i < 21; ++i)
-            world.At(i % 7, i / 7) = before;
-        {
-            auto owner = SY_MBuffer::New({1, 1, 6, 2}, PF_PixelTraits<P>::kBitDepth, false, false);
-            auto* buffer = static_cast<SY_MBufferDraftX<P>*>(owner.get());
-            for (int32_t x = 1; x < 6; ++x) {
-                const int32_t n = lengths[x - 1], mode = x == 5 ? 2 | 128 : 2;
-                for (int32_t i = 0; i < n; ++i) {
-                    const int32_t k = nearestFirst ? n - 1 - i : i;
-                    buffer->AddFragment(&colors[k], PF_PixelTraits<P>::kMax, mode, float(k),
-                                        buffer->HeadAt(x, 1), 0);
-                }
-            }
-            owner->Resolve(nullptr, nullptr, world);
-        }
-        for (int32_t i = 0; i < 21; ++i) {
-            const int32_t x = i % 7, y = i / 7, n = y == 1 && x >= 1 && x < 6 ? lengths[x - 1] : 0;
-            P expected = n ? colors[n - 1] : before;
-            if (y == 1 && x == 5) expected.alpha = before.alpha;
-            EXPECT_EQ(Channels(world.At(x, y)), Channels(expected)) << x << "," << y;
-        }
-    }
-}
-
 TEST(MBufferDraft, ProgressAtRowsThatAreMultiplesOf32) {
     struct Case {
         M_LRect bounds;
