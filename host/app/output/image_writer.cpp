@@ -1,10 +1,14 @@
 #include "output/image_writer.h"
 
+#include <fcntl.h>
 #include <unistd.h>
 
+#include <OpenImageIO/filesystem.h>
 #include <OpenImageIO/imageio.h>
 
+#include <cerrno>
 #include <cstdint>
+#include <cstring>
 #include <system_error>
 #include <vector>
 
@@ -86,6 +90,45 @@ auto WriterFor(const std::string& name) {
     return out;
 }
 
+// The hidden temporary beside the frame, named after it and the process writing it.
+std::filesystem::path PartialPath(const std::filesystem::path& path) {
+    std::string name = ".";
+    name += path.stem().string();
+    name += ".partial-" + std::to_string(::getpid());
+    name += path.extension().string();
+    return std::filesystem::path(path).replace_filename(name);
+}
+
+// Writes bytes to a new file and makes them durable. Returns "" or what went wrong: a short
+// write, a failed flush or close (a full disk often shows only there) is never success.
+std::string WriteDurably(const std::filesystem::path& file,
+                         const std::vector<unsigned char>& bytes) {
+    int fd = ::open(file.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+    if (fd < 0) return std::strerror(errno);
+    std::string problem;
+    for (size_t done = 0; done < bytes.size() && problem.empty();) {
+        ssize_t n = ::write(fd, bytes.data() + done, bytes.size() - done);
+        if (n > 0)
+            done += static_cast<size_t>(n);
+        else if (n == 0 || errno != EINTR)
+            problem = n == 0 ? "nothing written" : std::strerror(errno);
+    }
+    if (problem.empty() && ::fsync(fd) != 0) problem = std::strerror(errno);
+    if (::close(fd) != 0 && problem.empty()) problem = std::strerror(errno);
+    std::error_code sized;
+    if (problem.empty() && std::filesystem::file_size(file, sized) != bytes.size())
+        problem = "the file is shorter than its image";
+    return problem;
+}
+
+// Makes the rename that put the frame in place durable too.
+void SyncFolder(const std::filesystem::path& folder) {
+    int fd = ::open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0) return;
+    ::fsync(fd);
+    ::close(fd);
+}
+
 }  // namespace
 
 PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path) {
@@ -97,6 +140,11 @@ void WritePrepared(const PreparedImage& image) {
     std::string name = image.path.string();
     auto out = WriterFor(name);
     std::string format = out->format_name();
+    // Encoded in memory and written by us: image writers may report success from a write the
+    // disk refused, and only a whole file is ever renamed into place.
+    if (!out->supports("ioproxy"))
+        throw HostError(name + ": cannot write images of this kind (" + format +
+                        " files cannot be checked before they are kept)");
     OIIO::TypeDesc type(static_cast<OIIO::TypeDesc::BASETYPE>(image.channelType));
     OIIO::ImageSpec layout(image.width, image.height, 4, type);
     if (format != "openexr") layout.attribute("oiio:UnassociatedAlpha", 1);
@@ -104,29 +152,30 @@ void WritePrepared(const PreparedImage& image) {
     // some size and saves most of the time a frame spends in the PNG writer.
     layout.attribute("png:compressionLevel", 1);
     layout.attribute("png:filter", kPngFilterNone);
-    // The temporary keeps the extension so that the same writer handles it.
-    std::filesystem::path partial = image.path;
-    std::string partialName = ".";
-    partialName += image.path.stem().string();
-    partialName += ".partial-" + std::to_string(::getpid());
-    partialName += image.path.extension().string();
-    partial.replace_filename(partialName);
-    bool written =
-        out->open(partial.string(), layout) && out->write_image(type, image.bytes.data());
-    written = out->close() && written;
-    std::error_code ignored;
+    // The TIFF writer cannot add its Exif block in memory, and frames have nothing to put there.
+    layout.attribute("tiff:write_exif", 0);
+    std::vector<unsigned char> encoded;
+    OIIO::Filesystem::IOVecOutput memory(encoded);
+    bool written = out->set_ioproxy(&memory) && out->open(name, layout) &&
+                   out->write_image(type, image.bytes.data());
+    written = out->close() && written && !out->has_error();
     if (!written) {
         std::string problem = out->geterror();
-        std::filesystem::remove(partial, ignored);
         throw HostError(
             name + ": cannot write the image: " + (problem.empty() ? "unknown error" : problem));
     }
-    std::error_code renamed;
-    std::filesystem::rename(partial, image.path, renamed);
-    if (renamed) {
-        std::filesystem::remove(partial, ignored);
-        throw HostError(name + ": cannot write the image: " + renamed.message());
+    std::filesystem::path partial = PartialPath(image.path);
+    std::string problem = WriteDurably(partial, encoded);
+    std::error_code failed;
+    if (problem.empty()) {
+        std::filesystem::rename(partial, image.path, failed);
+        if (failed) problem = failed.message();
     }
+    if (!problem.empty()) {
+        std::filesystem::remove(partial, failed);
+        throw HostError(name + ": cannot write the image: " + problem);
+    }
+    SyncFolder(image.path.parent_path());
 }
 
 void WriteWorld(const PF_World& world, const std::filesystem::path& path) {

@@ -30,8 +30,9 @@ void WritePrepared(const PreparedImage& image);
 // and whatever else OpenImageIO writes). 8-bit worlds are written as 8 bits, 16-bit worlds as
 // 16 bits (0..32768 stretched to 0..65535), float worlds as float where the format holds it
 // and as 16 bits otherwise. Alpha is straight, except in OpenEXR, which holds premultiplied
-// colour. The file is written whole or not at all: a temporary file beside it is renamed into
-// place. Throws HostError naming the file and the problem.
+// colour. The file is written whole or not at all: encoded in memory, written to a temporary
+// file beside it, flushed to the disk and renamed into place. Throws HostError naming the file
+// and the problem, also for a full disk.
 void WriteWorld(const PF_World& world, const std::filesystem::path& path);
 
 // The output name for a frame: every run of '#' becomes the frame number padded with zeros
