@@ -2,6 +2,8 @@
 
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
+#include <optional>
 #include <sstream>
 #include <stdexcept>
 
@@ -131,6 +133,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     std::string firstFile, lastFile;
     // Frame n is written while frame n + 1 renders.
     FrameWriter writer;
+    std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
     for (int32_t frame = range.first; frame <= range.last; ++frame) {
         if (Interrupted()) {
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
@@ -154,6 +157,10 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         Clock::time_point output = Clock::now();
         std::filesystem::path file = ExpandFramePattern(pattern, frame);
         MakeOutputFolder(file);
+        if (cleanedFolder != file.parent_path()) {
+            RemoveStalePartials(file.parent_path());
+            cleanedFolder = file.parent_path();
+        }
         writer.Write(PrepareImage(session.Destination(), file));
         times.output = Seconds(Clock::now() - output);
         times.total = Seconds(Clock::now() - frameStart);

@@ -1,6 +1,7 @@
 #include "output/image_writer.h"
 
 #include <fcntl.h>
+#include <signal.h>
 #include <unistd.h>
 
 #include <OpenImageIO/filesystem.h>
@@ -8,6 +9,7 @@
 
 #include <cerrno>
 #include <cstdint>
+#include <cstdlib>
 #include <cstring>
 #include <system_error>
 #include <vector>
@@ -180,6 +182,21 @@ void WritePrepared(const PreparedImage& image) {
 
 void WriteWorld(const PF_World& world, const std::filesystem::path& path) {
     WritePrepared(PrepareImage(world, path));
+}
+
+void RemoveStalePartials(const std::filesystem::path& folder) {
+    const std::string kMark = ".partial-";
+    std::error_code error;
+    for (const auto& entry :
+         std::filesystem::directory_iterator(folder.empty() ? "." : folder, error)) {
+        std::string name = entry.path().filename().string();
+        size_t mark = name.rfind(kMark);
+        if (name[0] != '.' || mark == std::string::npos) continue;
+        // Signal 0 only asks whether the process exists; a pid that runs again keeps its files.
+        long pid = std::strtol(name.c_str() + mark + kMark.size(), nullptr, 10);
+        if (pid > 0 && ::kill(static_cast<pid_t>(pid), 0) != 0 && errno == ESRCH)
+            std::filesystem::remove(entry.path(), error);
+    }
 }
 
 std::string ExpandFramePattern(const std::string& pattern, int frame) {

@@ -35,6 +35,10 @@ void WritePrepared(const PreparedImage& image);
 // and the problem, also for a full disk.
 void WriteWorld(const PF_World& world, const std::filesystem::path& path);
 
+// Removes the hidden temporaries that writers killed before they finished left in folder: those
+// of processes that no longer run. Called once for each folder a render writes into.
+void RemoveStalePartials(const std::filesystem::path& folder);
+
 // The output name for a frame: every run of '#' becomes the frame number padded with zeros
 // to the run's length ("shot.####.png", 7 → "shot.0007.png"). A pattern without '#' is
 // returned as it is.

@@ -3,6 +3,7 @@
 #include <OpenImageIO/imagebuf.h>
 
 #include <sys/mount.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
@@ -101,6 +102,18 @@ TEST(ImageWriter, FullDiskIsAnErrorAndLeavesNothing) {
         EXPECT_EQ(FileCount(folder), 1u) << name;
     }
     ::umount(folder.Path().c_str());
+}
+
+// The temporaries of writers that no longer run go; those of a running one, and frames, stay.
+TEST(ImageWriter, StalePartialsOfEndedWritersGo) {
+    TempFolder folder;
+    const std::string stale = ".a.partial-2147483646.png";  // beyond any pid the kernel gives
+    for (const std::string& name :
+         {stale, ".a.partial-" + std::to_string(::getpid()) + ".png", std::string("a.png")})
+        std::ofstream(folder.Path() / name) << "x";
+    ostrel::RemoveStalePartials(folder.Path());
+    EXPECT_FALSE(fs::exists(folder.Path() / stale));
+    EXPECT_EQ(FileCount(folder), 2u);
 }
 
 }  // namespace
