@@ -35,6 +35,14 @@ auto Option(const char* name, Parse&& parse) {
     }
 }
 
+// The parser takes an empty value as given; it is a mistake the user should hear of, not a
+// default.
+const CLI::Validator kNonEmpty(
+    [](std::string& value) {
+        return value.empty() ? std::string("an empty value") : std::string();
+    },
+    "", "NONEMPTY");
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -51,36 +59,50 @@ int main(int argc, char** argv) {
     std::string composition, frames, downsample, region, fields = "off", multiprocessing = "on";
     int bitDepth = 0;
     CLI::App* renderCommand = app.add_subcommand("render", "Render frames to image files");
-    renderCommand->add_option("COMP", composition, "Composition file (JSON)")->required();
-    renderCommand->add_option("-o,--output", render.outputPattern,
-                              "Output files; #### becomes the frame number (default: COMP's "
-                              "name with .####.png, beside it)");
-    renderCommand->add_option("--frames", frames, "Frames to render, A-B or A (default: all)");
+    renderCommand->add_option("COMP", composition, "Composition file (JSON)")
+        ->required()
+        ->check(kNonEmpty);
+    renderCommand
+        ->add_option("-o,--output", render.outputPattern,
+                     "Output files; #### becomes the frame number (default: COMP's "
+                     "name with .####.png, beside it)")
+        ->check(kNonEmpty);
+    renderCommand->add_option("--frames", frames, "Frames to render, A-B or A (default: all)")
+        ->check(kNonEmpty);
     renderCommand->add_option("--depth", bitDepth, "Bit depth instead of the comp's: 8, 16, 32")
-        ->check(CLI::IsMember({8, 16, 32}));
-    renderCommand->add_option("--downsample", downsample, "Render at 1/N size: N or XxY");
+        ->check(CLI::IsMember({8, 16, 32}))
+        ->check(kNonEmpty);
+    renderCommand->add_option("--downsample", downsample, "Render at 1/N size: N or XxY")
+        ->check(kNonEmpty);
     renderCommand->add_option("--fields", fields, "Field rendering: off, upper or lower first")
         ->check(CLI::IsMember({"off", "upper", "lower"}));
-    renderCommand->add_option("--region", region,
-                              "Render only LEFT,TOP,RIGHT,BOTTOM of the comp (pixels)");
+    renderCommand
+        ->add_option("--region", region, "Render only LEFT,TOP,RIGHT,BOTTOM of the comp (pixels)")
+        ->check(kNonEmpty);
     renderCommand
         ->add_option("--multiprocessing", multiprocessing,
                      "Let the renderer use several threads: on or off")
         ->check(CLI::IsMember({"on", "off"}));
     renderCommand->add_option("--threads", render.threads, "Worker threads (0: one per core)")
         ->check(CLI::Range(0, 256));
-    renderCommand->add_option("--plugins", pluginFolders,
-                              "Folder to search for plug-ins before the default one");
+    renderCommand
+        ->add_option("--plugins", pluginFolders,
+                     "Folder to search for plug-ins before the default one")
+        ->check(kNonEmpty);
     renderCommand->add_flag("--stats", render.stats,
                             "Print the time spent inside and outside the plug-in");
 
     CLI::App* aboutCommand = app.add_subcommand("about", "Show the renderer's about box");
-    aboutCommand->add_option("--plugins", pluginFolders,
-                             "Folder to search for plug-ins before the default one");
+    aboutCommand
+        ->add_option("--plugins", pluginFolders,
+                     "Folder to search for plug-ins before the default one")
+        ->check(kNonEmpty);
 
     int32_t infoFrame = 0;
     CLI::App* infoCommand = app.add_subcommand("info", "List what a composition will render");
-    infoCommand->add_option("COMP", composition, "Composition file (JSON)")->required();
+    infoCommand->add_option("COMP", composition, "Composition file (JSON)")
+        ->required()
+        ->check(kNonEmpty);
     infoCommand->add_option("--frame", infoFrame, "The frame whose layers are listed")
         ->check(CLI::NonNegativeNumber);
 

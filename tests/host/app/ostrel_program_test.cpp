@@ -89,6 +89,7 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
          "ostrel: stdout.txt/c.0000.png",
          {}},
         {"usage", "render shot/cards.json --depth 12", 101, {}, "--help", {}},
+        {"empty value", "render shot/cards.json --region ''", 101, {}, "--region: an empty", {}},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.name);
