@@ -492,6 +492,14 @@ Composition ParseComposition(std::string_view text, const std::filesystem::path&
 }
 
 Composition LoadComposition(const std::filesystem::path& file) {
+    // A composition is a text file of modest size: a folder, a device or a pipe would hang the
+    // read or be reported as malformed JSON.
+    constexpr std::uintmax_t kLargest = std::uintmax_t{64} << 20;
+    std::error_code error;
+    if (std::filesystem::exists(file, error) && !std::filesystem::is_regular_file(file, error))
+        throw CompositionError(file.string() + ": not a regular file");
+    if (std::filesystem::file_size(file, error) > kLargest && !error)
+        throw CompositionError(file.string() + ": larger than 64 MiB, too large for a composition");
     std::ifstream in(file, std::ios::binary);
     if (!in) throw CompositionError(file.string() + ": cannot open: " + std::strerror(errno));
     std::ostringstream text;

@@ -15,7 +15,9 @@ namespace {
 }
 
 std::unique_ptr<OIIO::ImageInput> Open(const std::filesystem::path& file) {
-    if (!std::filesystem::is_regular_file(file)) Fail(file, "no such file");
+    std::error_code error;
+    if (!std::filesystem::is_regular_file(file, error))
+        Fail(file, std::filesystem::exists(file, error) ? "not a regular file" : "no such file");
     // Ask for colour as stored: readers that can keep alpha unassociated then do so.
     OIIO::ImageSpec config;
     config.attribute("oiio:UnassociatedAlpha", 1);
@@ -50,7 +52,8 @@ DecodedImage DecodeImage(const std::filesystem::path& file) {
     int alphaChannel = layout.alpha_channel >= 0 ? layout.alpha_channel : (channels == 2 ? 1 : -1);
     if (channels >= 4 && alphaChannel < 0) alphaChannel = 3;
     int colorChannels = channels >= 3 ? 3 : 1;
-    bool associated = alphaChannel >= 0 && layout.get_int_attribute("oiio:UnassociatedAlpha", 0) == 0;
+    bool associated =
+        alphaChannel >= 0 && layout.get_int_attribute("oiio:UnassociatedAlpha", 0) == 0;
 
     DecodedImage image;
     image.width = layout.width;

@@ -128,6 +128,16 @@ TEST(CompositionLoader, FilesAreFoundBesideTheComposition) {
         ErrorOf(WithLayers(R"({"kind": "image", "source": "images/gone.png"})"), comp);
     EXPECT_EQ(missing, file + ": layers[0].source: cannot read image '" +
                            (folder.Path() / "images" / "gone.png").string() + "': no such file");
+    // A folder or a device is refused before it is read (a read of /dev/zero would never end).
+    for (const std::filesystem::path& odd :
+         {folder.Path() / "images", std::filesystem::path("/dev/zero")}) {
+        try {
+            LoadComposition(odd);
+            ADD_FAILURE() << odd << " loaded";
+        } catch (const CompositionError& e) {
+            EXPECT_EQ(e.what(), odd.string() + ": not a regular file");
+        }
+    }
 }
 
 }  // namespace
