@@ -126,6 +126,9 @@ bool ReadBool(const JsonContext& c, const Json& j, const std::string& place) {
 
 std::string ReadString(const JsonContext& c, const Json& j, const std::string& place) {
     if (!j.is_string()) c.Fail(place, "expected a string, got " + Describe(j));
+    // A NUL would silently cut a file name short where the system reads it.
+    if (j.get_ref<const std::string&>().find('\0') != std::string::npos)
+        c.Fail(place, "a string with a NUL character");
     return j.get<std::string>();
 }
 

@@ -77,6 +77,8 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
          "\"solid\""},
         {WithLayers(R"({"kind": "null"}, {"kind": "null", "transform": {"positon": [1, 2]}})"),
          "bad.json: layers[1].transform: unknown key \"positon\" (did you mean \"position\"?)"},
+        {WithLayers(R"({"kind": "image", "source": "card\u0000.png"})"),
+         "bad.json: layers[0].source: a string with a NUL character"},
         {WithLayers(R"({"kind": "null", "transform": {"position": [1, "2", 3]}})"),
          "bad.json: layers[0].transform.position[1]: expected a number, got a string"},
         {WithLayers("{" + solid + R"(, "transform": {"opacity": 120}})"),
