@@ -4,6 +4,8 @@
 #include <stdexcept>
 #include <vector>
 
+#include "host_error.h"
+
 namespace ostrel {
 namespace {
 
@@ -34,7 +36,7 @@ FrameRange ParseFrameRange(const std::string& text, int32_t frameCount) {
     bool read = parts.size() <= 2 && ReadInt(parts[0], &range.first);
     range.last = range.first;
     if (read && parts.size() == 2) read = ReadInt(parts[1], &range.last);
-    if (!read) throw std::invalid_argument("\"" + text + "\" is not a frame range like 0-47");
+    if (!read) throw std::invalid_argument(QuoteUserText(text) + " is not a frame range like 0-47");
     if (range.first > range.last) {
         throw std::invalid_argument("the frame range " + text + " ends before it starts");
     }
@@ -52,8 +54,8 @@ Downsample ParseDownsample(const std::string& text) {
     y = x;
     if (read && parts.size() == 2) read = ReadInt(parts[1], &y);
     if (!read || x < 1 || x > 64 || y < 1 || y > 64) {
-        throw std::invalid_argument("\"" + text +
-                                    "\" is not a downsample factor like 2 or 2x1 (1 to 64)");
+        throw std::invalid_argument(QuoteUserText(text) +
+                                    " is not a downsample factor like 2 or 2x1 (1 to 64)");
     }
     return {static_cast<int16_t>(x), static_cast<int16_t>(y)};
 }
@@ -65,8 +67,8 @@ M_LRect ParseRegion(const std::string& text) {
     for (size_t i = 0; read && i < 4; ++i)
         read = ReadInt(parts[i], &v[i]);
     if (!read) {
-        throw std::invalid_argument("\"" + text +
-                                    "\" is not a region like LEFT,TOP,RIGHT,BOTTOM in pixels");
+        throw std::invalid_argument(QuoteUserText(text) +
+                                    " is not a region like LEFT,TOP,RIGHT,BOTTOM in pixels");
     }
     return {v[0], v[1], v[2], v[3]};
 }

@@ -240,8 +240,8 @@ PendingLayer Loader::ReadLayer(const Json& node, size_t index) {
             });
         if (!identifier) {
             r.Fail("transferMode",
-                   "expected a mode name in lower case, such as \"multiply\", got \"" +
-                       layer.transferMode + "\"");
+                   "expected a mode name in lower case, such as \"multiply\", got " +
+                       QuoteUserText(layer.transferMode));
         }
         layer.preserveTransparency = r.Bool("preserveTransparency", layer.preserveTransparency);
         ReadTrackMatte(r, pending);

@@ -76,8 +76,8 @@ Vec<3> ReadHexColor(const JsonContext& c, const std::string& text, const std::st
         text.size() == 7 && text[0] == '#' &&
         std::all_of(text.begin() + 1, text.end(), [](char ch) { return HexDigit(ch) >= 0; });
     if (!valid)
-        c.Fail(place,
-               "expected a colour as \"#rrggbb\" or [red, green, blue], got \"" + text + "\"");
+        c.Fail(place, "expected a colour as \"#rrggbb\" or [red, green, blue], got " +
+                          QuoteUserText(text));
     Vec<3> color;
     for (size_t i = 0; i < 3; ++i) {
         color[i] = (HexDigit(text[1 + 2 * i]) * 16 + HexDigit(text[2 + 2 * i])) / 255.0;
@@ -239,12 +239,14 @@ void ObjectReader::Finish(std::string_view what,
         if (std::find(elsewhere.begin(), elsewhere.end(), key) != elsewhere.end()) {
             Fail(key, "does not apply to " + std::string(what));
         }
-        std::string problem = "unknown key \"" + key + "\"";
-        auto nearest = std::min_element(
-            known_.begin(), known_.end(),
-            [&](const auto& a, const auto& b) { return Distance(key, a) < Distance(key, b); });
-        if (nearest != known_.end() && Distance(key, *nearest) <= 2) {
-            problem += " (did you mean \"" + *nearest + "\"?)";
+        std::string problem = "unknown key " + QuoteUserText(key);
+        // A near miss differs by a letter or two; a long key cannot be one.
+        if (key.size() <= 64) {
+            auto nearest = std::min_element(
+                known_.begin(), known_.end(),
+                [&](const auto& a, const auto& b) { return Distance(key, a) < Distance(key, b); });
+            if (nearest != known_.end() && Distance(key, *nearest) <= 2)
+                problem += " (did you mean \"" + *nearest + "\"?)";
         }
         c_.Fail(place_, problem);
     }

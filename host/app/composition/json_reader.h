@@ -15,6 +15,7 @@
 #include <nlohmann/json.hpp>
 
 #include "composition/keyframes.h"
+#include "host_error.h"
 
 namespace ostrel {
 
@@ -107,7 +108,7 @@ public:
         for (const auto& choice : choices) {
             expected += (expected.empty() ? "\"" : ", \"") + std::string(choice.first) + "\"";
         }
-        c_.Fail(place, "unknown value \"" + name + "\"; expected one of " + expected);
+        c_.Fail(place, "unknown value " + QuoteUserText(name) + "; expected one of " + expected);
     }
 
     // Fails on the first key nobody asked for. Keys in `elsewhere` belong to other kinds of

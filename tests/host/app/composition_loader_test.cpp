@@ -77,6 +77,8 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
          "\"solid\""},
         {WithLayers(R"({"kind": "null"}, {"kind": "null", "transform": {"positon": [1, 2]}})"),
          "bad.json: layers[1].transform: unknown key \"positon\" (did you mean \"position\"?)"},
+        {R"({"width": 1, "height": 1, "duration": 1, ")" + std::string(70, 'k') + R"(": 1})",
+         "bad.json: unknown key \"" + std::string(64, 'k') + "…\" (70 characters)"},
         {WithLayers(R"({"kind": "image", "source": "card\u0000.png"})"),
          "bad.json: layers[0].source: a string with a NUL character"},
         {WithLayers(R"({"kind": "null", "transform": {"position": [1, "2", 3]}})"),
