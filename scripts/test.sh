@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # Sets up, builds and runs the whole test suite: the optimised build, then the same tests
 # under the address and undefined-behaviour sanitizers, then the threaded tests under the
-# thread sanitizer. OSTREL_QUICK=1 runs the optimised build only.
+# thread sanitizer, then each fuzz target for 30 seconds. OSTREL_QUICK=1 runs the optimised
+# build only.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -22,4 +23,5 @@ run_preset default
 if [[ ${OSTREL_QUICK:-0} != 1 ]]; then
     run_preset asan
     run_preset tsan --target threaded_tests
+    bash scripts/fuzz.sh 30
 fi

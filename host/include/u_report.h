@@ -3,7 +3,6 @@
 #pragma once
 
 #include <cstdint>
-#include <source_location>
 
 // Returned for an exception that is not about memory.
 inline constexpr int32_t kU_ErrInternal = 0x13A80003;
@@ -40,9 +39,9 @@ int32_t U_TranslateAndReportException();
 // is thrown.
 class U_BitDepthVerification {
 public:
-    explicit U_BitDepthVerification(const char* message,
-                                    std::source_location where = std::source_location::current())
-        : message_(message), line_(static_cast<int32_t>(where.line())) {}
+    // The builtin, unlike std::source_location, is known to every compiler the project uses.
+    explicit U_BitDepthVerification(const char* message, int32_t line = __builtin_LINE())
+        : message_(message), line_(line) {}
     [[noreturn]] void operator()(int32_t bitDepth) const;
 
 private:

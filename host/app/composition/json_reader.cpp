@@ -234,7 +234,8 @@ std::string ObjectReader::String(std::string_view key, std::string fallback) {
 
 void ObjectReader::Finish(std::string_view what,
                           std::span<const std::string_view> elsewhere) const {
-    for (const auto& [key, value] : node_->items()) {
+    for (const auto& item : node_->items()) {
+        const std::string& key = item.key();
         if (known_.contains(key)) continue;
         if (std::find(elsewhere.begin(), elsewhere.end(), key) != elsewhere.end()) {
             Fail(key, "does not apply to " + std::string(what));
