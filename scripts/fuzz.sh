@@ -14,5 +14,5 @@ corpus=build/fuzz/corpus/composition
 mkdir -p "$corpus" build/fuzz/crashes
 cp examples/*/*.json "$corpus"/
 build/fuzz/fuzz/composition_fuzzer "$corpus" -dict=fuzz/composition.dict \
-    -max_total_time="$seconds" -timeout=10 -rss_limit_mb=4096 -print_final_stats=1 \
+    -max_total_time="$seconds" -timeout=10 -rss_limit_mb=4096 -print_final_stats=1 -print_funcs=0 \
     -artifact_prefix=build/fuzz/crashes/
