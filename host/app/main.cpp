@@ -106,7 +106,15 @@ int main(int argc, char** argv) {
     infoCommand->add_option("--frame", infoFrame, "The frame whose layers are listed")
         ->check(CLI::NonNegativeNumber);
 
-    CLI11_PARSE(app, argc, argv);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& help) {
+        return app.exit(help);
+    } catch (const CLI::ParseError& error) {
+        // One line like every other error; the status stays the parser's, above 100.
+        std::cerr << "ostrel: " << error.what() << " (ostrel --help lists the options)\n";
+        return error.get_exit_code();
+    }
 
     try {
         if (renderCommand->parsed()) {

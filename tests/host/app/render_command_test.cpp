@@ -38,15 +38,6 @@ TEST(RenderCommand, RefusesWithAMessageNamingTheFileAndWritesNothing) {
                "transferMode": "sparkle"}]})",
          [](RenderOptions&) {},
          "comp.json: layers[0].transferMode: no transfer mode is named \"sparkle\" (frame 0)"},
-        {"frame past the end", "", [](RenderOptions& o) { o.frames = "40-48"; },
-         "cards.json: --frames: the frame range 40-48 reaches outside the frames 0-47"},
-        {"region outside the comp", "",
-         [](RenderOptions& o) {
-             o.settings.region = M_LRect{0, 0, 2000, 100};
-         },
-         "cards.json: render settings: a region of interest that is empty or reaches outside"},
-        {"unknown image format", "", [](RenderOptions& o) { o.outputPattern += ".nothing"; },
-         ".png.nothing: cannot write"},
         {"no renderer", "", [](RenderOptions& o) { o.pluginFolders.clear(); },
          "no plug-in registers the renderer \"VLMR Ormond\""},
     };
