@@ -1,7 +1,12 @@
 // The ostrel program run as a user runs it: exit status, messages, and the files it leaves.
 #include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <OpenImageIO/imageio.h>
+
+#include <nlohmann/json.hpp>
 
 #include <algorithm>
 #include <cstdlib>
@@ -12,6 +17,7 @@
 #include <tuple>
 #include <vector>
 
+#include "output/image_writer.h"
 #include "test_files.h"
 
 namespace ostrel {
@@ -114,6 +120,95 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
         ASSERT_TRUE(in);
         EXPECT_EQ(std::tuple(in->spec().width, in->spec().height, in->spec().format.basetype),
                   std::tuple(c.frames.width, c.frames.height, c.frames.type));
+    }
+}
+
+// Two hundred moving layers, best quality, parented in chains and every fifth taking the one
+// above as a matte, on a small frame: the sanitizers watch the fragment and matte paths at scale.
+TEST(OstrelProgram, RendersTwoHundredBlurredMattedParentedLayers) {
+    TempFolder folder;
+    nlohmann::json layers = nlohmann::json::array();
+    layers.push_back({{"name", "camera"}, {"kind", "camera"}, {"camera", {{"zoom", 80}}}});
+    layers.push_back({{"kind", "light"}, {"light", {{"type", "point"}}}});
+    for (int i = 0; i < 200; ++i) {
+        nlohmann::json layer = {
+            {"name", "card " + std::to_string(i)},
+            {"kind", "solid"},
+            {"threeD", true},
+            {"motionBlur", true},
+            {"source", {{"color", {i % 3 / 2.0, i % 5 / 4.0, 0.5}}, {"width", 24}, {"height", 24}}},
+            {"transform",
+             {{"position",
+               {{"keyframes",
+                 {{{"time", 0}, {"value", {20 + i % 7 * 3, 14 + i % 11 * 2, i % 13 - 6}}},
+                  {{"time", 1}, {"value", {24 + i % 5 * 4, 18 + i % 3 * 5, 6 - i % 13}}}}}}},
+              {"rotationY", i * 17 % 90},
+              {"opacity", 40 + i % 60}}}};
+        if (i % 10) layer["parent"] = "card " + std::to_string(i - 1);
+        if (i % 5 == 1) layer["trackMatte"] = i % 2 ? "luma" : "alpha";
+        layers.push_back(layer);
+    }
+    nlohmann::json comp = {{"width", 64},
+                           {"height", 48},
+                           {"duration", 1},
+                           {"motionBlur", {{"enabled", true}, {"samplesPerFrame", 4}}},
+                           {"layers", layers}};
+    folder.WriteText("many.json", comp.dump());
+    std::string command = "cd '" + folder.Path().string() +
+                          "' && '" OSTREL_PROGRAM
+                          "' render many.json --frames 12 -o m.####.png >/dev/null";
+    EXPECT_EQ(std::system(command.c_str()), 0);
+    EXPECT_TRUE(fs::exists(folder.Path() / "m.0012.png"));
+}
+
+// A render killed outright leaves at most the temporaries of a process that is gone, which the
+// next render into the folder removes; an interrupted one stops with whole frames only.
+TEST(OstrelProgram, KilledAndInterruptedRendersLeaveWholeFramesOnly) {
+    TempFolder folder;
+    fs::copy(fs::path(OSTREL_EXAMPLES_DIR) / "cards", folder.Path() / "shot");
+    auto start = [&] {
+        pid_t pid = ::fork();
+        if (pid == 0) {
+            if (::chdir(folder.Path().c_str()) != 0 || !std::freopen("/dev/null", "w", stdout) ||
+                !std::freopen("/dev/null", "w", stderr))
+                ::_exit(127);
+            ::execl(OSTREL_PROGRAM, "ostrel", "render", "shot/cards.json", "-o", "f/c.####.png",
+                    "--downsample", "2", nullptr);
+            ::_exit(127);
+        }
+        return pid;
+    };
+    auto frames = [&] {
+        int count = 0;
+        while (fs::exists(folder.Path() / ExpandFramePattern("f/c.####.png", count)))
+            ++count;
+        return count;
+    };
+    // Stops the render with the signal once it has written two frames more than there were.
+    auto stop = [&](int signal) {
+        int target = frames() + 2, status = 0;
+        pid_t pid = start();
+        for (int wait = 0; wait < 4000 && frames() < target; ++wait)
+            ::usleep(5000);
+        ::kill(pid, signal);
+        ::waitpid(pid, &status, 0);
+        return status;
+    };
+    EXPECT_TRUE(WIFSIGNALED(stop(SIGKILL)));
+    int interrupted = stop(SIGINT);
+    EXPECT_TRUE(WIFEXITED(interrupted) && WEXITSTATUS(interrupted) == 130) << interrupted;
+    EXPECT_LT(frames(), 48);
+    int finished = 0;
+    ::waitpid(start(), &finished, 0);
+    EXPECT_EQ(finished, 0);
+    EXPECT_EQ(frames(), 48);
+    EXPECT_EQ(FilesIn(folder.Path() / "f"), 48u);
+    for (int frame = 0; frame < 48; ++frame) {
+        auto in = OIIO::ImageInput::open(
+            (folder.Path() / ExpandFramePattern("f/c.####.png", frame)).string());
+        std::vector<uint8_t> pixels(480 * 270 * 4);
+        EXPECT_TRUE(in && in->read_image(0, 0, 0, 4, OIIO::TypeDesc::UINT8, pixels.data()))
+            << frame;
     }
 }
 
