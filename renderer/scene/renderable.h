@@ -12,7 +12,7 @@
 
 struct SY_LightState;
 struct SY_RenderContext;
-struct SY_RenderTarget;
+class SY_RenderTarget;
 class SY_Shader;
 
 // The camera as the geometry sees it: world-to-screen matrices, one per camera subsample.

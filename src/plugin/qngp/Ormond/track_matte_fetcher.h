@@ -29,7 +29,8 @@ public:
 
 private:
     ORM_RenderContext* context_;
-    QNGP_LayerH layer_;
+    // Part of the record though fetching needs only the layer context, which finds the matte.
+    [[maybe_unused]] QNGP_LayerH layer_;
     QNGP_LayerContextH layerContext_;
     ORM_MatteType type_;
     std::unique_ptr<PF_World> matte_;  // the host's world, ours to delete
