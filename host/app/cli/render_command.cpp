@@ -80,6 +80,7 @@ std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_
     text << where << "the renderer \"" << artisan.displayName << "\" failed with error " << code
          << " (0x" << std::hex << code << ")";
     if (code == kU_ErrUnexpectedBitDepth) text << ": pixels of a depth other than 8, 16 or 32 bits";
+    if (code == kU_ErrOutOfMemory) text << ": out of memory";
     return text.str();
 }
 

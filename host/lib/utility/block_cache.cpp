@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <map>
 #include <mutex>
+#include <new>
 #include <vector>
 
 #if defined(__linux__)
@@ -79,12 +80,19 @@ void* TakeRawBlock(size_t bytes) {
     return block;
 }
 
-void GiveBackRawBlock(void* block, size_t bytes) {
+void GiveBackRawBlock(void* block, size_t bytes) noexcept {
     if (bytes >= kKeptBlockMinimum) {
         KeptBlocks& kept = Kept();
         std::lock_guard<std::mutex> hold(kept.lock);
         if (kept.bytes + bytes <= kept.limit) {
-            kept.bySize[bytes].push_back(block);
+            // Keeping a block takes a little memory of its own; when even that is gone, the
+            // block is freed instead, since destructors give blocks back and must not throw.
+            try {
+                kept.bySize[bytes].push_back(block);
+            } catch (const std::bad_alloc&) {
+                std::free(block);
+                return;
+            }
             kept.bytes += bytes;
             U_POISON(block, bytes);
             return;

@@ -18,7 +18,7 @@ void* TakeRawBlock(size_t bytes);
 
 // Keeps the raw block of bytes for a later TakeRawBlock of the same size, or frees it when
 // the kept blocks already hold their share of the machine's memory.
-void GiveBackRawBlock(void* block, size_t bytes);
+void GiveBackRawBlock(void* block, size_t bytes) noexcept;
 
 // Frees every kept block. Returns true when there were any.
 bool LetKeptBlocksGo();

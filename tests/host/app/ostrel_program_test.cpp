@@ -161,6 +161,38 @@ TEST(OstrelProgram, RendersTwoHundredBlurredMattedParentedLayers) {
     EXPECT_TRUE(fs::exists(folder.Path() / "m.0012.png"));
 }
 
+// Thirty-two full-frame 16-bit cards crossing on one axis need more fragments than 1.3 GB of
+// address space holds: the frame fails as out of memory in one line, with nothing written, never an
+// abort. (The address sanitizer cannot run under such a limit.)
+TEST(OstrelProgram, OutOfMemoryIsAnErrorNotAnAbort) {
+#if defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the address sanitizer needs more address space than the limit allows";
+#endif
+    TempFolder folder;
+    nlohmann::json layers = nlohmann::json::array();
+    for (int i = 0; i < 32; ++i) {
+        layers.push_back(
+            {{"kind", "solid"},
+             {"threeD", true},
+             {"quality", "draft"},
+             {"source", {{"color", {0.5, 0.5, 0.5}}, {"width", 1600}, {"height", 900}}},
+             {"transform", {{"rotationY", i * 5.625}, {"opacity", 70}}}});
+    }
+    nlohmann::json comp = {
+        {"width", 1920}, {"height", 1080}, {"duration", 1}, {"bitDepth", 16}, {"layers", layers}};
+    folder.WriteText("fan.json", comp.dump());
+    std::string command = "cd '" + folder.Path().string() +
+                          "' && ulimit -v 1300000 && '" OSTREL_PROGRAM
+                          "' render fan.json -o f.####.tif >/dev/null 2>err.txt";
+    int status = std::system(command.c_str());
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+    EXPECT_EQ(
+        ReadAll(folder.Path() / "err.txt"),
+        "ostrel: fan.json: frame 0: the renderer \"Ostrel 3D\" failed with error 4 (0x4): out "
+        "of memory\n");
+    EXPECT_EQ(FilesIn(folder.Path()), 2u);
+}
+
 // A render killed outright leaves at most the temporaries of a process that is gone, which the
 // next render into the folder removes; an interrupted one stops with whole frames only.
 TEST(OstrelProgram, KilledAndInterruptedRendersLeaveWholeFramesOnly) {
