@@ -32,7 +32,9 @@ void Tessary3DOptionsDialog::ViewBuilt() {
     for (const char* label : ORM_ShadowMapSizeLabels)
         items.push_back(U_ZStringToUTF16String(label));
     popup.SetItems(std::move(items));
-    popup.SetValue(options_->shadowMapSizeChoice);
+    // A choice this popup lacks (saved by a later version) renders as "Comp Size"; so it shows.
+    int32_t choice = options_->shadowMapSizeChoice;
+    popup.SetValue(choice > 0 && choice < kORM_ShadowMapSizeChoices ? choice : 0);
 }
 
 int32_t ORM_RunOptionsDialog(const QNGP_InData* in, ORM_InstanceOptions* options,
