@@ -90,6 +90,8 @@ int main(int argc, char** argv) {
         ->add_option("--plugins", pluginFolders,
                      "Folder to search for plug-ins before the default one")
         ->check(kNonEmpty);
+    renderCommand->add_flag("--background", render.background,
+                            "Composite the frames over the comp's background colour");
     renderCommand->add_flag("--stats", render.stats,
                             "Print the time spent inside and outside the plug-in");
 

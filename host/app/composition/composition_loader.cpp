@@ -148,6 +148,8 @@ void Loader::ReadComp(ObjectReader& r) {
             ReadVec<3>(c_, *background, "background", {}, Range::Between(0, 1), true);
     }
 
+    comp_.renderBackground = r.Bool("renderBackground", comp_.renderBackground);
+
     ObjectReader blur = r.Object("motionBlur");
     comp_.motionBlur.enabled = blur.Bool("enabled", comp_.motionBlur.enabled);
     comp_.motionBlur.samplesPerFrame =
