@@ -72,17 +72,21 @@ public:
     // The text shown for the node: a dialog's title, a static text's or a button's label.
     const std::u16string& Name() const { return name_; }
     void SetName(std::u16string name) { name_ = std::move(name); }
+    // How a container places its children: side by side (the default) or one below another.
     Placement GetPlacement() const { return placement_; }
     void SetPlacement(Placement placement) { placement_ = placement; }
     // The narrowest the node is drawn, in points; 0 when the content decides.
     int32_t MinWidth() const { return minWidth_; }
     void SetMinWidth(int32_t points) { minWidth_ = points; }
 
+    // The nodes inside this one, in the order they are drawn; each is held by its parent.
     const std::vector<boost::intrusive_ptr<UI_Node>>& Children() const { return children_; }
     void AddChild(boost::intrusive_ptr<UI_Node> child) { children_.push_back(std::move(child)); }
     // The first node in depth-first order, this one included, with the identifier; null if none.
     UI_Node* FindNode(std::string_view identifier);
 
+    // Counting for boost::intrusive_ptr; a node goes with its last pointer. Nodes live on the
+    // UI thread, so the count is a plain integer.
     friend void intrusive_ptr_add_ref(UI_Node* node) { ++node->references_; }
     friend void intrusive_ptr_release(UI_Node* node) {
         if (--node->references_ == 0) delete node;
@@ -178,7 +182,7 @@ UI_ModalPresenter UI_SetModalPresenter(UI_ModalPresenter presenter);
 // The framework's record of its windows.
 class UI_NodeManager {
 public:
-    // The manager of a screen; the host has one, index 0.
+    // The manager of a screen; the host has one, index 0, whatever the index asked for.
     static UI_NodeManager& Get(int32_t screen);
     // The dialog being shown modally, or null.
     UI_Node* GetModalWindow() const { return modal_; }

@@ -66,6 +66,16 @@ std::vector<std::string> Draw(const UI_Dialog& dialog, Entry&& entry) {
     return lines;
 }
 
+// A popup's entries are drawn at least its minimum width, in columns of about 8 points.
+std::string Padded(std::string text, const UI_Popup& popup) {
+    constexpr int32_t kPointsPerColumn = 8;
+    auto columns =
+        std::count_if(text.begin(), text.end(), [](char c) { return (c & 0xC0) != 0x80; });
+    auto wanted = popup.MinWidth() / kPointsPerColumn;
+    if (columns < wanted) text.append(static_cast<size_t>(wanted - columns), ' ');
+    return text;
+}
+
 std::string Mark(const UI_Popup& popup, int32_t i) {
     bool selected = popup.GetValue() == i;
     return popup.ItemCheckStyle() ? (selected ? "✓ " : "  ") : "";
@@ -119,7 +129,7 @@ UI_DialogResult Interactive(UI_Dialog& dialog, const std::vector<UI_Popup*>& pop
         bool current = !popups.empty() && &popup == popups[focus] && popup.GetValue() == i;
         std::string text =
             Mark(popup, i) + U_UTF16ToMBString(popup.Items()[static_cast<size_t>(i)]);
-        return current ? "> \x1b[7m" + text + "\x1b[0m" : "  " + text;
+        return current ? "> \x1b[7m" + Padded(text, popup) + "\x1b[0m" : "  " + text;
     };
     std::cout << "\x1b[?25l";  // no cursor blinking over the list
     size_t drawn = 0;
@@ -183,6 +193,7 @@ UI_DialogResult Numbered(UI_Dialog& dialog, const std::vector<UI_Popup*>& popups
                 std::cout << "\nCancelled" << std::endl;
                 return UI_DialogResult::kCancel;
             }
+            std::cout << answer << '\n';  // the input is not a terminal that shows it
             if (answer.empty()) break;
             bool digits =
                 answer.size() < 4 && std::all_of(answer.begin(), answer.end(),
