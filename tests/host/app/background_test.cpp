@@ -5,8 +5,8 @@
 namespace ostrel {
 namespace {
 
-// Three pixels over a background of red 0.5, green 0, blue 1: transparent, a fifth or a quarter
-// opaque, and opaque. Each depth gives the expected levels of its red channel.
+// Three pixels over a background of red 0.5, green 0, blue 1: transparent, partly opaque, and
+// opaque. Each depth gives the expected levels of its red channel.
 template <class P>
 void ExpectComposited(P partial, double expectedRed) {
     using Traits = PF_PixelTraits<P>;
@@ -26,8 +26,8 @@ void ExpectComposited(P partial, double expectedRed) {
 }
 
 TEST(Background, FrameIsCompositedOverTheCompColor) {
-    // 255 · 0.2 + 128 · 0.8 = 153.4; 32768 · 0.25 + 16384 · 0.75 = 20480; 0.25 + 0.5 · 0.75.
-    ExpectComposited<PF_Pixel8>({51, 255, 0, 0}, 153);
+    // (2 · 128 + 128 · 127) / 255 = 64.75; 32768 · 0.25 + 16384 · 0.75 = 20480; 0.25 + 0.5 · 0.75.
+    ExpectComposited<PF_Pixel8>({128, 2, 0, 0}, 65);
     ExpectComposited<PF_Pixel16>({8192, 32768, 0, 0}, 20480);
     ExpectComposited<PF_PixelFloat>({0.25f, 1.0f, 0, 0}, 0.625);
 }
