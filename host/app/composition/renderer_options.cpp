@@ -25,9 +25,10 @@ public:
         return at;
     }
 
-    // The value starting at at (not blank).
+    // The value starting at at (not blank); empty at the end of the text.
     Span Value(size_t at) const {
         Span span{at, at};
+        if (at >= text_.size()) return span;
         char first = text_[at];
         if (first == '"') {
             span.end = StringEnd(at);
@@ -58,16 +59,11 @@ public:
     // The value of the member with the key in the object whose '{' is at objectStart; a key
     // written with escapes is not recognised, which the caller's check of the result catches.
     std::optional<Span> Member(size_t objectStart, std::string_view key) const {
-        size_t at = SkipBlanks(objectStart + 1);
-        while (at < text_.size() && text_[at] == '"') {
-            size_t keyEnd = StringEnd(at);
-            std::string_view name = text_.substr(at + 1, keyEnd - at - 2);
-            Span value = Value(SkipBlanks(SkipBlanks(keyEnd) + 1));
-            if (name == key) return value;
-            at = SkipBlanks(value.end);
-            if (at < text_.size() && text_[at] == ',') at = SkipBlanks(at + 1);
-        }
-        return std::nullopt;
+        std::optional<Span> found;
+        Members(objectStart, [&](std::string_view name, Span value) {
+            if (name == key && !found) found = value;
+        });
+        return found;
     }
 
     // The text with a member added after the last one of the object spanning `object`, on a
@@ -94,15 +90,23 @@ private:
         return i + 1;
     }
 
+    // Calls visit(key, value) for each member of the object whose '{' is at objectStart.
+    template <class Visit>
+    void Members(size_t objectStart, Visit&& visit) const {
+        size_t at = SkipBlanks(objectStart + 1);
+        while (at < text_.size() && text_[at] == '"') {
+            size_t keyEnd = StringEnd(at);
+            Span value = Value(SkipBlanks(SkipBlanks(keyEnd) + 1));
+            visit(text_.substr(at + 1, keyEnd - at - 2), value);
+            at = SkipBlanks(value.end);
+            if (at < text_.size() && text_[at] == ',') at = SkipBlanks(at + 1);
+        }
+    }
+
     // The offset after the last member's value of a non-empty object.
     size_t TrailingValueEnd(Span object) const {
-        size_t at = SkipBlanks(object.begin + 1), end = at;
-        while (at < object.end && text_[at] == '"') {
-            Span value = Value(SkipBlanks(SkipBlanks(StringEnd(at)) + 1));
-            end = value.end;
-            at = SkipBlanks(value.end);
-            if (text_[at] == ',') at = SkipBlanks(at + 1);
-        }
+        size_t end = object.begin + 1;
+        Members(object.begin, [&](std::string_view, Span value) { end = value.end; });
         return end;
     }
 
