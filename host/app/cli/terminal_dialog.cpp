@@ -182,6 +182,7 @@ UI_DialogResult Numbered(UI_Dialog& dialog, const std::vector<UI_Popup*>& popups
     for (const std::string& line : Draw(dialog, entry))
         std::cout << line << '\n';
     for (UI_Popup* popup : popups) {
+        if (popup->Items().empty()) continue;
         int32_t count = static_cast<int32_t>(popup->Items().size());
         std::string current =
             U_UTF16ToMBString(popup->Items()[static_cast<size_t>(popup->GetValue())]);
@@ -189,11 +190,12 @@ UI_DialogResult Numbered(UI_Dialog& dialog, const std::vector<UI_Popup*>& popups
             std::cout << "Choose 1-" << count << ", Enter keeps " << current
                       << ", c cancels: " << std::flush;
             std::string answer;
-            if (!std::getline(std::cin, answer) || answer == "c") {
-                std::cout << "\nCancelled" << std::endl;
+            bool read = static_cast<bool>(std::getline(std::cin, answer));
+            std::cout << answer << '\n';  // the input is not a terminal that shows it
+            if (!read || answer == "c") {
+                std::cout << "Cancelled" << std::endl;
                 return UI_DialogResult::kCancel;
             }
-            std::cout << answer << '\n';  // the input is not a terminal that shows it
             if (answer.empty()) break;
             bool digits =
                 answer.size() < 4 && std::all_of(answer.begin(), answer.end(),
