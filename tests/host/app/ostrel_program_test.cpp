@@ -87,6 +87,14 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
          "",
          {}},
         {"about", "about", 0, {"Ostrel 3D\n"}, "", {}},
+        // Without a terminal the dialog reads a line; with none to read it is cancelled.
+        {"options",
+         "options shot/cards.json </dev/null",
+         0,
+         {"Shadow Map Resolution:\n1  ✓ Comp Size\n", "Cancelled\n",
+          "shot/cards.json: unchanged\n"},
+         "",
+         {}},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.name);
