@@ -118,6 +118,11 @@ const Case kCases[] = {
     {"/lightsAndDepthOfField=1", "", "c.json: lightsAndDepthOfField: expected"},
     {"/blending={\"gamma\": 0}", "", "c.json: blending.gamma: "},
     {"/blending={\"linear\": true, \"gama\": 2}", "", "c.json: blending: unknown key \"gama\""},
+    {"/renderer={\"shadowMapSize\": 600}", "",
+     "c.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250, 500, 750, "
+     "1000, 1500, 2000, 3000, 4000"},
+    {"/rendererOptions=\"\" & /renderer={\"shadowMapSize\": 500}", "",
+     "c.json: renderer.shadowMapSize: the renderer's options are given twice"},
     {"/rendererOptions=\"abc\"", "", "c.json: rendererOptions: expected an even number"},
     {"/widht=960", "", "c.json: unknown key \"widht\" (did you mean \"width\"?)"},
     {"/{LONG}=1", "", "c.json: unknown key \"nnnnnnnn…n…\" (300 characters)"},

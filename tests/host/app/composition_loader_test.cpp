@@ -49,69 +49,6 @@ TEST(CompositionLoader, ReadsKeyframes) {
     EXPECT_EQ(t.position.At(0.5), (Vec<3>{5, 10, 15}));
 }
 
-<<<<<<< HEAD
-=======
-TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
-    struct Case {
-        std::string text;
-        std::string message;
-    };
-    const std::string solid = R"("kind": "solid", "source": {"color": [1, 1, 1]})";
-    const Case cases[] = {
-        {"{\n  \"width\": 10,\n  \"height\" 10\n}",
-         "bad.json: malformed JSON: line 3, column 13: syntax error while parsing object "
-         "separator"},
-        {R"({"width": 10, "duration": 1})", "bad.json: height: is required"},
-        {R"({"width": 10, "height": 10, "duration": 1, "bitDepth": 12})",
-         "bad.json: bitDepth: must be 8, 16 or 32, got 12"},
-        {WithLayers(R"({"kind": "sprite"})"),
-         "bad.json: layers[0].kind: unknown value \"sprite\"; expected one of \"image\", "
-         "\"solid\""},
-        {WithLayers(R"({"kind": "null"}, {"kind": "null", "transform": {"positon": [1, 2]}})"),
-         "bad.json: layers[1].transform: unknown key \"positon\" (did you mean \"position\"?)"},
-        {R"({"width": 1, "height": 1, "duration": 1, ")" + std::string(70, 'k') + R"(": 1})",
-         "bad.json: unknown key \"" + std::string(64, 'k') + "…\" (70 characters)"},
-        {WithLayers(R"({"kind": "image", "source": "card\u0000.png"})"),
-         "bad.json: layers[0].source: a string with a NUL character"},
-        {WithLayers(R"({"kind": "null", "transform": {"position": [1, "2", 3]}})"),
-         "bad.json: layers[0].transform.position[1]: expected a number, got a string"},
-        {WithLayers("{" + solid + R"(, "transform": {"opacity": 120}})"),
-         "bad.json: layers[0].transform.opacity: must be between 0 and 100, got 120"},
-        {WithLayers(
-             "{" + solid +
-             R"(, "transform": {"opacity": {"keyframes": [{"time": 1, "value": 5}, {"time": 1, "value": 6}]}}})"),
-         "bad.json: layers[0].transform.opacity.keyframes[1].time: keyframe times must increase, "
-         "got 1 after 1"},
-        {WithLayers("{" + solid + R"(, "in": 2, "out": 1})"),
-         "bad.json: layers[0].out: must be after the in time"},
-        {WithLayers(R"({"kind": "camera", "material": {}})"),
-         "bad.json: layers[0].material: does not apply to a camera layer"},
-        {WithLayers(R"({"name": "a", "kind": "null"}, {"name": "a", "kind": "null"})"),
-         "bad.json: layers[1].name: duplicate layer name \"a\" (layers[0] has it too)"},
-        {WithLayers(
-             R"({"name": "top", "kind": "null", "parent": "a"}, {"name": "a", "kind": "null", "parent": "b"}, {"name": "b", "kind": "null", "parent": "c"}, {"name": "c", "kind": "null", "parent": "a"})"),
-         "bad.json: layers[1].parent: the parent chain loops: a → b → c → a"},
-        {WithLayers("{" + solid + R"(, "trackMatte": "luma"})"),
-         "bad.json: layers[0].trackMatte: the top layer has no layer above it to take a matte "
-         "from"},
-        {WithLayers(R"({"name": "n", "kind": "null"}, {)" + solid + R"(, "trackMatte": "alpha"})"),
-         "bad.json: layers[1].trackMatte: layer \"n\" has no pixels to make a matte from"},
-        {WithLayers(
-             R"({"kind": "solid", "source": {"color": "#336699", "unbounded": true, "width": 20}})"),
-         "bad.json: layers[0].source.width: an unbounded solid has no size"},
-        {R"({"width": 1, "height": 1, "duration": 1, "renderer": {"shadowMapSize": 600}})",
-         "bad.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250, 500, "
-         "750, 1000, 1500, 2000, 3000, 4000"},
-        {R"({"width": 1, "height": 1, "duration": 1, "rendererOptions": "",
-             "renderer": {"shadowMapSize": 500}})",
-         "bad.json: renderer.shadowMapSize: the renderer's options are given twice"},
-
-    };
-    for (const Case& c : cases)
-        EXPECT_EQ(ErrorOf(c.text).substr(0, c.message.size()), c.message) << c.text;
-}
-
->>>>>>> main
 TEST(CompositionLoader, FilesAreFoundBesideTheComposition) {
     TempFolder folder;
     std::filesystem::create_directories(folder.Path() / "images");
