@@ -14,6 +14,7 @@
 #include "composition/composition_error.h"
 #include "composition/composition_loader.h"
 #include "host_error.h"
+#include "submit/submit_command.h"
 
 namespace {
 
@@ -64,6 +65,9 @@ int main(int argc, char** argv) {
     infoCommand->add_option("--frame", infoFrame, "The frame whose layers are listed")
         ->check(CLI::NonNegativeNumber);
 
+    ostrel::SubmitOptions submit;
+    CLI::App* submitCommand = ostrel::AddSubmitCommand(app, submit);
+
     CLI11_PARSE(app, argc, argv);
 
     try {
@@ -81,6 +85,8 @@ int main(int argc, char** argv) {
                     ": the composition has frames 0-" + std::to_string(comp.FrameCount() - 1));
             }
             ostrel::PrintInfo(comp, infoFrame, std::cout);
+        } else if (submitCommand->parsed()) {
+            ostrel::RunSubmit(submit, std::cout);
         }
     } catch (const std::exception& error) {
         std::cout << std::flush;
