@@ -21,28 +21,25 @@ fail() {
     exit 1
 }
 
-# Stops the daemon whose id is in the file, waiting up to 10 s before killing it outright.
-stop_daemon() {
-    local file=$1 pid
-    [[ -s $file ]] || return 0
-    pid=$(<"$file")
-    if kill -0 "$pid" 2>/dev/null; then
-        kill -TERM "$pid" 2>/dev/null || true
-        for _ in $(seq 100); do
-            kill -0 "$pid" 2>/dev/null || break
-            sleep 0.1
-        done
-        kill -KILL "$pid" 2>/dev/null || true
-    fi
-    rm -f "$file"
+# Stops the daemons whose ids are in the files: all are told at once, as each takes a
+# second or two to wind down, and any still running after 10 s is killed outright.
+stop_daemons() {
+    local file pids=()
+    for file in "$@"; do
+        [[ -s $file ]] && pids+=("$(<"$file")")
+    done
+    ((${#pids[@]})) || return 0
+    kill -TERM "${pids[@]}" 2>/dev/null || true
+    for _ in $(seq 100); do
+        kill -0 "${pids[@]}" 2>/dev/null || break
+        sleep 0.1
+    done
+    kill -KILL "${pids[@]}" 2>/dev/null || true
 }
 
 stop() {
     [[ -d $dir ]] || return 0
-    # The node first: it reports to the controller as it goes.
-    stop_daemon "$dir/slurmd.pid"
-    stop_daemon "$dir/slurmctld.pid"
-    stop_daemon "$dir/munged.pid"
+    stop_daemons "$dir/slurmd.pid" "$dir/slurmctld.pid" "$dir/munged.pid"
     rm -rf "$dir"
 }
 
