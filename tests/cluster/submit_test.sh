@@ -43,8 +43,11 @@ expect 0 "1 frame in" "$ostrel" render shot/cards.json -o resumed/c.####.png --f
 grep -qF "2 skipped" out.txt || fail "the resumed render did not count 2 skipped: $(cat out.txt)"
 same resumed local 0 2
 
-# An image that only decodes in part is caught before anything is submitted.
-cp -r shot cut && truncate -s 3000 cut/disc.png
+# An image whose header reads but whose pixels are cut short (an OpenEXR file's offsets come
+# first) is caught before anything is submitted.
+cp -r shot cut && sed -i 's/disc\.png/disc.exr/' cut/cards.json
+"$ostrel" render shot/cards.json -o cut/disc.exr --frames 0 --depth 32 >/dev/null
+truncate -s 100000 cut/disc.exr
 expect 1 "cards.json: layers[3].source: cannot read image" \
     "$ostrel" submit cut/cards.json -o farm/c.####.png --dry-run
 expect 1 "sbatch is not installed" env PATH=/nonexistent "$ostrel" submit shot/cards.json

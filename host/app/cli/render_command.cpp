@@ -109,6 +109,8 @@ RenderPlan PlanRender(const RenderOptions& options, ImageCache& images) {
         plan.range = Checked(comp, "--frames",
                              [&] { return ParseFrameRange(options.frames, comp.FrameCount()); });
     }
+    // Times grow with the frame: when the last frame's fits, every frame's does.
+    comp.FrameTime(plan.range.last);
     if (plan.pattern.empty()) plan.pattern = DefaultOutputPattern(comp.file);
     // Settings the comp cannot take fail here, before any plug-in is loaded.
     Checked(comp, "render settings", [&] {
@@ -150,8 +152,23 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     CatchInterrupts();
     FrameTimes all;
     std::string firstFile, lastFile;
-    // Frame n is written while frame n + 1 renders.
+    // Frame n is written while frame n + 1 renders, and reported once its file is whole: when
+    // the next write starts, or when the last one finishes.
     FrameWriter writer;
+    struct Rendered {
+        int32_t frame;
+        FrameTimes times;
+        int32_t layers;
+        std::string file;
+    };
+    std::optional<Rendered> inFlight;
+    auto report = [&](const Rendered& r) {
+        progress.FrameWritten(r.frame, r.times.total, r.layers, r.file);
+        if (options.stats) {
+            progress.Clear();
+            out << "frame " << r.frame << " split: " << Split(r.times) << '\n';
+        }
+    };
     std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
     for (int32_t frame : frames) {
         if (Interrupted()) {
@@ -186,15 +203,14 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         all += times;
         if (firstFile.empty()) firstFile = file.string();
         lastFile = file.string();
-        progress.EndFrame(times.total, layers, file.string());
-        if (options.stats) {
-            progress.Clear();
-            out << "frame " << frame << " split: " << Split(times) << '\n';
-        }
+        progress.EndFrame();
+        if (inFlight) report(*inFlight);
+        inFlight = Rendered{frame, times, layers, file.string()};
     }
     Clock::time_point lastWrite = Clock::now();
     writer.Finish();
     all.output += Seconds(Clock::now() - lastWrite);
+    if (inFlight) report(*inFlight);
     progress.Clear();
     // The bar is gone: one line says what became of the run. A log of a resumed run needs
     // it too, for the frames it left out.
