@@ -6,11 +6,14 @@
 set -euo pipefail
 ostrel=$(realpath "$1")
 root=$(cd "$(dirname "$0")/../.." && pwd)
-work=$(mktemp -d)
+base=$(mktemp -d)
+# The paths in the batch script must survive a space and a quote.
+work="$base/a shot's folder"
+mkdir "$work"
 # A folder and ports of its own, apart from a cluster someone started by hand.
-export OSTREL_SLURM_DIR=$work/slurm OSTREL_SLURM_PORT=16827
+export OSTREL_SLURM_DIR=$base/slurm OSTREL_SLURM_PORT=16827
 export SLURM_CONF=$OSTREL_SLURM_DIR/slurm.conf
-trap 'bash "$root/scripts/slurm-local.sh" stop >/dev/null 2>&1 || true; rm -rf "$work"' EXIT
+trap 'bash "$root/scripts/slurm-local.sh" stop >/dev/null 2>&1 || true; rm -rf "$base"' EXIT
 trap 'exit 1' INT TERM
 cd "$work"
 cp -r "$root/examples/cards" shot
@@ -53,7 +56,7 @@ expect 1 "cards.json: layers[3].source: cannot read image" \
 expect 1 "sbatch is not installed" env PATH=/nonexistent "$ostrel" submit shot/cards.json
 expect 0 "chunks=(0-4 5-9 10-14 15-19 20-23)" \
     "$ostrel" submit shot/cards.json -o farm/c.####.png --frames 0-23 --chunk 5 --dry-run
-grep -qF "#SBATCH --array=0-4" out.txt && grep -qF "render $work/shot/cards.json" out.txt ||
+grep -qF "#SBATCH --array=0-4" out.txt && grep -qF "render '$base/a shot" out.txt ||
     fail "the script does not have the tasks or the absolute path: $(cat out.txt)"
 [[ ! -e farm ]] || fail "a dry run wrote files"
 
