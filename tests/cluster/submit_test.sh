@@ -69,7 +69,7 @@ timeout 60 bash "$root/scripts/slurm-local.sh" start >/dev/null
 expect 0 "every frame is written" \
     "$ostrel" submit shot/cards.json -o farm/c.####.png --frames 0-23 --chunk 5 --wait
 same farm local 0 23
-expect 1 "the cluster refused the job: sbatch: error: invalid partition" \
+expect 1 "the job was not submitted: sbatch: error: invalid partition" \
     "$ostrel" submit shot/cards.json -o farm/c.####.png --partition nowhere
 
 # Frames 0-4 already there, 6 cut short, and a folder where frame 12 goes: task 0 skips its

@@ -107,7 +107,7 @@ std::string SubmitBatch(const std::filesystem::path& script) {
     CommandResult result = RunCommand({"sbatch", "--parsable", script.string()});
     if (result.status != 0) {
         std::string message = OneLine(result.err.empty() ? result.out : result.err);
-        throw HostError(script.string() + ": the cluster refused the job: " +
+        throw HostError(script.string() + ": the job was not submitted: " +
                         (message.empty() ? "sbatch failed without a message" : message));
     }
     // "ID" or, on a federation of clusters, "ID;CLUSTER".

@@ -20,7 +20,7 @@ struct CommandResult {
 CommandResult RunCommand(const std::vector<std::string>& command);
 
 // Submits the batch script and returns the job's id. Throws HostError naming the script, with
-// the cluster's own message, when it refuses the job.
+// sbatch's own message (the cluster's, when it refuses the job), when it is not submitted.
 std::string SubmitBatch(const std::filesystem::path& script);
 
 // Returns when no task of the job is left pending or running, telling out how many are whenever

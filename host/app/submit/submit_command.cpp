@@ -25,8 +25,7 @@ fs::path Absolute(const fs::path& path) {
 
 // Every image is decoded whole here: the loader reads only their headers, and a file cut short
 // would otherwise fail every task on the cluster.
-void CheckImages(const Composition& comp) {
-    ImageCache images;
+void CheckImages(const Composition& comp, ImageCache& images) {
     for (size_t i = 0; i < comp.layers.size(); ++i) {
         const fs::path& image = comp.layers[i].source.image;
         if (image.empty()) continue;
@@ -39,8 +38,8 @@ void CheckImages(const Composition& comp) {
     }
 }
 
-// The plug-in folders a task searches, the default one named too: the nodes may run the program
-// from another place.
+// The plug-in folders a task searches: those given, then the one beside this program, named too
+// so that the script shows where the plug-in comes from.
 std::vector<fs::path> PluginFolders(const RenderOptions& render) {
     std::vector<fs::path> folders;
     for (const fs::path& folder : render.pluginFolders)
@@ -106,15 +105,20 @@ void CheckFrames(const BatchJob& job, const std::string& jobId, const std::strin
     out << "job " << jobId << " done: every frame is written\n";
 }
 
+// Whole or not at all, as frames are: written beside and renamed into place.
 void WriteScript(const fs::path& file, const std::string& text) {
     std::error_code error;
     fs::create_directories(file.parent_path(), error);
     fs::path partial = file.string() + ".partial";
-    std::ofstream(partial, std::ios::binary) << text;
-    fs::rename(partial, file, error);
-    if (error || !fs::exists(file)) {
-        throw HostError(file.string() + ": cannot write the batch script: " +
-                        (error ? error.message() : std::string("refused")));
+    std::ofstream stream(partial, std::ios::binary);
+    stream << text;
+    stream.close();
+    if (stream) fs::rename(partial, file, error);
+    if (!stream || error) {
+        std::error_code ignored;
+        fs::remove(partial, ignored);
+        throw HostError(file.string() + ": cannot write the batch script" +
+                        (error ? ": " + error.message() : std::string()));
     }
 }
 
@@ -147,7 +151,7 @@ void RunSubmit(const SubmitOptions& options, std::ostream& out) {
     ApplyRenderArguments(options.render, render);
     ImageCache images;
     const RenderPlan plan = PlanRender(render, images);
-    CheckImages(plan.comp);
+    CheckImages(plan.comp, images);
     std::vector<fs::path> pluginFolders = PluginFolders(render);
     {
         HostSuites suites;
