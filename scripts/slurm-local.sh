@@ -73,6 +73,7 @@ JobAcctGatherType=jobacct_gather/none
 AccountingStorageType=accounting_storage/none
 JobCompType=jobcomp/none
 MailProg=/bin/true
+MpiDefault=none
 ReturnToService=2
 # CPUs are the only resource handed out, so array tasks share the node a CPU each.
 SelectType=select/cons_tres
@@ -104,11 +105,17 @@ start() {
     slurmctld -f "$SLURM_CONF"
     slurmd -f "$SLURM_CONF"
 
-    # Ready when the node takes work.
-    local state=""
+    # Ready when the node takes work; a daemon that has ended (a port taken, say) will not be.
+    local state="" daemon
     for _ in $(seq $((ready_seconds * 2))); do
         state=$(sinfo -h -o %T 2>/dev/null || true)
         [[ $state == idle || $state == mixed ]] && break
+        for daemon in slurmctld slurmd; do
+            if [[ -s $dir/$daemon.pid ]] && ! kill -0 "$(<"$dir/$daemon.pid")" 2>/dev/null; then
+                state=ended
+            fi
+        done
+        [[ $state == ended ]] && break
         sleep 0.5
     done
     if [[ $state != idle && $state != mixed ]]; then

@@ -10,8 +10,9 @@ base=$(mktemp -d)
 # The paths in the batch script must survive a space and a quote.
 work="$base/a shot's folder"
 mkdir "$work"
-# A folder and ports of its own, apart from a cluster someone started by hand.
-export OSTREL_SLURM_DIR=$base/slurm OSTREL_SLURM_PORT=16827
+# A folder and ports of its own, apart from a cluster someone started by hand or another run
+# of this test.
+export OSTREL_SLURM_DIR=$base/slurm OSTREL_SLURM_PORT=$((20000 + RANDOM % 5000 * 2))
 export SLURM_CONF=$OSTREL_SLURM_DIR/slurm.conf
 trap 'bash "$root/scripts/slurm-local.sh" stop >/dev/null 2>&1 || true; rm -rf "$base"' EXIT
 trap 'exit 1' INT TERM
