@@ -51,6 +51,9 @@ int main(int argc, char** argv) {
     renderCommand->add_flag("--skip-existing", render.skipExisting,
                             "Leave out frames whose file is already there and reads whole");
 
+    ostrel::SubmitOptions submit;
+    CLI::App* submitCommand = ostrel::AddSubmitCommand(app, submit);
+
     CLI::App* aboutCommand = app.add_subcommand("about", "Show the renderer's about box");
     aboutCommand
         ->add_option("--plugins", pluginFolders,
@@ -64,9 +67,6 @@ int main(int argc, char** argv) {
         ->check(ostrel::kNonEmpty);
     infoCommand->add_option("--frame", infoFrame, "The frame whose layers are listed")
         ->check(CLI::NonNegativeNumber);
-
-    ostrel::SubmitOptions submit;
-    CLI::App* submitCommand = ostrel::AddSubmitCommand(app, submit);
 
     CLI11_PARSE(app, argc, argv);
 
