@@ -12,6 +12,7 @@
 #include <chrono>
 #include <cstring>
 #include <thread>
+#include <vector>
 
 #include "host_error.h"
 
@@ -19,6 +20,12 @@ extern char** environ;
 
 namespace ostrel {
 namespace {
+
+struct CommandResult {
+    int status = 0;  // the exit status; -1 when the command was ended by a signal
+    std::string out;
+    std::string err;
+};
 
 // A pipe's two ends, closed when it goes.
 struct Pipe {
@@ -70,8 +77,8 @@ std::string OneLine(std::string text) {
     return text;
 }
 
-}  // namespace
-
+// Runs the command, the program found on the PATH, and collects what it prints. Throws HostError
+// naming the program when it is not installed.
 CommandResult RunCommand(const std::vector<std::string>& command) {
     Pipe outPipe, errPipe;
     posix_spawn_file_actions_t actions;
@@ -102,6 +109,8 @@ CommandResult RunCommand(const std::vector<std::string>& command) {
     result.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
     return result;
 }
+
+}  // namespace
 
 std::string SubmitBatch(const std::filesystem::path& script) {
     CommandResult result = RunCommand({"sbatch", "--parsable", script.string()});

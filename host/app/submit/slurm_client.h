@@ -5,19 +5,8 @@
 #include <filesystem>
 #include <ostream>
 #include <string>
-#include <vector>
 
 namespace ostrel {
-
-struct CommandResult {
-    int status = 0;  // the exit status; -1 when the command was ended by a signal
-    std::string out;
-    std::string err;
-};
-
-// Runs the command, the program found on the PATH, and collects what it prints. Throws HostError
-// naming the program when it is not installed.
-CommandResult RunCommand(const std::vector<std::string>& command);
 
 // Submits the batch script and returns the job's id. Throws HostError naming the script, with
 // sbatch's own message (the cluster's, when it refuses the job), when it is not submitted.
