@@ -14,8 +14,13 @@ mkdir "$work"
 # of this test.
 export OSTREL_SLURM_DIR=$base/slurm OSTREL_SLURM_PORT=$((20000 + RANDOM % 5000 * 2))
 export SLURM_CONF=$OSTREL_SLURM_DIR/slurm.conf
-trap 'bash "$root/scripts/slurm-local.sh" stop >/dev/null 2>&1 || true; rm -rf "$base"' EXIT
-trap 'exit 1' INT TERM
+# The cluster is stopped on every way out, also when the test runs past its bound (each command
+# has its own too): CTest's time limit would kill the test without stopping it.
+(sleep 120 && kill -TERM $$) >/dev/null 2>&1 &
+watchdog=$!
+trap 'kill $(ps -o pid= --ppid $watchdog) $watchdog 2>/dev/null; bash "$root/scripts/slurm-local.sh" stop >/dev/null 2>&1 || true
+      rm -rf "$base"' EXIT
+trap 'echo "FAIL: interrupted or out of time" >&2; exit 1' INT TERM
 cd "$work"
 cp -r "$root/examples/cards" shot
 
@@ -27,7 +32,7 @@ fail() {
 expect() {
     local status=$1 text=$2 got=0
     shift 2
-    timeout 90 "$@" >out.txt 2>&1 || got=$?
+    timeout 60 "$@" >out.txt 2>&1 || got=$?
     [[ $got == "$status" ]] || fail "$* ended with $got, not $status: $(cat out.txt)"
     grep -qF -- "$text" out.txt || fail "$* did not print '$text': $(cat out.txt)"
 }
