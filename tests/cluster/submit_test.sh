@@ -66,7 +66,11 @@ grep -qF "#SBATCH --array=0-4" out.txt && grep -qF "render '$base/a shot" out.tx
     fail "the script does not have the tasks or the absolute path: $(cat out.txt)"
 [[ ! -e farm ]] || fail "a dry run wrote files"
 
-if [[ $EUID -ne 0 ]] || ! command -v slurmctld sbatch munged >/dev/null; then
+missing=0
+for tool in munged slurmctld slurmd sbatch; do
+    command -v "$tool" >/dev/null || missing=1
+done
+if [[ $EUID -ne 0 ]] || ((missing)); then
     echo "SKIP: a local Slurm cluster needs root and slurm-wlm and munge (scripts/setup.sh)"
     exit 77
 fi
