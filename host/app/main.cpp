@@ -8,6 +8,7 @@
 #include "cli/arguments.h"
 #include "cli/artisan_instance.h"
 #include "cli/info_command.h"
+#include "cli/options_command.h"
 #include "cli/progress_display.h"
 #include "cli/render_arguments.h"
 #include "cli/render_command.h"
@@ -60,6 +61,16 @@ int main(int argc, char** argv) {
                      "Folder to search for plug-ins before the default one")
         ->check(ostrel::kNonEmpty);
 
+    CLI::App* optionsCommand =
+        app.add_subcommand("options", "Choose the renderer's options for a composition");
+    optionsCommand->add_option("COMP", composition, "Composition file (JSON), rewritten on OK")
+        ->required()
+        ->check(ostrel::kNonEmpty);
+    optionsCommand
+        ->add_option("--plugins", pluginFolders,
+                     "Folder to search for plug-ins before the default one")
+        ->check(ostrel::kNonEmpty);
+
     int32_t infoFrame = 0;
     CLI::App* infoCommand = app.add_subcommand("info", "List what a composition will render");
     infoCommand->add_option("COMP", composition, "Composition file (JSON)")
@@ -77,6 +88,8 @@ int main(int argc, char** argv) {
             ostrel::RunRender(render, std::cout);
         } else if (aboutCommand->parsed()) {
             ostrel::ShowAbout(PluginFolders(pluginFolders));
+        } else if (optionsCommand->parsed()) {
+            ostrel::RunOptionsDialog(composition, PluginFolders(pluginFolders), std::cout);
         } else if (infoCommand->parsed()) {
             ostrel::Composition comp = ostrel::LoadComposition(composition);
             if (infoFrame >= comp.FrameCount()) {

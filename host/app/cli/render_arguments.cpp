@@ -56,6 +56,8 @@ void AddRenderArguments(CLI::App& command, RenderArguments& arguments) {
         .add_option("--plugins", arguments.pluginFolders,
                     "Folder to search for plug-ins before the default one")
         ->check(kNonEmpty);
+    command.add_flag("--background", arguments.background,
+                     "Composite the frames over the comp's background colour");
 }
 
 void ApplyRenderArguments(const RenderArguments& arguments, RenderOptions& options) {
@@ -78,6 +80,7 @@ void ApplyRenderArguments(const RenderArguments& arguments, RenderOptions& optio
                                                             : Fields::kOff;
     options.multiprocessing = arguments.multiprocessing == "on";
     options.pluginFolders.assign(arguments.pluginFolders.begin(), arguments.pluginFolders.end());
+    options.background = arguments.background;
 }
 
 }  // namespace ostrel

@@ -24,9 +24,11 @@ struct RenderArguments {
     std::string fields = "off";
     std::string multiprocessing = "on";
     std::vector<std::string> pluginFolders;
+    bool background = false;
 };
 
-// COMP, -o, --frames, --depth, --downsample, --fields, --region, --multiprocessing, --plugins.
+// COMP, -o, --frames, --depth, --downsample, --fields, --region, --multiprocessing, --plugins,
+// --background.
 void AddRenderArguments(CLI::App& command, RenderArguments& arguments);
 
 // Sets the options the arguments give. Throws HostError naming the option that is wrong.

@@ -13,6 +13,7 @@
 #include "composition/composition_loader.h"
 #include "composition/image_file.h"
 #include "host_error.h"
+#include "output/background.h"
 #include "output/frame_writer.h"
 #include "qngp_suites.h"
 #include "session/frame_suites.h"
@@ -189,6 +190,8 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             if (code) throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
         }
         times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
+        if (options.background || comp.renderBackground)
+            CompositeOverBackground(session.Destination(), comp.background);
 
         Clock::time_point output = Clock::now();
         std::filesystem::path file = ExpandFramePattern(pattern, frame);

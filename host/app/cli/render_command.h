@@ -24,6 +24,7 @@ struct RenderOptions {
     int32_t threads = 0;  // 0: one per processor
     std::vector<std::filesystem::path> pluginFolders;
     bool stats = false;
+    bool background = false;    // frames over the comp's background colour, whatever it says
     bool skipExisting = false;  // leave out frames whose file is there and decodes whole
     bool terminal = false;      // draw a progress bar instead of a line per frame
 };

@@ -63,6 +63,7 @@ std::vector<std::string> RenderCommand(const SubmitOptions& options, const Rende
     add("--region", given.region, "");
     add("--fields", given.fields, "off");
     add("--multiprocessing", given.multiprocessing, "on");
+    if (given.background) command.push_back("--background");
     for (const fs::path& folder : pluginFolders)
         add("--plugins", folder.string(), "");
     return command;
