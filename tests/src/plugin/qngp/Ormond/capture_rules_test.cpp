@@ -89,15 +89,4 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
     }
 }
 
-// Only best is best quality; the accepts-shadows stream is a popup index, truncated.
-TEST(LayerQuality, DraftIsNotBestAndAcceptsShadowsTruncates) {
-    for (int16_t quality : {1, 2}) {
-        SY_Material l;
-        ORM_ApplyQuality(quality, {0, 1.7, 1}, &l);
-        EXPECT_EQ(l.bestQuality, quality == 2) << "quality " << quality;
-        EXPECT_TRUE(l.renders && l.acceptsLights && !l.castsShadows);
-        EXPECT_EQ(l.acceptsShadows, 1);
-    }
-}
-
 }  // namespace
