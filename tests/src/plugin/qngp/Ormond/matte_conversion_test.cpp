@@ -37,12 +37,9 @@ TEST(MatteConversion, WhiteOpaqueAtEachDepth) {
     }
 }
 
-TEST(MatteConversion, LumaWeighsTheChannelsAndFloatClampsToTheUnitRange) {
-    // Pure red, green and blue at full alpha: luma is (weight × max + 16384) / 32768, truncated.
-    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 255, 0, 0}, ORM_MatteType::kLuma), 76);   // 76.2 + 0.5
-    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 0, 255, 0}, ORM_MatteType::kLuma), 150);  // 149.7 + 0.5
-    EXPECT_EQ(ConvertOne(PF_Pixel8{255, 0, 0, 255}, ORM_MatteType::kLuma), 29);   // 29.1 + 0.5
-    EXPECT_EQ(ConvertOne(PF_Pixel16{32768, 32768, 0, 0}, ORM_MatteType::kLuma), 9798);
+// The channel weights show in the luma matte of the examples' references; the rounding of a
+// partly clear pixel and the float clamps do not.
+TEST(MatteConversion, LumaTruncatesAndFloatClampsToTheUnitRange) {
     // Half alpha: (16384 × 19235 + 16383) / 32768 = 9617.99…, truncated.
     EXPECT_EQ(ConvertOne(PF_Pixel16{16384, 0, 32768, 0}, ORM_MatteType::kLuma), 9617);
     EXPECT_FLOAT_EQ(ConvertOne(PF_PixelFloat{0.5f, 0, 0, 1}, ORM_MatteType::kLuma), 0.057f);
