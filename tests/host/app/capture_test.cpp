@@ -35,22 +35,16 @@ void Assemble(ServedFrame& frame, SY_SceneDesc* scene) {
 // The comp's sample count as a test sets it, for counts a composition file cannot hold.
 int32_t gSamples = 0;
 
-int32_t TestSamples(QNGP_CompH, int32_t* samples) {
-    *samples = gSamples;
-    return 0;
-}
-
-class SampleCountOverride {
-public:
-    explicit SampleCountOverride(int32_t samples)
-        : suite_(*CompSuite()), served_(kQNGP_CompSuite, 14, &suite_) {
+struct SampleCountOverride {
+    explicit SampleCountOverride(int32_t samples) : suite(*CompSuite()) {
         gSamples = samples;
-        suite_.GetCompMotionBlurSamples = &TestSamples;
+        suite.GetCompMotionBlurSamples = [](QNGP_CompH, int32_t* count) {
+            *count = gSamples;
+            return int32_t{0};
+        };
     }
-
-private:
-    QNGP_CompSuite14 suite_;
-    ScopedSuite served_;
+    QNGP_CompSuite14 suite;
+    ScopedSuite served{kQNGP_CompSuite, 14, &suite};
 };
 
 // A 100-pixel card that moves right at 960 pixels a second from x = 0 at time 0.
@@ -62,7 +56,6 @@ const std::string kMovingCard = R"(
   {"name": "still", "kind": "solid", "threeD": true,
    "source": {"color": "#ffffff", "width": 100, "height": 100}}
 )";
-const std::string kBlur = R"("motionBlur": {"enabled": true})";
 
 TEST(Capture, SampleCountsClampedToTwoToSixtyFour) {
     // Frame 12 (0.5 s) with a 180° shutter opening 90° early: from 0.5 − 1/96 s for 1/48 s,
@@ -74,7 +67,7 @@ TEST(Capture, SampleCountsClampedToTwoToSixtyFour) {
     const Case kCases[] = {{0, 2}, {5, 5}, {100, 64}};
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.samples);
-        ServedFrame frame(CompJson(kBlur, kMovingCard), 12);
+        ServedFrame frame(CompJson(R"("motionBlur": {"enabled": true})", kMovingCard), 12);
         SampleCountOverride samples(c.samples);
         SY_SceneDesc scene;
         Assemble(frame, &scene);
