@@ -62,6 +62,7 @@ TYPED_TEST(XferModes, FormulasOfSeparableModes) {
     while (table >> name >> cb >> cs >> want) {
         int32_t mode = PF_XferModeFromName(name.c_str());
         ASSERT_GE(mode, 0) << name;
+        EXPECT_STREQ(PF_XferModeToName(mode), name.c_str());
         ExpectChannels(Blend<P>(mode, {1, cs, cs, cs}, {1, cb, cb, cb}), {1, want, want, want},
                        tolerance, name + " cb " + std::to_string(cb) + " cs " + std::to_string(cs));
     }
