@@ -1,9 +1,11 @@
 #include "cli/info_command.h"
 
 #include <iomanip>
+#include <optional>
 
 #include "cli/artisan_instance.h"
 #include "composition/render_order.h"
+#include "composition/renderer_options.h"
 #include "composition/transform.h"
 #include "host_error.h"
 #include "pf_xfer.h"
@@ -105,6 +107,13 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
         out << " none";
     }
     out << '\n';
+
+    std::optional<int32_t> choice = ShadowMapSizeChoice(comp.rendererOptions);
+    out << "  shadow maps  "
+        << (!choice       ? "Comp Size (rendererOptions is not the renderer's 12-byte form)"
+            : *choice > 0 ? ShadowMapSizeText(*choice) + " pixels"
+                          : ShadowMapSizeText(0))
+        << '\n';
 
     std::vector<int32_t> order = RenderOrder(comp, seconds);
     out << "  layers rendered at frame " << frame << ", in render order:\n";

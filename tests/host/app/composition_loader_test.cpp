@@ -2,6 +2,7 @@
 
 #include <string>
 #include <tuple>
+#include <utility>
 
 #include "composition/composition_loader.h"
 #include "test_files.h"
@@ -41,6 +42,27 @@ TEST(CompositionLoader, ReadsKeyframes) {
     EXPECT_DOUBLE_EQ(t.rotationZ.ValueAt(5.0), 40.0);
     // [x, y] keeps the default z of 0.
     EXPECT_EQ(t.position.At(0.5), (Vec<3>{5, 10, 15}));
+}
+
+// The program's table of bad inputs checks every other key's message; the renderer's settings
+// in readable form are checked here.
+TEST(CompositionLoader, RendererSettingsItCannotUseAreRefused) {
+    const std::pair<std::string, std::string> kCases[] = {
+        {R"({"width": 1, "height": 1, "duration": 1, "renderer": {"shadowMapSize": 600}})",
+         "bad.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250, 500, "
+         "750, 1000, 1500, 2000, 3000, 4000"},
+        {R"({"width": 1, "height": 1, "duration": 1, "rendererOptions": "",
+             "renderer": {"shadowMapSize": 500}})",
+         "bad.json: renderer.shadowMapSize: the renderer's options are given twice"},
+    };
+    for (const auto& [text, message] : kCases) {
+        try {
+            ParseComposition(text, "bad.json");
+            ADD_FAILURE() << text;
+        } catch (const CompositionError& e) {
+            EXPECT_EQ(std::string(e.what()).substr(0, message.size()), message);
+        }
+    }
 }
 
 TEST(CompositionLoader, FilesAreFoundBesideTheComposition) {
