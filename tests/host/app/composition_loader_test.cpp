@@ -48,8 +48,7 @@ TEST(CompositionLoader, ReadsKeyframes) {
 TEST(CompositionLoader, RendererSettingsItCannotUseAreRefused) {
     const std::pair<std::string, std::string> kCases[] = {
         {R"({"width": 1, "height": 1, "duration": 1, "renderer": {"shadowMapSize": 600}})",
-         "bad.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250, 500, "
-         "750, 1000, 1500, 2000, 3000, 4000"},
+         "bad.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250"},
         {R"({"width": 1, "height": 1, "duration": 1, "rendererOptions": "",
              "renderer": {"shadowMapSize": 500}})",
          "bad.json: renderer.shadowMapSize: the renderer's options are given twice"},
