@@ -19,12 +19,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string ReadAll(const fs::path& file) {
-    std::stringstream text;
-    text << std::ifstream(file).rdbuf();
-    return text.str();
-}
-
 // Runs the program on a terminal of its own in folder and types each key once the dialog is
 // drawn, a tenth of a second apart (an Escape alone is told from an arrow by the pause).
 // Returns what the terminal showed.

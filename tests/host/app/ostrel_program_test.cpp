@@ -25,12 +25,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string ReadAll(const fs::path& file) {
-    std::stringstream text;
-    text << std::ifstream(file).rdbuf();
-    return text.str();
-}
-
 size_t FilesIn(const fs::path& folder) {
     size_t count = 0;
     for (const auto& entry : fs::recursive_directory_iterator(folder))

@@ -5,12 +5,19 @@
 
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <random>
 #include <string>
 #include <string_view>
 #include <vector>
 
 namespace ostrel {
+
+// The whole of a file, as bytes.
+inline std::string ReadAll(const std::filesystem::path& file) {
+    std::ifstream in(file, std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
 
 // A fresh folder under the system's temporary folder, removed with everything in it.
 class TempFolder {
