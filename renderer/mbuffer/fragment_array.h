@@ -2,6 +2,7 @@
 // per render thread, and the insertion that keeps each list in depth order.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 
@@ -76,8 +77,10 @@ protected:
     F** origin;  // heads − left − top × width
 };
 
-// Lists of object fragments, farthest first. AddFragment is called by the span routines for
-// every covered pixel; each thread passes its own pool index and only pixels of its own rows.
+// Lists of object fragments. AddFragment is called by the span routines for every covered pixel;
+// each thread passes its own pool index and only pixels of its own rows. A list is gathered
+// newest first, at a constant cost whatever the pixel's depth complexity, and put in its
+// walking order by Order once drawing is done: farthest first, ties in the order they came in.
 template <class F>
 class SY_FragmentArray : public SY_FragmentLists<F> {
 public:
@@ -85,6 +88,10 @@ public:
     using Coverage = SY_Coverage<Pixel>;
 
     explicit SY_FragmentArray(const M_LRect& rect) : SY_FragmentLists<F>(rect) {}
+
+    // Sorts the gathered list at head into ascending depth, records of equal depth in the
+    // order they were added: a stable merge sort, n log n compares and no allocation.
+    static void Order(F** head);
 
     // Draft records. A source of zero alpha is dropped whatever the coverage; otherwise the
     // coverage is folded into the stored alpha.
@@ -128,10 +135,88 @@ private:
         return record;
     }
 
-    // Ascending depth; an equal depth goes behind the records already there.
+    // Order for lists too long for the stack: a stable merge of linked runs.
+    static void MergeRuns(F** head);
+
     static void Insert(F** head, F* record) {
-        SY_InsertInOrder(head, record, [](const F& existing, const F& added) {
-            return !(existing.depth > added.depth);
-        });
+        record->next = *head;
+        *head = record;
     }
 };
+
+template <class F>
+void SY_FragmentArray<F>::Order(F** head) {
+    if (!*head || !(*head)->next) return;
+    // Short lists are sorted as (depth, record) pairs on the stack, so every record is read
+    // once and written once; longer ones are merged in place as linked runs.
+    constexpr int32_t kOnStack = 256;
+    struct Entry {
+        float depth;
+        F* record;
+    };
+    Entry entries[kOnStack];
+    Entry merged[kOnStack];
+    int32_t count = 0;
+    for (F* record = *head; record; record = record->next) {
+        if (count == kOnStack) return MergeRuns(head);
+        entries[count++] = {record->depth, record};
+    }
+    std::reverse(entries, entries + count);  // oldest first
+    Entry* from = entries;
+    Entry* to = merged;
+    for (int32_t width = 1; width < count; width *= 2) {
+        for (int32_t start = 0; start < count; start += 2 * width) {
+            const int32_t middle = std::min(start + width, count);
+            const int32_t end = std::min(start + 2 * width, count);
+            int32_t older = start, newer = middle;
+            for (int32_t out = start; out < end; ++out) {
+                const bool takeNewer =
+                    newer < end && (older == middle || from[older].depth > from[newer].depth);
+                to[out] = from[takeNewer ? newer++ : older++];
+            }
+        }
+        std::swap(from, to);
+    }
+    for (int32_t i = 0; i + 1 < count; ++i)
+        from[i].record->next = from[i + 1].record;
+    from[count - 1].record->next = nullptr;
+    *head = from[0].record;
+}
+
+template <class F>
+void SY_FragmentArray<F>::MergeRuns(F** head) {
+    F* list = *head;
+    // Each pass merges neighbouring runs of `width` records. The list is newest first, so of
+    // two runs the later one came in earlier and wins ties.
+    for (int32_t width = 1;; width *= 2) {
+        F* newer = list;
+        F** tail = &list;
+        int32_t merges = 0;
+        while (newer) {
+            ++merges;
+            F* older = newer;
+            int32_t newerLeft = 0;
+            for (; older && newerLeft < width; ++newerLeft)
+                older = older->next;
+            int32_t olderLeft = width;
+            while (newerLeft > 0 || (olderLeft > 0 && older)) {
+                F* taken;
+                if (newerLeft > 0 && (olderLeft == 0 || !older || older->depth > newer->depth)) {
+                    taken = newer;
+                    newer = newer->next;
+                    --newerLeft;
+                } else {
+                    taken = older;
+                    older = older->next;
+                    --olderLeft;
+                }
+                *tail = taken;
+                tail = &taken->next;
+            }
+            newer = older;
+        }
+        *tail = nullptr;
+        if (merges == 1) break;
+    }
+    *head = list;
+}

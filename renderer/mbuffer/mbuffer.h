@@ -10,7 +10,8 @@
 // GetBitDepth once per span, casts the SY_MBuffer pointer to the concrete class with
 // static_cast (SY_MBufferDraftX<P> for a draft buffer of P's depth), takes the head of its
 // first pixel with HeadAt(x, y), and calls AddFragment for every covered pixel with
-// consecutive heads along the row and the worker's thread index as pool index.
+// consecutive heads along the row and the worker's thread index as pool index. The resolve
+// puts each list in depth order before it walks it.
 #pragma once
 
 #include <cstdint>

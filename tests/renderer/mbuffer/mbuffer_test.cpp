@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <limits>
 #include <type_traits>
@@ -87,6 +88,7 @@ TEST(FragmentArray, ListsKeepDepthOrderAndTiesInArrivalOrder) {
         occluders.AddShadowFragment(&t, depths[i], 0.5f, 0xFFFF, occluders.HeadAt(7, 0), 0);
     }
     std::vector<int32_t> objectOrder, occluderOrder;
+    objects.Order(objects.HeadAt(7, 0));
     for (auto* r = *objects.HeadAt(7, 0); r; r = r->next)
         objectOrder.push_back(r->color.red);
     for (auto* r = *occluders.HeadAt(7, 0); r; r = r->next)
@@ -94,6 +96,27 @@ TEST(FragmentArray, ListsKeepDepthOrderAndTiesInArrivalOrder) {
     EXPECT_EQ(objectOrder, (std::vector<int32_t>{2, 0, 1, 4, 3}));
     EXPECT_EQ(occluderOrder, (std::vector<int32_t>{3, 0, 1, 4, 2}));
     EXPECT_EQ(occluders.fragmentCount.load(), 5u);
+}
+
+// Lists short enough to be sorted on the stack and lists longer than that come out alike:
+// ascending, ties in arrival order. Arrival i has depth (37·i) mod 11.
+TEST(FragmentArray, OrderIsStableForShortAndLongLists) {
+    for (int32_t length : {2, 3, 256, 257, 700}) {
+        SY_FragmentArray<SY_FragmentDraftX<PF_Pixel16>> array(kRow);
+        std::vector<int32_t> expected(static_cast<size_t>(length));
+        for (int32_t i = 0; i < length; ++i) {
+            const PF_Pixel16 p{32768, static_cast<uint16_t>(i), 0, 0};
+            array.AddFragment(&p, 32768, 2, float(i * 37 % 11), array.HeadAt(0, 0), 0);
+            expected[i] = i;
+        }
+        std::stable_sort(expected.begin(), expected.end(),
+                         [](int32_t a, int32_t b) { return a * 37 % 11 < b * 37 % 11; });
+        array.Order(array.HeadAt(0, 0));
+        std::vector<int32_t> order;
+        for (auto* r = *array.HeadAt(0, 0); r; r = r->next)
+            order.push_back(r->color.red);
+        EXPECT_EQ(order, expected) << length;
+    }
 }
 
 TEST(ShadowFragments, CompactionDropsEmptyArraysAndKeepsOrder) {
@@ -138,6 +161,7 @@ TEST(FragmentArrayThreads, WorkersFillOneBufferThroughTheirOwnPools) {
     for (int32_t y = kBounds.top; y < kBounds.bottom; ++y) {
         for (int32_t x = kBounds.left; x < kBounds.right; ++x) {
             int32_t count = 0;
+            buffer->Order(buffer->HeadAt(x, y));
             for (const Buffer::Record* r = *buffer->HeadAt(x, y); r; r = r->next, ++count)
                 wrong += r->depth != float(count) || r->color.red * 37 % 8 != count;
             wrong += count != 8;

@@ -46,6 +46,7 @@ TEST(ResolveSteps, DepthGroupsChainOverlappingRanges) {
         for (const auto& [depth, dzdx, dzdy, dzdt] : c.list)
             array.AddFragment(&p, 32768, 2, depth, dzdx, dzdy, dzdt, array.HeadAt(0, 0), 0);
         std::vector<int32_t> groups;
+        array.Order(array.HeadAt(0, 0));
         for (auto* first = *array.HeadAt(0, 0); first;) {
             auto group = SY_NextDepthGroup(first);
             groups.push_back(group.count);
