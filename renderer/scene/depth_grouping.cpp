@@ -278,12 +278,39 @@ void SY_GroupByDepth(SY_TRLayer* const* renderables, int32_t count, SY_DepthSens
                      SY_RenderableGroups* groups) {
     groups->clear();
     SY_AccountedVector<Node> nodes(static_cast<size_t>(std::max(count, 0)));
+    // Only renderables whose screen boxes overlap with positive area can be related, so the
+    // boxes are swept by their left edges: a box stays open while its right edge lies beyond
+    // the left edge reached, and each box meets only the open ones.
+    SY_AccountedVector<int32_t> byLeft;
     for (int32_t i = 0; i < count; ++i) {
-        for (int32_t j = i + 1; j < count; ++j) {
+        if (!renderables[i]->HasEmptyBounds()) byLeft.push_back(i);
+    }
+    std::sort(byLeft.begin(), byLeft.end(), [renderables](int32_t a, int32_t b) {
+        return renderables[a]->bounds[0] < renderables[b]->bounds[0];
+    });
+    SY_AccountedVector<int32_t> open;
+    for (int32_t b : byLeft) {
+        const double* boxB = renderables[b]->bounds;
+        for (size_t k = 0; k < open.size();) {
+            const int32_t a = open[k];
+            const double* boxA = renderables[a]->bounds;
+            if (!(boxA[2] > boxB[0])) {
+                open[k] = open.back();
+                open.pop_back();
+                continue;
+            }
+            ++k;
+            if (!(std::max(boxA[1], boxB[1]) < std::min(boxA[3], boxB[3]))) continue;
+            // Related in render order, as the successors are listed.
+            const int32_t i = std::min(a, b), j = std::max(a, b);
             SY_DrawOrder order = SY_RelateRenderables(*renderables[i], *renderables[j], sense);
             if (order.aFirst) nodes[j].successors.push_back(i);
             if (order.bFirst) nodes[i].successors.push_back(j);
         }
+        open.push_back(b);
     }
+    // The cut visits successors in render order, which decides the groups' order.
+    for (Node& node : nodes)
+        std::sort(node.successors.begin(), node.successors.end());
     GroupCutter(&nodes, renderables, groups).Run();
 }

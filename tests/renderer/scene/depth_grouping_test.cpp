@@ -114,6 +114,16 @@ TEST(DepthGroupingCut, CycleOfThreeFormsOneGroup) {
     EXPECT_EQ(Group(renderables), (Groups{{0, 2, 1}}));
 }
 
+TEST(DepthGroupingCut, SeparateCardsBehindOneComeOutInRenderOrder) {
+    // A wide card in front of 1 (on the right) and 2 (on the left), which do not meet: both go
+    // before it, 1 first because it comes first in render order, wherever it lies on screen.
+    std::deque<SY_TRLayer> renderables;
+    renderables.push_back(Flat(Square(0, 0, 100), 0, 0, 5, 0));
+    renderables.push_back(Flat(Square(60, 10, 20), 0, 0, 1, 1));
+    renderables.push_back(Flat(Square(10, 10, 20), 0, 0, 1, 2));
+    EXPECT_EQ(Group(renderables), (Groups{{1}, {2}, {0}}));
+}
+
 TEST(DepthGroupingCut, LongChainNeedsNoDeepRecursion) {
     // Every renderable lies behind the one before it and overlaps only its neighbours: the walk
     // goes 3000 deep and the groups come out back to front.
