@@ -79,8 +79,8 @@ protected:
 
 // Lists of object fragments. AddFragment is called by the span routines for every covered pixel;
 // each thread passes its own pool index and only pixels of its own rows. A list is gathered
-// newest first, at a constant cost whatever the pixel's depth complexity, and put in its
-// walking order by Order once drawing is done: farthest first, ties in the order they came in.
+// newest first, at a constant cost whatever the pixel's depth complexity, and sorted into its
+// walking order once drawing is done: farthest first, ties in the order they came in.
 template <class F>
 class SY_FragmentArray : public SY_FragmentLists<F> {
 public:
@@ -89,9 +89,44 @@ public:
 
     explicit SY_FragmentArray(const M_LRect& rect) : SY_FragmentLists<F>(rect) {}
 
-    // Sorts the gathered list at head into ascending depth, records of equal depth in the
-    // order they were added: a stable merge sort, n log n compares and no allocation.
-    static void Order(F** head);
+    // Calls visit(record) for every record of the list at head in walking order: ascending
+    // depth, records of equal depth in the order they were added. A stable merge sort, n log n
+    // compares and no allocation. A list of up to kOnStack records is sorted as (depth, record)
+    // pairs on the stack and left as it is, so its records are only read; a longer one is
+    // relinked in order first.
+    template <class Visit>
+    static void VisitInOrder(F** head, Visit&& visit) {
+        F* first = *head;
+        if (!first || !first->next) {  // nothing to sort
+            if (first) visit(*first);
+            return;
+        }
+        Entry entries[kOnStack];
+        Entry spare[kOnStack];
+        int32_t count = 0;
+        for (F* record = first; record; record = record->next) {
+            if (count == kOnStack) {
+                MergeRuns(head);
+                for (F* r = *head; r; r = r->next)
+                    visit(*r);
+                return;
+            }
+            entries[count++] = {record->depth, record};
+        }
+        const Entry* sorted = Sort(entries, spare, count);
+        for (int32_t i = 0; i < count; ++i)
+            visit(*sorted[i].record);
+    }
+
+    // Relinks the list at head in walking order, for walks that follow the links.
+    static void Order(F** head) {
+        F** tail = head;
+        VisitInOrder(head, [&tail](F& record) {
+            *tail = &record;
+            tail = &record.next;
+        });
+        *tail = nullptr;
+    }
 
     // Draft records. A source of zero alpha is dropped whatever the coverage; otherwise the
     // coverage is folded into the stored alpha.
@@ -135,6 +170,15 @@ private:
         return record;
     }
 
+    static constexpr int32_t kOnStack = 256;
+    struct Entry {
+        float depth;
+        F* record;
+    };
+
+    // Sorts count entries gathered newest first; gives the buffer, entries or spare, that
+    // holds them in walking order.
+    static const Entry* Sort(Entry* entries, Entry* spare, int32_t count);
     // Order for lists too long for the stack: a stable merge of linked runs.
     static void MergeRuns(F** head);
 
@@ -145,26 +189,23 @@ private:
 };
 
 template <class F>
-void SY_FragmentArray<F>::Order(F** head) {
-    if (!*head || !(*head)->next) return;
-    // Short lists are sorted as (depth, record) pairs on the stack, so every record is read
-    // once and written once; longer ones are merged in place as linked runs.
-    constexpr int32_t kOnStack = 256;
-    struct Entry {
-        float depth;
-        F* record;
-    };
-    Entry entries[kOnStack];
-    Entry merged[kOnStack];
-    int32_t count = 0;
-    for (F* record = *head; record; record = record->next) {
-        if (count == kOnStack) return MergeRuns(head);
-        entries[count++] = {record->depth, record};
-    }
+auto SY_FragmentArray<F>::Sort(Entry* entries, Entry* spare, int32_t count) -> const Entry* {
     std::reverse(entries, entries + count);  // oldest first
+    // Runs of kRun by insertion, cheapest for the few records most pixels hold; then merges.
+    constexpr int32_t kRun = 8;
+    for (int32_t start = 0; start < count; start += kRun) {
+        const int32_t end = std::min(start + kRun, count);
+        for (int32_t i = start + 1; i < end; ++i) {
+            const Entry entry = entries[i];
+            int32_t j = i;
+            for (; j > start && entries[j - 1].depth > entry.depth; --j)
+                entries[j] = entries[j - 1];
+            entries[j] = entry;
+        }
+    }
     Entry* from = entries;
-    Entry* to = merged;
-    for (int32_t width = 1; width < count; width *= 2) {
+    Entry* to = spare;
+    for (int32_t width = kRun; width < count; width *= 2) {
         for (int32_t start = 0; start < count; start += 2 * width) {
             const int32_t middle = std::min(start + width, count);
             const int32_t end = std::min(start + 2 * width, count);
@@ -177,10 +218,7 @@ void SY_FragmentArray<F>::Order(F** head) {
         }
         std::swap(from, to);
     }
-    for (int32_t i = 0; i + 1 < count; ++i)
-        from[i].record->next = from[i + 1].record;
-    from[count - 1].record->next = nullptr;
-    *head = from[0].record;
+    return from;
 }
 
 template <class F>

@@ -58,28 +58,9 @@ void SY_MBufferDraftX<P>::Resolve(SY_ProgressAbort* progress, const PF_LinearBle
     SY_WalkRows(this->bounds, kSY_DraftProgressCadence, progress, [&](int32_t y) {
         Record** rowHeads = this->HeadAt(left, y);
         P* pixels = destination.PixelAt<P>(left, y);
-        int32_t i = 0;
-        // Neighbouring lists are independent chains of loads: walking two at once keeps twice
-        // as many records on their way from memory. Each list is ordered just before its walk,
-        // while its records are still in the cache.
-        for (; i + 1 < count; i += 2) {
-            this->Order(&rowHeads[i]);
-            this->Order(&rowHeads[i + 1]);
-            const Record* a = rowHeads[i];
-            const Record* b = rowHeads[i + 1];
-            for (; a && b; a = a->next, b = b->next) {
-                applier.Apply(*a, &pixels[i]);
-                applier.Apply(*b, &pixels[i + 1]);
-            }
-            for (; a; a = a->next)
-                applier.Apply(*a, &pixels[i]);
-            for (; b; b = b->next)
-                applier.Apply(*b, &pixels[i + 1]);
-        }
-        if (i < count) {
-            this->Order(&rowHeads[i]);
-            for (const Record* record = rowHeads[i]; record; record = record->next)
-                applier.Apply(*record, &pixels[i]);
+        for (int32_t i = 0; i < count; ++i) {
+            this->VisitInOrder(&rowHeads[i],
+                               [&](const Record& record) { applier.Apply(record, &pixels[i]); });
         }
     });
 }

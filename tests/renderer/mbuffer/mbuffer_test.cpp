@@ -99,18 +99,18 @@ TEST(FragmentArray, ListsKeepDepthOrderAndTiesInArrivalOrder) {
 }
 
 // Lists short enough to be sorted on the stack and lists longer than that come out alike:
-// ascending, ties in arrival order. Arrival i has depth (37·i) mod 11.
+// ascending, ties in arrival order. Arrival i has depth (37·i) mod 5.
 TEST(FragmentArray, OrderIsStableForShortAndLongLists) {
     for (int32_t length : {2, 3, 256, 257, 700}) {
         SY_FragmentArray<SY_FragmentDraftX<PF_Pixel16>> array(kRow);
         std::vector<int32_t> expected(static_cast<size_t>(length));
         for (int32_t i = 0; i < length; ++i) {
             const PF_Pixel16 p{32768, static_cast<uint16_t>(i), 0, 0};
-            array.AddFragment(&p, 32768, 2, float(i * 37 % 11), array.HeadAt(0, 0), 0);
+            array.AddFragment(&p, 32768, 2, float(i * 37 % 5), array.HeadAt(0, 0), 0);
             expected[i] = i;
         }
         std::stable_sort(expected.begin(), expected.end(),
-                         [](int32_t a, int32_t b) { return a * 37 % 11 < b * 37 % 11; });
+                         [](int32_t a, int32_t b) { return a * 37 % 5 < b * 37 % 5; });
         array.Order(array.HeadAt(0, 0));
         std::vector<int32_t> order;
         for (auto* r = *array.HeadAt(0, 0); r; r = r->next)
