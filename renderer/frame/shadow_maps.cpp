@@ -172,9 +172,9 @@ private:
                 for (int c = 0; c < 3; ++c)
                     product[c] *= passed_[size_t(k) * 3 + c];
             }
-            e.red = static_cast<uint16_t>(std::lround(product[0] * 32768));
-            e.green = static_cast<uint16_t>(std::lround(product[1] * 32768));
-            e.blue = static_cast<uint16_t>(std::lround(product[2] * 32768));
+            e.red = static_cast<uint16_t>(product[0] * 32768 + 0.5f);
+            e.green = static_cast<uint16_t>(product[1] * 32768 + 0.5f);
+            e.blue = static_cast<uint16_t>(product[2] * 32768 + 0.5f);
         }
         for (uint32_t i = begin; i + 1 < written_; ++i) {
             if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
@@ -325,6 +325,7 @@ void SY_BuildShadowMaps(SY_RenderContext* context) {
             SY_LightState& light = context->lightStates[i];
             light.shadowMap = BuildLightMap(context, scene.lights[i], light, plan.size);
         }
+        context->shadowSums.Clear();
     } catch (const std::bad_alloc&) {
         // Maps built so far stay with their light states, which the frame releases.
         throw kU_ErrOutOfMemory;

@@ -66,19 +66,23 @@ void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& t
     double ru = std::min(scale * f.ru, kFarTexels), rv = std::min(scale * f.rv, kFarTexels);
     double u = std::clamp(f.u, -kFarTexels, kFarTexels),
            v = std::clamp(f.v, -kFarTexels, kFarTexels);
-    if (texture.samplingFilter == SY_SamplingFilter::kNearest) {
+    // Filtered mappings put texel centres on whole numbers; the table counts from corners.
+    bool filtered = texture.samplingFilter != SY_SamplingFilter::kNearest;
+    double cu = filtered ? u + 0.5 : u, cv = filtered ? v + 0.5 : v;
+    // Whole-texel boxes for draft layers, and wherever the box is wide enough that its
+    // fractional edges (under a quarter of its width) do not show.
+    constexpr double kWholeTexelsFrom = 2.0;
+    if (!filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom)) {
         PF_SummedAreaTable_SampleDraft(
-            table.Width(), table.Height(), sums, static_cast<int32_t>(std::floor(u - ru)),
-            static_cast<int32_t>(std::floor(v - rv)), static_cast<int32_t>(std::ceil(u + ru)),
-            static_cast<int32_t>(std::ceil(v + rv)), out);
+            table.Width(), table.Height(), sums, static_cast<int32_t>(std::floor(cu - ru)),
+            static_cast<int32_t>(std::floor(cv - rv)), static_cast<int32_t>(std::ceil(cu + ru)),
+            static_cast<int32_t>(std::ceil(cv + rv)), out);
         return;
     }
     if (ru > 0.5 && rv > 0.5) {
-        // Filtered mappings put texel centres on whole numbers; the table counts from corners.
-        PF_SummedAreaTable_SampleAA(
-            table.Width(), table.Height(), sums, static_cast<float>(u + 0.5 - ru),
-            static_cast<float>(v + 0.5 - rv), static_cast<float>(u + 0.5 + ru),
-            static_cast<float>(v + 0.5 + rv), out);
+        PF_SummedAreaTable_SampleAA(table.Width(), table.Height(), sums,
+                                    static_cast<float>(cu - ru), static_cast<float>(cv - rv),
+                                    static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
         return;
     }
     sy_sampling::Filter(texture, u, v, ru, rv, out);

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <new>
 
 #include "renderer/scene/messages.h"
 #include "renderer/scene/render_context.h"
@@ -98,16 +97,7 @@ void SY_ScreenGeometry::Build(const SY_RenderContext& context, const SY_TRLayer&
         flags.screenSizedTexture ? &footprint.rect : nullptr);
     texture = acquired.world;
     if (!texture) return;
-    if (flags.blurred) {
-        // Float sums lose the small boxes of large textures to rounding.
-        constexpr int64_t kFloatSumsUpTo = 1 << 16;
-        bool doubleSums = int64_t{texture->width} * texture->height > kFloatSumsUpTo;
-        try {
-            sumTable = std::make_unique<PF_SummedAreaTable>(*texture, doubleSums);
-        } catch (const std::bad_alloc&) {
-            throw kU_ErrOutOfMemory;
-        }
-    }
+    if (flags.blurred) sumTable = &context.shadowSums.For(renderIndex, *texture);
 
     int32_t count = renderable.subsamples.Count();
     screenToTexture.Allocate(count);

@@ -3,7 +3,6 @@
 #pragma once
 
 #include <cstdint>
-#include <memory>
 
 #include "m_matrix.h"
 #include "pf_tables.h"
@@ -43,8 +42,9 @@ public:
     SY_TTextureFetcher* textureFetcher = nullptr;
     int32_t renderIndex = 0;
     PF_World* texture = nullptr;
-    // Sums over the texture for the box averages of a blurred shadow caster; null otherwise.
-    std::unique_ptr<PF_SummedAreaTable> sumTable;
+    // Sums over the texture for the box averages of a blurred shadow caster, kept by the
+    // render context; null otherwise.
+    const PF_SummedAreaTable* sumTable = nullptr;
     // Per subsample: U = m0·x + m3·y + m6, V = m1·x + m4·y + m7, W = m2·x + m5·y + m8 for the
     // screen point (x, y); the texture position is (U/W, V/W) under perspective and (U, V)
     // otherwise, and a larger W is nearer. All zero for a subsample that is not valid.
