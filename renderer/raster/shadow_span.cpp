@@ -121,19 +121,38 @@ void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsam
 }
 
 // Steps the state across the span; sample(level, out) gives the layer's colour at a level.
+bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
+    return a.red == b.red && a.green == b.green && a.blue == b.blue;
+}
+
+// Steps the state across the span; sample(level, out) gives the layer's colour at a level. A
+// level that lets through what both its neighbours let through adds nothing that blending
+// between them would not give, so only the levels where the light changes are kept: inside
+// an opaque layer one occluder stands for all of them.
 template <class P, class State, class Sample>
 void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t count, int32_t y,
               SY_ShadowFragmentArray* array, int32_t thread, Sample sample) {
     SY_ShadowFragment** heads = array->HeadAt(x, y);
+    const int32_t levels = shader.levelCount;
+    PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
+    bool present[SY_ShadowShader::kMaxLevels];
     for (int32_t i = 0; i < count; ++i, state.Step()) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) continue;
-        for (int32_t level = 0; level < shader.levelCount; ++level) {
+        for (int32_t level = 0; level < levels; ++level) {
             P texel;
             sample(level, &texel);
-            PF_Pixel16 occluder;
-            if (!Occluder(texel, shader, &occluder)) continue;
-            array->AddShadowFragment(&occluder, shader.DepthKey(depth->w, level), 0.0f,
+            present[level] = Occluder(texel, shader, &occluders[level]);
+        }
+        for (int32_t level = 0; level < levels; ++level) {
+            if (!present[level]) continue;
+            bool likeBefore = level > 0 && present[level - 1] &&
+                              SameLight(occluders[level - 1], occluders[level]);
+            bool likeAfter =
+                level + 1 == levels ||
+                (present[level + 1] && SameLight(occluders[level + 1], occluders[level]));
+            if (likeBefore && likeAfter) continue;
+            array->AddShadowFragment(&occluders[level], shader.DepthKey(depth->w, level), 0.0f,
                                      shader.layerId, heads + i, thread);
         }
     }
