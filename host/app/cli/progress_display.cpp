@@ -31,12 +31,16 @@ void ProgressDisplay::BeginFrame(int32_t frame) {
     Draw();
 }
 
-void ProgressDisplay::EndFrame(double seconds, int32_t layers, const std::string& file) {
+void ProgressDisplay::EndFrame() {
     ++framesDone_;
     fraction_ = 0;
+}
+
+void ProgressDisplay::FrameWritten(int32_t frame, double seconds, int32_t layers,
+                                   const std::string& file) {
     if (terminal_) return;
     char line[64];
-    std::snprintf(line, sizeof line, "frame %d: %.3f s, %d layer%s -> ", frame_, seconds, layers,
+    std::snprintf(line, sizeof line, "frame %d: %.3f s, %d layer%s -> ", frame, seconds, layers,
                   layers == 1 ? "" : "s");
     out_ << line << file << '\n' << std::flush;
 }

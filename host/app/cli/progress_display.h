@@ -24,9 +24,10 @@ public:
     ProgressDisplay& operator=(const ProgressDisplay&) = delete;
 
     void BeginFrame(int32_t frame);
-    // After a frame is written: seconds it took, layers it rendered, the file. Prints the
-    // frame's line when there is no bar.
-    void EndFrame(double seconds, int32_t layers, const std::string& file);
+    void EndFrame();
+    // Once a frame's file is whole on disk: the seconds the frame took, the layers it rendered
+    // and the file. Prints the frame's line when there is no bar.
+    void FrameWritten(int32_t frame, double seconds, int32_t layers, const std::string& file);
     // Clears the bar before other lines are printed.
     void Clear();
 

@@ -108,6 +108,8 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         range = Checked(comp, "--frames",
                         [&] { return ParseFrameRange(options.frames, comp.FrameCount()); });
     }
+    // Times grow with the frame: when the last frame's fits, every frame's does.
+    comp.FrameTime(range.last);
     std::string pattern =
         options.outputPattern.empty() ? DefaultOutputPattern(comp.file) : options.outputPattern;
     ImageCache images;
@@ -131,8 +133,23 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     CatchInterrupts();
     FrameTimes all;
     std::string firstFile, lastFile;
-    // Frame n is written while frame n + 1 renders.
+    // Frame n is written while frame n + 1 renders, and reported once its file is whole: when
+    // the next write starts, or when the last one finishes.
     FrameWriter writer;
+    struct Rendered {
+        int32_t frame;
+        FrameTimes times;
+        int32_t layers;
+        std::string file;
+    };
+    std::optional<Rendered> inFlight;
+    auto report = [&](const Rendered& r) {
+        progress.FrameWritten(r.frame, r.times.total, r.layers, r.file);
+        if (options.stats) {
+            progress.Clear();
+            out << "frame " << r.frame << " split: " << Split(r.times) << '\n';
+        }
+    };
     std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
     for (int32_t frame = range.first; frame <= range.last; ++frame) {
         if (Interrupted()) {
@@ -167,15 +184,14 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         all += times;
         if (firstFile.empty()) firstFile = file.string();
         lastFile = file.string();
-        progress.EndFrame(times.total, layers, file.string());
-        if (options.stats) {
-            progress.Clear();
-            out << "frame " << frame << " split: " << Split(times) << '\n';
-        }
+        progress.EndFrame();
+        if (inFlight) report(*inFlight);
+        inFlight = Rendered{frame, times, layers, file.string()};
     }
     Clock::time_point lastWrite = Clock::now();
     writer.Finish();
     all.output += Seconds(Clock::now() - lastWrite);
+    if (inFlight) report(*inFlight);
     progress.Clear();
     if (options.terminal) {
         // The bar is gone: one line says what became of the run.

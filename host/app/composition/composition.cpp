@@ -15,7 +15,10 @@ T_Time Composition::FrameTime(int32_t frame) const {
     T_Time step = FrameDuration();
     T_Time time{};
     if (T_MultiplyTime(&step, frame, &time) != 0) {
-        throw std::overflow_error("frame " + std::to_string(frame) + " is out of the time range");
+        throw std::overflow_error(
+            file.string() + ": frame " + std::to_string(frame) + ": its time, " +
+            std::to_string(frame) + " × " + std::to_string(frameRate.denominator) + "/" +
+            std::to_string(frameRate.numerator) + " s, is beyond what a time value can hold");
     }
     return time;
 }

@@ -11,7 +11,8 @@ T_Time FrameFraction(const Composition& comp, int32_t degrees) {
     T_Time scaled{};
     T_Time result{};
     if (T_MultiplyTime(&frame, degrees, &scaled) != 0 || T_DivideTime(&scaled, 360, &result) != 0) {
-        throw std::overflow_error("shutter time out of range");
+        throw std::overflow_error(comp.file.string() +
+                                  ": the shutter's time is beyond what a time value can hold");
     }
     return result;
 }
@@ -22,7 +23,8 @@ ShutterInterval ShutterIntervalAt(const Composition& comp, T_Time frameTime) {
     ShutterInterval interval{};
     T_Time offset = FrameFraction(comp, comp.motionBlur.shutterPhase);
     if (T_AddTimes(&frameTime, &offset, &interval.start) != 0) {
-        throw std::overflow_error("shutter time out of range");
+        throw std::overflow_error(comp.file.string() +
+                                  ": the shutter's time is beyond what a time value can hold");
     }
     interval.duration = FrameFraction(comp, comp.motionBlur.shutterAngle);
     return interval;

@@ -4,6 +4,7 @@
 
 #include <stdexcept>
 
+#include "composition/composition_error.h"
 #include "composition/render_order.h"
 #include "pf_bit_depth.h"
 
@@ -14,6 +15,18 @@ std::unique_ptr<PF_World> MakeWorld(int16_t bitDepth, int32_t width, int32_t hei
     return PF_DispatchBitDepth(bitDepth, [&]<class P>() -> std::unique_ptr<PF_World> {
         return std::make_unique<PF_WorldX<P>>(width, height);
     });
+}
+
+// An image that cannot be decoded when its pixels are first wanted is named with its layer's
+// place in the composition, as it would have been had it failed when the file was read.
+template <class Make>
+auto NamingLayer(const Composition& comp, int32_t index, Make&& make) {
+    try {
+        return make();
+    } catch (const CompositionError& error) {
+        throw CompositionError(comp.file.string() + ": layers[" + std::to_string(index) +
+                               "].source: " + error.what());
+    }
 }
 
 QNGP_ShortRect RegionOf(const Composition& comp, const RenderSettings& settings) {
@@ -115,8 +128,10 @@ void FrameSession::BeginPass(int32_t pass) {
 }
 
 std::unique_ptr<PF_World> FrameSession::LayerPixels(int32_t layerIndex) {
-    return LayerSource(images_, LayerAt(layerIndex), bitDepth_, settings_.downsampleX,
-                       settings_.downsampleY);
+    return NamingLayer(comp_, layerIndex, [&] {
+        return LayerSource(images_, LayerAt(layerIndex), bitDepth_, settings_.downsampleX,
+                           settings_.downsampleY);
+    });
 }
 
 std::unique_ptr<PF_World> FrameSession::OutputPixels(int32_t layerIndex) {
@@ -125,8 +140,10 @@ std::unique_ptr<PF_World> FrameSession::OutputPixels(int32_t layerIndex) {
 }
 
 std::shared_ptr<PF_World> FrameSession::SharedLayerPixels(int32_t layerIndex) {
-    return images_.SharedSource(LayerAt(layerIndex), bitDepth_, settings_.downsampleX,
-                                settings_.downsampleY);
+    return NamingLayer(comp_, layerIndex, [&] {
+        return images_.SharedSource(LayerAt(layerIndex), bitDepth_, settings_.downsampleX,
+                                    settings_.downsampleY);
+    });
 }
 
 PF_World* FrameSession::HandOut(std::shared_ptr<PF_World> world) {
