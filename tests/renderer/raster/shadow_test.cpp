@@ -56,9 +56,9 @@ struct ShadowScene {
     SY_LightDesc& Light() { return frame.scene.lights[0]; }
 
     // Red, green and blue of every pixel, as fractions of the channel maximum.
-    std::vector<std::array<double, 3>> Render() {
+    std::vector<std::array<double, 3>> Render(const QNGP_IterateSuite1* iterate = nullptr) {
         PF_WorldX<P> out(kWidth, kHeight);
-        frame.Render(&out);
+        frame.Render(&out, iterate);
         std::vector<std::array<double, 3>> pixels;
         for (int32_t k = 0; k < kWidth * kHeight; ++k) {
             const P& p = out.At(k % kWidth, k / kWidth);
@@ -187,6 +187,27 @@ TYPED_TEST(Shadows, CrossCubeFaceSeamsEvenly) {
         double lit = renders[0][24 * kWidth + x][0];
         EXPECT_NEAR(renders[1][24 * kWidth + x][0], kAmbient + (lit - kAmbient) / 2, 0.01) << x;
     }
+}
+
+template <class P>
+class ShadowsThreads : public ::testing::Test {};
+TYPED_TEST_SUITE(ShadowsThreads, renderer_test::PixelTypes);
+
+// Maps built and looked up on three threads give the frame one thread gives: occluder lists
+// filled row by row from per-thread pools, lookups that share the maps without writing them.
+TYPED_TEST(ShadowsThreads, ThreadedFrameEqualsSingleThreadedFrame) {
+    using P = TypeParam;
+    std::vector<std::array<double, 3>> renders[2];
+    for (bool threaded : {false, true}) {
+        renderer_test::ThreadedFrame<3> threads;
+        ShadowScene<P> scene(PixelOf<P>(0.7, 1, 0.5, 0));
+        scene.Light().shadowDiffusion = 5;
+        scene.frame.scene.layers[0].material.lightTransmission = 0.5;
+        scene.frame.scene.layers[1].material.bestQuality = true;
+        renders[threaded] =
+            scene.Render(threaded ? renderer_test::ThreadedIterateSuite<3>::Suite() : nullptr);
+    }
+    EXPECT_EQ(renders[0], renders[1]);
 }
 
 // Memory running out anywhere in a frame with shadow maps ends it with error 4 (or the
