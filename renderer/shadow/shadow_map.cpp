@@ -66,14 +66,14 @@ bool SY_PlanarShadowMap::Project(const double p[3], double* x, double* y, double
     return true;
 }
 
-void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId,
-                                           float t[3]) const {
-    SetFull(t);
-    if (i < texels_.left || i >= texels_.right || j < texels_.top || j >= texels_.bottom) return;
-    size_t texel = static_cast<size_t>(j - texels_.top) * stride_ + (i - texels_.left);
-    const SY_ShadowEntry* first = entries_.Data() + starts_[texel];
-    const SY_ShadowEntry* end = entries_.Data() + starts_[texel + 1];
-    if (first == end || d >= first->depth) return;
+namespace {
+
+// The light left at depth d behind the occluders [first, end) of one texel, for the layer
+// receiverId; false, with t untouched, where all of it is left.
+[[gnu::always_inline]] inline bool ListTransmission(const SY_ShadowEntry* first,
+                                                    const SY_ShadowEntry* end, double d,
+                                                    uint16_t receiverId, float t[3]) {
+    if (first == end || d >= first->depth) return false;
     // e: the last occluder nearer the light than the point. Lists are short, a few layers and
     // their blur levels, so a walk from the front costs less than keeping a cursor per thread.
     const SY_ShadowEntry* e = first;
@@ -83,8 +83,9 @@ void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint1
         // The receiver's own occluders: the light that reached its front counts.
         while (e >= first && (e->tag & kSY_ShadowIdMask) == receiverId)
             --e;
-        if (e >= first) SetEntry(*e, t);
-        return;
+        if (e < first) return false;
+        SetEntry(*e, t);
+        return true;
     }
     SetEntry(*e, t);
     if (e + 1 < end && !(e->tag & kSY_ShadowStep)) {
@@ -95,6 +96,18 @@ void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint1
         for (int c = 0; c < 3; ++c)
             t[c] += (next[c] - t[c]) * f;
     }
+    return true;
+}
+
+}  // namespace
+
+void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId,
+                                           float t[3]) const {
+    SetFull(t);
+    if (i < texels_.left || i >= texels_.right || j < texels_.top || j >= texels_.bottom) return;
+    size_t texel = static_cast<size_t>(j - texels_.top) * stride_ + (i - texels_.left);
+    ListTransmission(entries_.Data() + starts_[texel], entries_.Data() + starts_[texel + 1], d,
+                     receiverId, t);
 }
 
 void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t receiverId,
@@ -121,18 +134,41 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
     double fi = std::floor(cx), fj = std::floor(cy);
     double fx = cx - fi, fy = cy - fj;
     int32_t i0 = static_cast<int32_t>(fi), j0 = static_cast<int32_t>(fj);
+    bool inside = i0 - 1 >= texels_.left && i0 + 2 < texels_.right && j0 - 1 >= texels_.top &&
+                  j0 + 2 < texels_.bottom;
+    double qx[4], qy[4];
+    for (int k = 0; k < 4; ++k) {
+        qx[k] = (k - 1 - fx) * (k - 1 - fx);
+        qy[k] = (k - 1 - fy) * (k - 1 - fy);
+    }
+    const SY_ShadowEntry* entries = entries_.Data();
     float sum[3] = {0, 0, 0}, weights = 0;
-    for (int32_t dj = -1; dj <= 2; ++dj) {
-        for (int32_t di = -1; di <= 2; ++di) {
-            double q = (di - fx) * (di - fx) + (dj - fy) * (dj - fy);
+    bool shaded = false;  // some texel keeps back some light
+    for (int32_t dj = 0; dj < 4; ++dj) {
+        const uint32_t* row =
+            inside ? &starts_[static_cast<size_t>(j0 - 1 + dj - texels_.top) * stride_ +
+                              (i0 - 1 - texels_.left)]
+                   : nullptr;
+        for (int32_t di = 0; di < 4; ++di) {
+            double q = qx[di] + qy[dj];
             if (q >= 2.0) continue;
             float w = kSoftWeights[static_cast<int32_t>(16.0 * q)];
-            float texel[3];
-            TexelTransmission(i0 + di, j0 + dj, d, receiverId, texel);
+            float texel[3] = {1.0f, 1.0f, 1.0f};
+            if (inside) {
+                shaded |= ListTransmission(entries + row[di], entries + row[di + 1], d, receiverId,
+                                           texel);
+            } else {
+                TexelTransmission(i0 - 1 + di, j0 - 1 + dj, d, receiverId, texel);
+                shaded = true;
+            }
             for (int c = 0; c < 3; ++c)
                 sum[c] += w * texel[c];
             weights += w;
         }
+    }
+    if (!shaded) {
+        SetFull(t);
+        return;
     }
     for (int c = 0; c < 3; ++c)
         t[c] = weights > 0 ? sum[c] / weights : 0.0f;
