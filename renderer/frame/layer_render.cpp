@@ -116,8 +116,18 @@ void DrawSimplePath(SY_RenderContext* context, const RowClosure& closure, int32_
 }
 
 // The simple path's blend record, from the material as the layer's shader takes it.
-SY_SpanBlend ImageBlend(const SY_Material& material) {
-    return {material.mode, material.opacity, SY_DepthOffset(material)};
+SY_SpanBlend ImageBlend(const SY_Material& material, const SY_Shader* shader) {
+    SY_SpanBlend blend{material.mode, material.opacity, SY_DepthOffset(material)};
+    blend.colorOnly = material.acceptsShadows == kSY_AcceptsShadowsOnly;
+    // Layers drawn from an image are not lit, but the shadows on them show.
+    const auto* layerShader =
+        shader && shader->IsFrameShader() ? static_cast<const SY_LayerShader*>(shader) : nullptr;
+    if (layerShader && material.acceptsShadows != kSY_AcceptsShadowsOff &&
+        std::any_of(layerShader->lights.begin(), layerShader->lights.end(),
+                    [](const SY_LightState* light) { return light->shadowMap != nullptr; })) {
+        blend.shadows = layerShader;
+    }
+    return blend;
 }
 
 }  // namespace
@@ -150,7 +160,7 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
                                &table,
                                &target,
                                context->scene->colorSettings,
-                               ImageBlend(material),
+                               ImageBlend(material, shader),
                                context->destination->width};
             if (simplePath)
                 DrawSimplePath(context, closure, fieldMode);

@@ -80,6 +80,9 @@ public:
     // LightOnePixel. Span routines pair pixels through it when U_G_CPU_DataP()->hasVectorUnits.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2) const;
+    // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
+    // for layers drawn from an image, which are not lit.
+    void ShadowOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
 
     uint16_t layerId = 0;  // passed to every shadow lookup
     // The layer's material. A shader made by hand starts with no light terms and takes no

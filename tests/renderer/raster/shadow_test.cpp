@@ -78,7 +78,8 @@ TYPED_TEST_SUITE(Shadows, renderer_test::PixelTypes);
 
 // The shadow covers the card's projection to within a pixel. Darkness 1 leaves the ambient
 // term, 0.5 half the light; a half-transparent red card passing all light keeps red and half of
-// green and blue (1 − (1 − c)·0.5), while one passing none casts a grey half shadow.
+// green and blue (1 − (1 − c)·0.5), while one passing none casts a grey half shadow. An
+// unbounded floor, drawn from its image, is not lit, yet a half-dark shadow halves it.
 TYPED_TEST(Shadows, FallWhereTheLightPutsThemColouredByTheCard) {
     using P = TypeParam;
     renderer_test::AccountedBytesCheck bytes;
@@ -87,6 +88,7 @@ TYPED_TEST(Shadows, FallWhereTheLightPutsThemColouredByTheCard) {
         P card;
         double darkness, transmission;
         std::array<double, 3> shadow;
+        bool unboundedFloor = false;  // drawn from its image, unlit but shadowed
     } cases[] = {
         {PixelOf<P>(1, 1, 1, 1), 1, 0, {kAmbient, kAmbient, kAmbient}},
         {PixelOf<P>(1, 1, 1, 1),
@@ -98,11 +100,14 @@ TYPED_TEST(Shadows, FallWhereTheLightPutsThemColouredByTheCard) {
          1,
          0,
          {kAmbient + half / 2, kAmbient + half / 2, kAmbient + half / 2}},
+        {PixelOf<P>(1, 1, 1, 1), 0.5, 0, {0.5, 0.5, 0.5}, true},
     };
     for (const auto& c : cases) {
         ShadowScene<P> scene(c.card);
         scene.Light().shadowDarkness = c.darkness;
         scene.frame.scene.layers[0].material.lightTransmission = c.transmission;
+        scene.frame.scene.layers[1].unbounded = c.unboundedFloor;
+        const double lit = c.unboundedFloor ? 1.0 : kLit;
         auto pixels = scene.Render();
         for (int32_t y = 0; y < kHeight; ++y) {
             for (int32_t x = 0; x < kWidth; ++x) {
@@ -112,7 +117,7 @@ TYPED_TEST(Shadows, FallWhereTheLightPutsThemColouredByTheCard) {
                     std::min({x + 0.5 - 30, 46 - (x + 0.5), y + 0.5 - 10, 26 - (y + 0.5)});
                 if (std::fabs(inside) < 1) continue;
                 for (int k = 0; k < 3; ++k) {
-                    ASSERT_NEAR(pixels[y * kWidth + x][k], inside > 0 ? c.shadow[k] : kLit, 0.01)
+                    ASSERT_NEAR(pixels[y * kWidth + x][k], inside > 0 ? c.shadow[k] : lit, 0.01)
                         << "case " << &c - cases << " at " << x << "," << y << " channel " << k;
                 }
             }
