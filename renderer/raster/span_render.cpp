@@ -33,12 +33,13 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     };
     target.Visit(
         [&](PF_World* world) {
-            draw(SY_CompositeDelivery<P>(world->Row<P>(y), shader.material.mode, tables));
+            draw(SY_CompositeDelivery<P>(world->Row<P>(y), SY_DeliveredMode(shader.material),
+                                         tables));
         },
         [&](SY_MBuffer* buffer) {
             if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
             draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                             shader.material.mode));
+                                             SY_DeliveredMode(shader.material)));
         },
         [&](const SY_SpanImageRecord& record) {
             draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});

@@ -125,6 +125,33 @@ TYPED_TEST(Shadows, FallWhereTheLightPutsThemColouredByTheCard) {
     }
 }
 
+// A layer that shows only shadows darkens what lies beneath by them and adds nothing else,
+// even over half-transparent pixels: in the shadow of an opaque card at darkness 1 they turn
+// black and the shadow's darkness fills their transparent half; elsewhere they stay as they
+// were.
+TYPED_TEST(Shadows, OnlyDarkenWhatLiesBeneathWhenALayerShowsNothingElse) {
+    using P = TypeParam;
+    ShadowScene<P> scene(PixelOf<P>(1, 1, 1, 1));
+    SY_Material& floor = scene.frame.scene.layers[1].material;
+    floor.acceptsShadows = kSY_AcceptsShadowsOnly;
+    floor.acceptsLights = false;
+    floor.mode = kPF_XferMultiply;
+    const P beneath = PixelOf<P>(0.5, 0.5, 0.5, 0.5);
+    auto out = FilledWorld<P>(kWidth, kHeight, beneath);
+    scene.frame.Render(out.get());
+    for (int32_t y = 1; y < kHeight; y += 2) {
+        for (int32_t x = 1; x < kWidth; x += 2) {
+            bool shadowed = x >= 31 && x < 45 && y >= 11 && y < 25;
+            bool lit = x < 29 || x >= 47 || y < 9 || y >= 27;
+            const P expected = PixelOf<P>(1, 0, 0, 0);
+            if (!shadowed && !lit) continue;  // within a pixel of the footprint's border
+            EXPECT_EQ(renderer_test::Channels(out->At(x, y)),
+                      renderer_test::Channels(lit ? beneath : expected))
+                << x << "," << y;
+        }
+    }
+}
+
 // A card that casts and accepts is lit the same with and without shadows: it never shadows
 // itself, though its own occluders lie in the map at its surface.
 TYPED_TEST(Shadows, NeverFallOnTheLayerThatCastsThem) {
