@@ -8,6 +8,7 @@
 #include "cli/arguments.h"
 #include "cli/artisan_instance.h"
 #include "cli/info_command.h"
+#include "cli/options_command.h"
 #include "cli/progress_display.h"
 #include "cli/render_command.h"
 #include "composition/composition_error.h"
@@ -89,11 +90,23 @@ int main(int argc, char** argv) {
         ->add_option("--plugins", pluginFolders,
                      "Folder to search for plug-ins before the default one")
         ->check(kNonEmpty);
+    renderCommand->add_flag("--background", render.background,
+                            "Composite the frames over the comp's background colour");
     renderCommand->add_flag("--stats", render.stats,
                             "Print the time spent inside and outside the plug-in");
 
     CLI::App* aboutCommand = app.add_subcommand("about", "Show the renderer's about box");
     aboutCommand
+        ->add_option("--plugins", pluginFolders,
+                     "Folder to search for plug-ins before the default one")
+        ->check(kNonEmpty);
+
+    CLI::App* optionsCommand =
+        app.add_subcommand("options", "Choose the renderer's options for a composition");
+    optionsCommand->add_option("COMP", composition, "Composition file (JSON), rewritten on OK")
+        ->required()
+        ->check(kNonEmpty);
+    optionsCommand
         ->add_option("--plugins", pluginFolders,
                      "Folder to search for plug-ins before the default one")
         ->check(kNonEmpty);
@@ -133,6 +146,8 @@ int main(int argc, char** argv) {
             ostrel::RunRender(render, std::cout);
         } else if (aboutCommand->parsed()) {
             ostrel::ShowAbout(PluginFolders(pluginFolders));
+        } else if (optionsCommand->parsed()) {
+            ostrel::RunOptionsDialog(composition, PluginFolders(pluginFolders), std::cout);
         } else if (infoCommand->parsed()) {
             ostrel::Composition comp = ostrel::LoadComposition(composition);
             if (infoFrame >= comp.FrameCount()) {

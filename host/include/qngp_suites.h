@@ -377,10 +377,14 @@ struct PF_ColorSettingsSuite1 {
                                 const PF_LinearBlendingTables** settings);
 };
 
+// The UI framework's drawing resources and nodes (zel_ui.h).
+struct UI_DrawingSupplier;
+class UI_Node;
+
 // What a dialog needs from the host's UI framework.
 struct QN_ZELSuite1 {
-    int32_t (*GetDrawingSupplier)(void** supplier);
-    int32_t (*GetParentNode)(void** node);
+    int32_t (*GetDrawingSupplier)(UI_DrawingSupplier** supplier);
+    int32_t (*GetParentNode)(UI_Node** node);
 };
 
 // Suite names and versions, as the host lists them.

@@ -37,5 +37,11 @@ std::u16string U_MBToUTF16String(const char* text);
 // string when there is none).
 std::string U_ZStringToMBString(const char* zstring);
 
+// The localised text of a "key=default text" string as UTF-16, for the UI framework.
+std::u16string U_ZStringToUTF16String(const char* zstring);
+
+// UTF-16 text from the UI framework as UTF-8.
+std::string U_UTF16ToMBString(const std::u16string& text);
+
 // The string caches' error code: a cache that is not registered.
 inline constexpr int32_t kU_ErrUnknownCache = 0x13A80010;

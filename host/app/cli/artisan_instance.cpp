@@ -98,4 +98,40 @@ int32_t ArtisanInstance::Render(FrameSession& session) {
                                    options_, nullptr);
 }
 
+bool ArtisanInstance::ShowDialog() {
+    if (!artisan_.entries.instanceDialog) {
+        throw HostError("the renderer \"" + artisan_.displayName + "\" has no options dialog");
+    }
+    int32_t changed = 0;
+    if (int32_t error =
+            artisan_.entries.instanceDialog(in_, nullptr, nullptr, nullptr, options_, &changed)) {
+        throw HostError("the renderer's options dialog failed with error " + std::to_string(error));
+    }
+    return changed != 0;
+}
+
+std::vector<uint8_t> ArtisanInstance::Flatten() {
+    const QNGP_MemorySuite1& memory = *MemorySuite();
+    QNGP_MemHandle flattened = nullptr;
+    int32_t error =
+        artisan_.entries.flattenInstance
+            ? artisan_.entries.flattenInstance(in_, nullptr, nullptr, nullptr, options_, &flattened)
+            : 0;
+    std::vector<uint8_t> bytes;
+    void* pointer = nullptr;
+    uint32_t size = 0;
+    if (flattened && error == 0 && (error = memory.GetHandleSize(flattened, &size)) == 0 &&
+        (error = memory.LockHandle(flattened, &pointer)) == 0) {
+        bytes.assign(static_cast<const uint8_t*>(pointer),
+                     static_cast<const uint8_t*>(pointer) + size);
+        memory.UnlockHandle(flattened);
+    }
+    if (flattened) memory.FreeHandle(flattened);
+    if (error || !flattened) {
+        throw HostError("the renderer \"" + artisan_.displayName +
+                        "\" could not flatten its options (error " + std::to_string(error) + ")");
+    }
+    return bytes;
+}
+
 }  // namespace ostrel

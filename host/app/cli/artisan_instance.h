@@ -36,6 +36,14 @@ public:
     // Calls the render entry for the session's current pass; returns its error code.
     int32_t Render(FrameSession& session);
 
+    // Calls the options dialog entry; true when the user changed the options. Throws HostError
+    // when the artisan has no dialog or it fails.
+    bool ShowDialog();
+
+    // The options in the flattened form the host stores. Throws HostError when flattening
+    // fails.
+    std::vector<uint8_t> Flatten();
+
 private:
     const QNGP_InData* in_;
     const Artisan& artisan_;

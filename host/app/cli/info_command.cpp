@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <iomanip>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "cli/artisan_instance.h"
 #include "composition/render_order.h"
+#include "composition/renderer_options.h"
 #include "composition/transform.h"
 #include "host_error.h"
 #include "pf_xfer.h"
@@ -61,21 +63,11 @@ std::string Quoted(const std::string& name) {
     return "\"" + name + "\"";
 }
 
-// The shadow-map resolution chosen in the renderer's flattened options (the third big-endian
-// word), or 0 when the map follows the output's size.
-uint32_t ChosenShadowMapResolution(const std::vector<uint8_t>& options) {
-    constexpr size_t kChoiceAt = 8;
-    if (options.size() < kChoiceAt + 4) return 0;
-    uint32_t choice = 0;
-    for (size_t i = kChoiceAt; i < kChoiceAt + 4; ++i)
-        choice = choice << 8 | options[i];
-    return choice;
-}
-
 // Whether the light builds shadow maps at the frame and how large, by the renderer's rule: a
 // light that casts at a darkness above 0, when some layer casts and some accepts shadows; the
-// side is the larger of 400 and the output's larger side, a third of it when no receiver is at
-// best quality, at least 64; a spot wider than 80° takes five faces and a point light six.
+// side is the chosen size ("Comp Size": the larger of 400 and the output's larger side), a
+// third of it when no receiver is at best quality, at least 64; a spot wider than 80° takes
+// five faces and a point light six.
 std::string ShadowMaps(const Composition& comp, const Layer& light, double seconds,
                        const std::vector<int32_t>& order) {
     if (!light.light.castsShadows) return "";
@@ -96,9 +88,9 @@ std::string ShadowMaps(const Composition& comp, const Layer& light, double secon
     if (light.light.type == LightType::kSpot && light.light.coneAngle.ValueAt(seconds) > 80)
         faces = 5;
     std::string count = faces == 1 ? "a map" : std::to_string(faces) + " maps";
-    if (ChosenShadowMapResolution(comp.rendererOptions) != 0)
-        return ", casts shadows: " + count + " at the chosen resolution";
-    int32_t side = std::max({400, comp.width, comp.height});
+    std::optional<int32_t> choice = ShadowMapSizeChoice(comp.rendererOptions);
+    int32_t chosen = choice ? kShadowMapSizes[static_cast<size_t>(*choice)] : 0;
+    int32_t side = chosen != 0 ? chosen : std::max({400, comp.width, comp.height});
     if (!bestReceiver) side /= 3;
     side = std::max(side, 64);
     return ", casts shadows: " + count + " of " + std::to_string(side) + " x " +
@@ -153,6 +145,12 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
     }
     out << '\n';
 
+    std::optional<int32_t> choice = ShadowMapSizeChoice(comp.rendererOptions);
+    out << "  shadow maps  "
+        << (!choice       ? "Comp Size (rendererOptions is not the renderer's 12-byte form)"
+            : *choice > 0 ? ShadowMapSizeText(*choice) + " pixels"
+                          : ShadowMapSizeText(0))
+        << '\n';
     out << "  layers rendered at frame " << frame << ", in render order:\n";
     if (order.empty()) out << "    none\n";
     for (size_t i = 0; i < order.size(); ++i) {

@@ -12,6 +12,7 @@
 #include "cli/progress_display.h"
 #include "composition/composition_loader.h"
 #include "host_error.h"
+#include "output/background.h"
 #include "output/frame_writer.h"
 #include "qngp_suites.h"
 #include "session/frame_suites.h"
@@ -170,6 +171,8 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             if (code) throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
         }
         times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
+        if (options.background || comp.renderBackground)
+            CompositeOverBackground(session.Destination(), comp.background);
 
         Clock::time_point output = Clock::now();
         std::filesystem::path file = ExpandFramePattern(pattern, frame);

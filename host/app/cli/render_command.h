@@ -22,7 +22,8 @@ struct RenderOptions {
     int32_t threads = 0;  // 0: one per processor
     std::vector<std::filesystem::path> pluginFolders;
     bool stats = false;
-    bool terminal = false;  // draw a progress bar instead of a line per frame
+    bool background = false;  // frames over the comp's background colour, whatever it says
+    bool terminal = false;    // draw a progress bar instead of a line per frame
 };
 
 // Renders and writes every frame; throws HostError or CompositionError with a message for the

@@ -189,6 +189,7 @@ struct Composition {
     double duration = 0;   // seconds
     int16_t bitDepth = 8;  // 8, 16 or 32
     Color background{};
+    bool renderBackground = false;  // frames are opaque, over the background colour
     MotionBlurSettings motionBlur;
     bool lightsAndDepthOfField = true;  // false renders without lights and depth of field
     Blending blending;

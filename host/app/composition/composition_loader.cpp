@@ -10,6 +10,7 @@
 
 #include "composition/image_file.h"
 #include "composition/json_reader.h"
+#include "composition/renderer_options.h"
 #include "composition/transform.h"
 
 namespace ostrel {
@@ -65,6 +66,7 @@ private:
     void ReadComp(ObjectReader& r);
     FrameRate ReadFrameRate(ObjectReader& r);
     std::vector<uint8_t> ReadHexBytes(ObjectReader& r, std::string_view key);
+    void ReadRendererOptions(ObjectReader& r);
     PendingLayer ReadLayer(const Json& node, size_t index);
     void ReadSource(ObjectReader& r, Layer& layer);
     void ReadTransform(ObjectReader r, Layer& layer, const Vec<3>& position);
@@ -146,6 +148,8 @@ void Loader::ReadComp(ObjectReader& r) {
             ReadVec<3>(c_, *background, "background", {}, Range::Between(0, 1), true);
     }
 
+    comp_.renderBackground = r.Bool("renderBackground", comp_.renderBackground);
+
     ObjectReader blur = r.Object("motionBlur");
     comp_.motionBlur.enabled = blur.Bool("enabled", comp_.motionBlur.enabled);
     comp_.motionBlur.samplesPerFrame =
@@ -161,7 +165,36 @@ void Loader::ReadComp(ObjectReader& r) {
     comp_.blending.linear = blending.Bool("linear", comp_.blending.linear);
     comp_.blending.gamma = blending.Number("gamma", comp_.blending.gamma, Range::Between(0.1, 10));
     blending.Finish();
+    ReadRendererOptions(r);
+}
+
+void Loader::ReadRendererOptions(ObjectReader& r) {
+    bool flattenedGiven = r.Has("rendererOptions");
     comp_.rendererOptions = ReadHexBytes(r, "rendererOptions");
+    ObjectReader renderer = r.Object("renderer");
+    if (const Json* size = renderer.Find("shadowMapSize")) {
+        if (flattenedGiven) {
+            renderer.Fail("shadowMapSize",
+                          "the renderer's options are given twice; keep this or rendererOptions");
+        }
+        std::string allowed = "\"Comp Size\"";
+        for (size_t choice = 1; choice < kShadowMapSizes.size(); ++choice)
+            allowed += ", " + std::to_string(kShadowMapSizes[choice]);
+        int32_t chosen = -1;
+        for (size_t choice = 0; choice < kShadowMapSizes.size(); ++choice) {
+            bool match = choice == 0 ? *size == "Comp Size"
+                                     : size->is_number() && *size == kShadowMapSizes[choice];
+            if (match) chosen = static_cast<int32_t>(choice);
+        }
+        if (chosen < 0) {
+            std::string given = size->is_string()       ? QuoteUserText(size->get<std::string>())
+                                : size->is_structured() ? std::string("an ") + size->type_name()
+                                                        : size->dump();
+            renderer.Fail("shadowMapSize", "got " + given + "; the renderer offers " + allowed);
+        }
+        comp_.rendererOptions = FlattenedRendererOptions(chosen);
+    }
+    renderer.Finish();
 }
 
 FrameRate Loader::ReadFrameRate(ObjectReader& r) {
@@ -491,7 +524,7 @@ Composition ParseComposition(std::string_view text, const std::filesystem::path&
     return Loader(file).Load(text);
 }
 
-Composition LoadComposition(const std::filesystem::path& file) {
+std::string ReadCompositionText(const std::filesystem::path& file) {
     // A composition is a text file of modest size: a folder, a device or a pipe would hang the
     // read or be reported as malformed JSON.
     constexpr std::uintmax_t kLargest = std::uintmax_t{64} << 20;
@@ -504,7 +537,11 @@ Composition LoadComposition(const std::filesystem::path& file) {
     if (!in) throw CompositionError(file.string() + ": cannot open: " + std::strerror(errno));
     std::ostringstream text;
     text << in.rdbuf();
-    return ParseComposition(text.str(), file);
+    return text.str();
+}
+
+Composition LoadComposition(const std::filesystem::path& file) {
+    return ParseComposition(ReadCompositionText(file), file);
 }
 
 }  // namespace ostrel

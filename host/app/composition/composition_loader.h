@@ -2,6 +2,7 @@
 #pragma once
 
 #include <filesystem>
+#include <string>
 #include <string_view>
 
 #include "composition/composition.h"
@@ -14,7 +15,12 @@ namespace ostrel {
 // problem throws CompositionError; nothing is returned half-loaded.
 Composition LoadComposition(const std::filesystem::path& file);
 
-// The same for text already in memory; file names it in messages and anchors relative paths.
+// The text of a composition file, refused unread when it is not a regular file or is larger
+// than 64 MiB. Throws CompositionError.
+std::string ReadCompositionText(const std::filesystem::path& file);
+
+// The same as LoadComposition for text already in memory; file names it in messages and anchors
+// relative paths.
 Composition ParseComposition(std::string_view text, const std::filesystem::path& file);
 
 }  // namespace ostrel

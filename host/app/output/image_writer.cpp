@@ -166,18 +166,29 @@ void WritePrepared(const PreparedImage& image) {
         throw HostError(
             name + ": cannot write the image: " + (problem.empty() ? "unknown error" : problem));
     }
-    std::filesystem::path partial = PartialPath(image.path);
-    std::string problem = WriteDurably(partial, encoded);
+    ReplaceFile(image.path, encoded, "the image", FilePermissions::kNew);
+}
+
+void ReplaceFile(const std::filesystem::path& path, const std::vector<unsigned char>& bytes,
+                 const std::string& what, FilePermissions permissions) {
+    std::filesystem::path partial = PartialPath(path);
+    std::string problem = WriteDurably(partial, bytes);
     std::error_code failed;
+    std::filesystem::file_status old = std::filesystem::status(path, failed);
+    if (problem.empty() && permissions == FilePermissions::kKeep &&
+        std::filesystem::is_regular_file(old)) {
+        std::filesystem::permissions(partial, old.permissions(), failed);
+        if (failed) problem = failed.message();
+    }
     if (problem.empty()) {
-        std::filesystem::rename(partial, image.path, failed);
+        std::filesystem::rename(partial, path, failed);
         if (failed) problem = failed.message();
     }
     if (!problem.empty()) {
         std::filesystem::remove(partial, failed);
-        throw HostError(name + ": cannot write the image: " + problem);
+        throw HostError(path.string() + ": cannot write " + what + ": " + problem);
     }
-    SyncFolder(image.path.parent_path());
+    SyncFolder(path.parent_path());
 }
 
 void WriteWorld(const PF_World& world, const std::filesystem::path& path) {

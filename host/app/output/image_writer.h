@@ -35,6 +35,15 @@ void WritePrepared(const PreparedImage& image);
 // and the problem, also for a full disk.
 void WriteWorld(const PF_World& world, const std::filesystem::path& path);
 
+// Whether a file that is replaced keeps who may read and write it, or gets a new file's.
+enum class FilePermissions { kNew, kKeep };
+
+// Replaces the file with the bytes, whole or not at all: they are written to a hidden temporary
+// beside it, flushed to the disk and renamed over it. Throws HostError naming the file and
+// `what` it holds.
+void ReplaceFile(const std::filesystem::path& path, const std::vector<unsigned char>& bytes,
+                 const std::string& what, FilePermissions permissions);
+
 // Removes the hidden temporaries that writers killed before they finished left in folder: those
 // of processes that no longer run. Called once for each folder a render writes into.
 void RemoveStalePartials(const std::filesystem::path& folder);

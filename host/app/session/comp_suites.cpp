@@ -102,13 +102,13 @@ int32_t GetColorSettings(QNGP_RenderContextH context, const PF_LinearBlendingTab
 }
 
 // The stand-in host draws its notes on the terminal: no drawing supplier, no parent window.
-int32_t GetDrawingSupplier(void** supplier) {
+int32_t GetDrawingSupplier(UI_DrawingSupplier** supplier) {
     if (!supplier) return kQNGP_ErrBadArgument;
     *supplier = nullptr;
     return 0;
 }
 
-int32_t GetParentNode(void** node) {
+int32_t GetParentNode(UI_Node** node) {
     if (!node) return kQNGP_ErrBadArgument;
     *node = nullptr;
     return 0;

@@ -107,6 +107,12 @@ TEST(CompositionLoader, BadInputNamesFilePlaceAndProblem) {
         {WithLayers(
              R"({"kind": "solid", "source": {"color": "#336699", "unbounded": true, "width": 20}})"),
          "bad.json: layers[0].source.width: an unbounded solid has no size"},
+        {R"({"width": 1, "height": 1, "duration": 1, "renderer": {"shadowMapSize": 600}})",
+         "bad.json: renderer.shadowMapSize: got 600; the renderer offers \"Comp Size\", 250, 500, "
+         "750, 1000, 1500, 2000, 3000, 4000"},
+        {R"({"width": 1, "height": 1, "duration": 1, "rendererOptions": "",
+             "renderer": {"shadowMapSize": 500}})",
+         "bad.json: renderer.shadowMapSize: the renderer's options are given twice"},
 
     };
     for (const Case& c : cases)

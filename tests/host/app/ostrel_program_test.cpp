@@ -81,6 +81,14 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
          "",
          {}},
         {"about", "about", 0, {"Ostrel 3D\n"}, "", {}},
+        // Without a terminal the dialog reads a line; with none to read it is cancelled.
+        {"options",
+         "options shot/cards.json </dev/null",
+         0,
+         {"Shadow Map Resolution:\n1  ✓ Comp Size\n", "Cancelled\n",
+          "shot/cards.json: unchanged\n"},
+         "",
+         {}},
         // A frame that cannot be written whole is not left behind in part.
         {"unwritable output",
          "render shot/cards.json --frames 0 -o stdout.txt/c.####.png",

@@ -5,7 +5,4 @@
 
 #include "qngp_suites.h"
 
-// Reported, and thrown as 13, when the host has no UI suite to show the note with.
-inline constexpr char kORM_ZELSuiteMissing[] = "PNG ZEL Suite missing";
-
 int32_t ORM_AboutBox(const QNGP_InData* in);

@@ -2,6 +2,7 @@
 
 #include "entry_guard.h"
 #include "memory_handles.h"
+#include "options_dialog.h"
 #include "resources/ormond_strings.h"
 #include "suite_table.h"
 #include "u_cpu.h"
@@ -80,4 +81,20 @@ int32_t ORM_FlattenInstance(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHan
         }
         *flattened = handle.Release();
     });
+}
+
+int32_t ORM_InstanceDialog(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHandle, QNGP_HostHandle,
+                           QNGP_MemHandle options, int32_t* changed) {
+    int32_t result = 0;
+    int32_t failure = ORM_Guard([&] {
+        ORM_SuiteTable suites(in->basic);
+        ORM_LockedHandle locked(suites.Get<QNGP_MemorySuite1>(), options);
+        auto* record = locked.As<ORM_InstanceOptions>();
+        *changed = 0;
+        int32_t before = record->shadowMapSizeChoice;
+        result = ORM_RunOptionsDialog(in, record);
+        if (result == 0 && record->accepted && record->shadowMapSizeChoice != before) *changed = 1;
+        locked.Unlock();
+    });
+    return failure ? failure : result;
 }

@@ -32,3 +32,8 @@ int32_t ORM_InstanceSetDown(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHan
 // Makes a new flattened handle from an options handle; with none, does nothing.
 int32_t ORM_FlattenInstance(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHandle,
                             QNGP_HostHandle, QNGP_MemHandle options, QNGP_MemHandle* flattened);
+
+// Shows the options dialog on the instance's options. *changed becomes 1 only when the user
+// pressed OK with another choice than before. Returns the dialog's result.
+int32_t ORM_InstanceDialog(const QNGP_InData* in, QNGP_HostHandle, QNGP_HostHandle, QNGP_HostHandle,
+                           QNGP_MemHandle options, int32_t* changed);

@@ -8,8 +8,8 @@
 
 inline constexpr char kORM_MatchName[] = "VLMR Ormond";
 
-// The entry points handed to the host at registration: about box, instance set-up, set-down and
-// flatten, and render; the instance dialog and the unused slots stay null.
+// The entry points handed to the host at registration: about box, instance set-up, set-down,
+// flatten and dialog, and render; the unused slots stay null.
 extern const QNGP_ArtisanEntryPoints ORM_ArtisanEntryPoints;
 
 // What GPMain_Ormond does: registers the strings, the artisan and the death hook. *global
