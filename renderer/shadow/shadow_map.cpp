@@ -174,6 +174,14 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
         t[c] = weights > 0 ? sum[c] / weights : 0.0f;
 }
 
+bool SY_PlanarShadowMap::SeenByNoOtherFace(double x, double y) const {
+    // Within 40° of the axis a point lies 50° or more off the axes of the faces around, which
+    // span 50° to each side: tan 40° / tan 50° of the half size, a little less to be safe.
+    constexpr double kOwnShare = 0.7;
+    return std::fabs(x - centre_[0]) < kOwnShare * half_[0] &&
+           std::fabs(y - centre_[1]) < kOwnShare * half_[1];
+}
+
 float SY_PlanarShadowMap::FaceWeight(double x, double y, double inset) const {
     double wx = 1.0 - std::fabs(x - centre_[0]) / (half_[0] - inset);
     double wy = 1.0 - std::fabs(y - centre_[1]) / (half_[1] - inset);
@@ -206,6 +214,10 @@ void SY_CubicShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft
     for (int32_t f = 0; f < count_; ++f) {
         double x, y, d;
         if (!faces_[f]->Project(p, &x, &y, &d)) continue;
+        if (faces_[f]->SeenByNoOtherFace(x, y)) {
+            faces_[f]->TransmissionAt(x, y, d, receiverId, soft, out + 1);
+            return;
+        }
         float w = faces_[f]->FaceWeight(x, y, inset);
         if (w <= 0) continue;
         float t[3];

@@ -110,6 +110,8 @@ public:
     // The tent weight of (x, y) over the face, 1 at its centre, 0 at and beyond its border;
     // inset shrinks the face (texels) for the filter's reach.
     float FaceWeight(double x, double y, double inset) const;
+    // (x, y) lies so near the centre of a cube face that no neighbouring face sees it.
+    bool SeenByNoOtherFace(double x, double y) const;
 
 private:
     void TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId, float t[3]) const;
