@@ -139,7 +139,20 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     for (int32_t i = 0; i < count; ++i, state.Step()) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) continue;
-        for (int32_t level = 0; level < levels; ++level) {
+        // Where the widest box is wholly opaque, so is every box inside it, and a layer that
+        // passes no colour then lets the same grey through at every level.
+        P widest;
+        sample(levels - 1, &widest);
+        constexpr auto kOpaque = static_cast<decltype(widest.alpha)>(PF_PixelTraits<P>::kMax);
+        if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
+            PF_Pixel16 occluder;
+            Occluder(widest, shader, &occluder);
+            array->AddShadowFragment(&occluder, shader.DepthKey(depth->w, 0), 0.0f, shader.layerId,
+                                     heads + i, thread);
+            continue;
+        }
+        present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
+        for (int32_t level = 0; level + 1 < levels; ++level) {
             P texel;
             sample(level, &texel);
             present[level] = Occluder(texel, shader, &occluders[level]);
