@@ -7,6 +7,7 @@ packages=(
     libboost-dev libtbb-dev libopenimageio-dev nlohmann-json3-dev libcli11-dev
     libgtest-dev libgmock-dev libbenchmark-dev
     libopencv-core-dev libopencv-imgproc-dev
+    slurm-wlm munge
 )
 
 missing=()

@@ -10,10 +10,12 @@
 #include "cli/info_command.h"
 #include "cli/options_command.h"
 #include "cli/progress_display.h"
+#include "cli/render_arguments.h"
 #include "cli/render_command.h"
 #include "composition/composition_error.h"
 #include "composition/composition_loader.h"
 #include "host_error.h"
+#include "submit/submit_command.h"
 
 namespace {
 
@@ -25,24 +27,6 @@ std::vector<std::filesystem::path> PluginFolders(const std::vector<std::string>&
     folders.push_back(ostrel::DefaultPluginFolder());
     return folders;
 }
-
-// The value of an option, or a message that names the option.
-template <class Parse>
-auto Option(const char* name, Parse&& parse) {
-    try {
-        return parse();
-    } catch (const std::invalid_argument& error) {
-        throw ostrel::HostError(std::string(name) + ": " + error.what());
-    }
-}
-
-// The parser takes an empty value as given; it is a mistake the user should hear of, not a
-// default.
-const CLI::Validator kNonEmpty(
-    [](std::string& value) {
-        return value.empty() ? std::string("an empty value") : std::string();
-    },
-    "", "NONEMPTY");
 
 }  // namespace
 
@@ -57,65 +41,41 @@ int main(int argc, char** argv) {
     std::vector<std::string> pluginFolders;
 
     ostrel::RenderOptions render;
-    std::string composition, frames, downsample, region, fields = "off", multiprocessing = "on";
-    int bitDepth = 0;
+    ostrel::RenderArguments renderArguments;
+    std::string composition;
     CLI::App* renderCommand = app.add_subcommand("render", "Render frames to image files");
-    renderCommand->add_option("COMP", composition, "Composition file (JSON)")
-        ->required()
-        ->check(kNonEmpty);
-    renderCommand
-        ->add_option("-o,--output", render.outputPattern,
-                     "Output files; #### becomes the frame number (default: COMP's "
-                     "name with .####.png, beside it)")
-        ->check(kNonEmpty);
-    renderCommand->add_option("--frames", frames, "Frames to render, A-B or A (default: all)")
-        ->check(kNonEmpty);
-    renderCommand->add_option("--depth", bitDepth, "Bit depth instead of the comp's: 8, 16, 32")
-        ->check(CLI::IsMember({8, 16, 32}))
-        ->check(kNonEmpty);
-    renderCommand->add_option("--downsample", downsample, "Render at 1/N size: N or XxY")
-        ->check(kNonEmpty);
-    renderCommand->add_option("--fields", fields, "Field rendering: off, upper or lower first")
-        ->check(CLI::IsMember({"off", "upper", "lower"}));
-    renderCommand
-        ->add_option("--region", region, "Render only LEFT,TOP,RIGHT,BOTTOM of the comp (pixels)")
-        ->check(kNonEmpty);
-    renderCommand
-        ->add_option("--multiprocessing", multiprocessing,
-                     "Let the renderer use several threads: on or off")
-        ->check(CLI::IsMember({"on", "off"}));
+    ostrel::AddRenderArguments(*renderCommand, renderArguments);
     renderCommand->add_option("--threads", render.threads, "Worker threads (0: one per core)")
         ->check(CLI::Range(0, 256));
-    renderCommand
-        ->add_option("--plugins", pluginFolders,
-                     "Folder to search for plug-ins before the default one")
-        ->check(kNonEmpty);
-    renderCommand->add_flag("--background", render.background,
-                            "Composite the frames over the comp's background colour");
     renderCommand->add_flag("--stats", render.stats,
                             "Print the time spent inside and outside the plug-in");
+    renderCommand->add_flag("--skip-existing", render.skipExisting,
+                            "Leave out frames whose file is already there and reads whole");
+
+    ostrel::SubmitOptions submit;
+    CLI::App* submitCommand = ostrel::AddSubmitCommand(app, submit);
 
     CLI::App* aboutCommand = app.add_subcommand("about", "Show the renderer's about box");
     aboutCommand
         ->add_option("--plugins", pluginFolders,
                      "Folder to search for plug-ins before the default one")
-        ->check(kNonEmpty);
+        ->check(ostrel::kNonEmpty);
 
     CLI::App* optionsCommand =
         app.add_subcommand("options", "Choose the renderer's options for a composition");
     optionsCommand->add_option("COMP", composition, "Composition file (JSON), rewritten on OK")
         ->required()
-        ->check(kNonEmpty);
+        ->check(ostrel::kNonEmpty);
     optionsCommand
         ->add_option("--plugins", pluginFolders,
                      "Folder to search for plug-ins before the default one")
-        ->check(kNonEmpty);
+        ->check(ostrel::kNonEmpty);
 
     int32_t infoFrame = 0;
     CLI::App* infoCommand = app.add_subcommand("info", "List what a composition will render");
     infoCommand->add_option("COMP", composition, "Composition file (JSON)")
         ->required()
-        ->check(kNonEmpty);
+        ->check(ostrel::kNonEmpty);
     infoCommand->add_option("--frame", infoFrame, "The frame whose layers are listed")
         ->check(CLI::NonNegativeNumber);
 
@@ -123,25 +83,7 @@ int main(int argc, char** argv) {
 
     try {
         if (renderCommand->parsed()) {
-            render.composition = composition;
-            render.frames = frames;
-            render.settings.bitDepth = static_cast<int16_t>(bitDepth);
-            if (!downsample.empty()) {
-                ostrel::Downsample factors =
-                    Option("--downsample", [&] { return ostrel::ParseDownsample(downsample); });
-                render.settings.downsampleX = factors.x;
-                render.settings.downsampleY = factors.y;
-            }
-            if (!region.empty()) {
-                render.settings.region =
-                    Option("--region", [&] { return ostrel::ParseRegion(region); });
-            }
-            using Fields = ostrel::RenderSettings::Fields;
-            render.settings.fields = fields == "upper"   ? Fields::kUpperFirst
-                                     : fields == "lower" ? Fields::kLowerFirst
-                                                         : Fields::kOff;
-            render.multiprocessing = multiprocessing == "on";
-            render.pluginFolders.assign(pluginFolders.begin(), pluginFolders.end());
+            ostrel::ApplyRenderArguments(renderArguments, render);
             render.terminal = ::isatty(STDOUT_FILENO) != 0;
             ostrel::RunRender(render, std::cout);
         } else if (aboutCommand->parsed()) {
@@ -156,6 +98,8 @@ int main(int argc, char** argv) {
                     ": the composition has frames 0-" + std::to_string(comp.FrameCount() - 1));
             }
             ostrel::PrintInfo(comp, infoFrame, std::cout);
+        } else if (submitCommand->parsed()) {
+            ostrel::RunSubmit(submit, std::cout);
         }
     } catch (const std::exception& error) {
         std::cout << std::flush;

@@ -11,6 +11,7 @@
 #include "cli/artisan_instance.h"
 #include "cli/progress_display.h"
 #include "composition/composition_loader.h"
+#include "composition/image_file.h"
 #include "host_error.h"
 #include "output/background.h"
 #include "output/frame_writer.h"
@@ -101,24 +102,42 @@ std::string DefaultOutputPattern(const std::filesystem::path& composition) {
     return (composition.parent_path() / composition.stem()).string() + ".####.png";
 }
 
-void RunRender(const RenderOptions& options, std::ostream& out) {
-    Clock::time_point start = Clock::now();
-    Composition comp = LoadComposition(options.composition);
-    FrameRange range{0, comp.FrameCount() - 1};
+RenderPlan PlanRender(const RenderOptions& options, ImageCache& images) {
+    RenderPlan plan{LoadComposition(options.composition), {}, options.outputPattern};
+    const Composition& comp = plan.comp;
+    plan.range = {0, comp.FrameCount() - 1};
     if (!options.frames.empty()) {
-        range = Checked(comp, "--frames",
-                        [&] { return ParseFrameRange(options.frames, comp.FrameCount()); });
+        plan.range = Checked(comp, "--frames",
+                             [&] { return ParseFrameRange(options.frames, comp.FrameCount()); });
     }
     // Times grow with the frame: when the last frame's fits, every frame's does.
-    comp.FrameTime(range.last);
-    std::string pattern =
-        options.outputPattern.empty() ? DefaultOutputPattern(comp.file) : options.outputPattern;
-    ImageCache images;
+    comp.FrameTime(plan.range.last);
+    if (plan.pattern.empty()) plan.pattern = DefaultOutputPattern(comp.file);
     // Settings the comp cannot take fail here, before any plug-in is loaded.
     Checked(comp, "render settings", [&] {
-        FrameSession probe(comp, images, options.settings, range.first);
+        FrameSession probe(comp, images, options.settings, plan.range.first);
         return 0;
     });
+    return plan;
+}
+
+void RunRender(const RenderOptions& options, std::ostream& out) {
+    Clock::time_point start = Clock::now();
+    ImageCache images;
+    const RenderPlan plan = PlanRender(options, images);
+    const Composition& comp = plan.comp;
+    const std::string& pattern = plan.pattern;
+    std::vector<int32_t> frames;
+    for (int32_t frame = plan.range.first; frame <= plan.range.last; ++frame) {
+        if (!options.skipExisting || !DecodesWhole(ExpandFramePattern(pattern, frame)))
+            frames.push_back(frame);
+    }
+    auto skipped = static_cast<int32_t>(plan.range.last - plan.range.first + 1 - frames.size());
+    // Nothing left to draw needs no plug-in.
+    if (frames.empty()) {
+        out << "0 frames, " << skipped << " skipped (already written)\n";
+        return;
+    }
 
     SetApplicationSetting("Tessary 3D", "Enable Multiprocessing", options.multiprocessing ? 1 : 0);
     SetIterateThreads(options.threads);
@@ -129,7 +148,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     const Artisan& artisan = LoadArtisan(plugins, folders, kRendererMatchName);
     ArtisanInstance instance(plugins, artisan, comp.rendererOptions);
 
-    int32_t frameCount = range.last - range.first + 1;
+    auto frameCount = static_cast<int32_t>(frames.size());
     ProgressDisplay progress(out, options.terminal, frameCount);
     CatchInterrupts();
     FrameTimes all;
@@ -152,7 +171,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         }
     };
     std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
-    for (int32_t frame = range.first; frame <= range.last; ++frame) {
+    for (int32_t frame : frames) {
         if (Interrupted()) {
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
                             ": interrupted");
@@ -196,12 +215,15 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     all.output += Seconds(Clock::now() - lastWrite);
     if (inFlight) report(*inFlight);
     progress.Clear();
-    if (options.terminal) {
-        // The bar is gone: one line says what became of the run.
+    // The bar is gone: one line says what became of the run. A log of a resumed run needs
+    // it too, for the frames it left out.
+    if (options.terminal || options.skipExisting) {
         char summary[64];
-        std::snprintf(summary, sizeof summary, "%d frame%s in %.2f s -> ", frameCount,
+        std::snprintf(summary, sizeof summary, "%d frame%s in %.2f s", frameCount,
                       frameCount == 1 ? "" : "s", Seconds(Clock::now() - start));
-        out << summary << firstFile << (frameCount > 1 ? " ... " + lastFile : "") << '\n';
+        out << summary;
+        if (options.skipExisting) out << ", " << skipped << " skipped (already written)";
+        out << " -> " << firstFile << (frameCount > 1 ? " ... " + lastFile : "") << '\n';
     }
     if (options.stats) {
         // Loading the composition and the plug-ins counts as the host's.

@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+#include "cli/arguments.h"
+#include "composition/image_cache.h"
 #include "session/frame_session.h"
 
 namespace ostrel {
@@ -22,9 +24,21 @@ struct RenderOptions {
     int32_t threads = 0;  // 0: one per processor
     std::vector<std::filesystem::path> pluginFolders;
     bool stats = false;
-    bool background = false;  // frames over the comp's background colour, whatever it says
-    bool terminal = false;    // draw a progress bar instead of a line per frame
+    bool background = false;    // frames over the comp's background colour, whatever it says
+    bool skipExisting = false;  // leave out frames whose file is there and decodes whole
+    bool terminal = false;      // draw a progress bar instead of a line per frame
 };
+
+// What a render of the options draws: the composition, its frames and their files.
+struct RenderPlan {
+    Composition comp;
+    FrameRange range;
+    std::string pattern;
+};
+
+// Loads the composition and checks the options against it, as a render does before it loads
+// any plug-in. Throws HostError or CompositionError with a message for the user.
+RenderPlan PlanRender(const RenderOptions& options, ImageCache& images);
 
 // Renders and writes every frame; throws HostError or CompositionError with a message for the
 // user at the first problem. A frame's file is written whole or not at all.

@@ -147,4 +147,13 @@ DecodedImage DecodeImage(const std::filesystem::path& file) {
     return image;
 }
 
+bool DecodesWhole(const std::filesystem::path& file) {
+    try {
+        DecodeImage(file);
+        return true;
+    } catch (const CompositionError&) {
+        return false;
+    }
+}
+
 }  // namespace ostrel

@@ -27,4 +27,8 @@ struct DecodedImage {
 ImageInfo ProbeImage(const std::filesystem::path& file);
 DecodedImage DecodeImage(const std::filesystem::path& file);
 
+// Whether the file is there and every pixel of it decodes: a frame cut short by a copy or a
+// full disk does not.
+bool DecodesWhole(const std::filesystem::path& file);
+
 }  // namespace ostrel

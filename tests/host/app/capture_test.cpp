@@ -11,65 +11,40 @@
 #include "renderer/scene/scene_print.h"
 #include "scene_assembly.h"
 #include "served_frame.h"
-#include "suites/memory_suite.h"
 #include "suites/suite_registry.h"
-#include "u_memory.h"
 
 namespace ostrel {
 namespace {
 
-// The instance options as the plug-in keeps them, in a memory handle freed with the object.
-class Options {
-public:
-    Options() {
-        MemorySuite()->NewHandle(1, "options", sizeof(ORM_InstanceOptions), 1, &handle_);
-        void* bytes = nullptr;
-        MemorySuite()->LockHandle(handle_, &bytes);
-        *static_cast<ORM_InstanceOptions*>(bytes) = {1, 0, 0, 0};
-        MemorySuite()->UnlockHandle(handle_);
-    }
-    ~Options() { MemorySuite()->FreeHandle(handle_); }
-    Options(const Options&) = delete;
-    Options& operator=(const Options&) = delete;
-
-    QNGP_MemHandle Get() const { return handle_; }
-
-private:
-    QNGP_MemHandle handle_ = nullptr;
-};
-
 const QNGP_InData kInData{SuiteRegistry::BasicSuite(), 1};
 
-class Capture : public testing::Test {
-protected:
-    // Scene assembly of the frame, with the render context the render entry makes.
-    static void Assemble(ServedFrame& frame, SY_SceneDesc* scene) {
-        Options options;
-        ORM_RenderContext context(
-            &kInData, {nullptr, nullptr, frame.Render(), nullptr, options.Get(), nullptr});
+// Scene assembly of the frame, with new instance options and the render context the render
+// entry makes.
+void Assemble(ServedFrame& frame, SY_SceneDesc* scene) {
+    QNGP_MemHandle options = nullptr;
+    ASSERT_EQ(ORM_InstanceSetUp(&kInData, nullptr, nullptr, nullptr, nullptr, nullptr, &options),
+              0);
+    {
+        ORM_RenderContext context(&kInData,
+                                  {nullptr, nullptr, frame.Render(), nullptr, options, nullptr});
         ORM_AssembleScene(context, scene);
     }
-};
+    EXPECT_EQ(ORM_InstanceSetDown(&kInData, nullptr, nullptr, nullptr, options), 0);
+}
 
 // The comp's sample count as a test sets it, for counts a composition file cannot hold.
 int32_t gSamples = 0;
 
-int32_t TestSamples(QNGP_CompH, int32_t* samples) {
-    *samples = gSamples;
-    return 0;
-}
-
-class SampleCountOverride {
-public:
-    explicit SampleCountOverride(int32_t samples)
-        : suite_(*CompSuite()), served_(kQNGP_CompSuite, 14, &suite_) {
+struct SampleCountOverride {
+    explicit SampleCountOverride(int32_t samples) : suite(*CompSuite()) {
         gSamples = samples;
-        suite_.GetCompMotionBlurSamples = &TestSamples;
+        suite.GetCompMotionBlurSamples = [](QNGP_CompH, int32_t* count) {
+            *count = gSamples;
+            return int32_t{0};
+        };
     }
-
-private:
-    QNGP_CompSuite14 suite_;
-    ScopedSuite served_;
+    QNGP_CompSuite14 suite;
+    ScopedSuite served{kQNGP_CompSuite, 14, &suite};
 };
 
 // A 100-pixel card that moves right at 960 pixels a second from x = 0 at time 0.
@@ -81,9 +56,8 @@ const std::string kMovingCard = R"(
   {"name": "still", "kind": "solid", "threeD": true,
    "source": {"color": "#ffffff", "width": 100, "height": 100}}
 )";
-const std::string kBlur = R"("motionBlur": {"enabled": true})";
 
-TEST_F(Capture, SampleCountsClampedToTwoToSixtyFour) {
+TEST(Capture, SampleCountsClampedToTwoToSixtyFour) {
     // Frame 12 (0.5 s) with a 180° shutter opening 90° early: from 0.5 − 1/96 s for 1/48 s,
     // where the card's corner moves from x = 420 to 440.
     struct Case {
@@ -93,7 +67,7 @@ TEST_F(Capture, SampleCountsClampedToTwoToSixtyFour) {
     const Case kCases[] = {{0, 2}, {5, 5}, {100, 64}};
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.samples);
-        ServedFrame frame(CompJson(kBlur, kMovingCard), 12);
+        ServedFrame frame(CompJson(R"("motionBlur": {"enabled": true})", kMovingCard), 12);
         SampleCountOverride samples(c.samples);
         SY_SceneDesc scene;
         Assemble(frame, &scene);
@@ -113,7 +87,7 @@ const std::string kOrthographicCamera = R"(
      "irisShape": "hexagon", "irisRoundness": 30, "highlightThreshold": 200}}},
 )";
 
-TEST_F(Capture, OrthographicCameraAndDownsampleReachTheDepthOfField) {
+TEST(Capture, OrthographicCameraAndDownsampleReachTheDepthOfField) {
     RenderSettings settings;
     settings.downsampleX = 2;
     settings.downsampleY = 4;
@@ -136,7 +110,7 @@ const std::string kLitCard = R"(
   {"name": "dark", "kind": "light", "on": false, "light": {"type": "spot"}}
 )";
 
-TEST_F(Capture, LightsThatAreOnUnlessTheCompSwitchesLightsOff) {
+TEST(Capture, LightsThatAreOnUnlessTheCompSwitchesLightsOff) {
     for (bool enabled : {true, false}) {
         SCOPED_TRACE(enabled ? "lights on" : "lights switched off in the comp");
         ServedFrame frame(CompJson(enabled ? "" : R"("lightsAndDepthOfField": false)", kLitCard));
@@ -152,7 +126,7 @@ TEST_F(Capture, LightsThatAreOnUnlessTheCompSwitchesLightsOff) {
     }
 }
 
-TEST_F(Capture, QualityAndShadowSwitches) {
+TEST(Capture, QualityAndShadowSwitches) {
     const std::string layers = R"(
       {"name": "wire", "kind": "solid", "threeD": true, "quality": "wireframe",
        "source": {"color": "#ffffff"}, "material": {"castsShadows": "on"}},

@@ -17,9 +17,7 @@ namespace {
 Layer ImageLayer(const std::filesystem::path& file, int32_t width, int32_t height) {
     Layer layer;
     layer.kind = LayerKind::kImage;
-    layer.source.image = file;
-    layer.source.width = width;
-    layer.source.height = height;
+    layer.source = {file, {}, width, height};
     return layer;
 }
 

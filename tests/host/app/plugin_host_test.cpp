@@ -4,6 +4,7 @@
 
 #include <filesystem>
 #include <string>
+#include <utility>
 
 #include "host_error.h"
 #include "plugins/plugin_host.h"
@@ -15,41 +16,31 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// A property list built byte by byte, as a plug-in's resource holds it.
-class PropertyList {
-public:
-    PropertyList& Kind(const std::string& code) {
-        return Property("kind", {code.rbegin(), code.rend()});
-    }
-    PropertyList& Entry(const std::string& name) {
-        std::string value = name;
-        value.resize((name.size() + 1 + 15) / 16 * 16, '\0');
-        return Property("8664", value);
-    }
-    std::string Bytes() const {
-        std::string bytes{1, 0, 0, 0, 0, 0};
-        Append32(&bytes, count_);
-        return bytes + body_;
-    }
+std::string Le32(uint32_t v) {
+    return {char(v), char(v >> 8), char(v >> 16), char(v >> 24)};
+}
 
-private:
-    PropertyList& Property(const std::string& key, const std::string& value) {
-        body_ += "RVK4" + std::string(key.rbegin(), key.rend());
-        Append32(&body_, 0);
-        Append32(&body_, static_cast<uint32_t>(value.size()));
-        body_ += value;
-        body_.resize((body_.size() + 3) / 4 * 4, '\0');
-        ++count_;
-        return *this;
-    }
-    static void Append32(std::string* bytes, uint32_t v) {
-        for (int i = 0; i < 4; ++i)
-            bytes->push_back(static_cast<char>(v >> (8 * i)));
-    }
+// A property, its key and value as a plug-in's property list holds them: the kind's code and
+// the key reversed, the entry's name padded to 16 bytes.
+using Property = std::pair<std::string, std::string>;
+Property Kind(const std::string& code) {
+    return {"dnik", {code.rbegin(), code.rend()}};
+}
+Property Entry(std::string name) {
+    name.resize((name.size() + 1 + 15) / 16 * 16, '\0');
+    return {"4668", name};
+}
 
-    std::string body_;
-    uint32_t count_ = 0;
-};
+// A property list built byte by byte, as a plug-in's resource holds it; each property padded
+// to four bytes.
+std::string PropertyList(std::initializer_list<Property> properties) {
+    std::string body;
+    for (const auto& [key, value] : properties) {
+        body += "RVK4" + key + Le32(0) + Le32(static_cast<uint32_t>(value.size())) + value;
+        body.resize((body.size() + 3) / 4 * 4, '\0');
+    }
+    return std::string{1, 0, 0, 0, 0, 0} + Le32(static_cast<uint32_t>(properties.size())) + body;
+}
 
 // A copy of the test plug-in in a folder of its own, with the given property list beside it.
 struct PluginFolder {
@@ -62,7 +53,7 @@ struct PluginFolder {
 };
 
 TEST(PluginHost, LoadsRegistersAndUnloads) {
-    PluginFolder plugins(PropertyList().Kind("QNgx").Entry("TestArtisanMain").Bytes());
+    PluginFolder plugins(PropertyList({Kind("QNgx"), Entry("TestArtisanMain")}));
     // Our own reference keeps the library mapped after the host unloads it.
     void* library = dlopen(plugins.library.c_str(), RTLD_NOW);
     ASSERT_NE(library, nullptr);
@@ -90,14 +81,14 @@ TEST(PluginHost, RefusesWhatItCannotLoad) {
         std::string list;
         const char* problem;
     };
-    const std::string whole = PropertyList().Kind("QNgx").Entry("TestArtisanMain").Bytes();
+    const std::string whole = PropertyList({Kind("QNgx"), Entry("TestArtisanMain")});
     const Case cases[] = {
-        {"wrong kind", PropertyList().Kind("QNfl").Entry("TestArtisanMain").Bytes(),
+        {"wrong kind", PropertyList({Kind("QNfl"), Entry("TestArtisanMain")}),
          "not a general plug-in"},
-        {"no kind", PropertyList().Entry("TestArtisanMain").Bytes(), "has no kind"},
-        {"no entry point", PropertyList().Kind("QNgx").Bytes(), "names no x86-64 entry point"},
+        {"no kind", PropertyList({Entry("TestArtisanMain")}), "has no kind"},
+        {"no entry point", PropertyList({Kind("QNgx")}), "names no x86-64 entry point"},
         {"truncated", whole.substr(0, 30), "it ends inside"},
-        {"missing entry point", PropertyList().Kind("QNgx").Entry("NoSuchMain").Bytes(),
+        {"missing entry point", PropertyList({Kind("QNgx"), Entry("NoSuchMain")}),
          "\"NoSuchMain\" that its property list names is not exported"},
     };
     for (const Case& c : cases) {

@@ -46,11 +46,6 @@ int32_t Fixed(double v) {
 }
 
 template <class P>
-P Sample(Filter filter, const PF_World& world, double x, double y, double radius = 0.5) {
-    return SampleFixed<P>(filter, world, Fixed(x), Fixed(y), Fixed(radius), Fixed(radius));
-}
-
-template <class P>
 class Samplers : public ::testing::Test {};
 using PixelTypes = ::testing::Types<PF_Pixel8, PF_Pixel16, PF_PixelFloat>;
 TYPED_TEST_SUITE(Samplers, PixelTypes);

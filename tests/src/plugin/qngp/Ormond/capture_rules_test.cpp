@@ -28,8 +28,6 @@ TEST(CameraPair, EyeAndScreenFollowTheViewAndTheCameraLayer) {
     // divides.
     const Case kCases[] = {
         {{2, 0, 0, 1, 1}, kDefault, 200, {100, 25, -200}, {10, -5, 200}, {55, 20}},
-        {{1, 10, 20, 1, 1}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {40, 10}},
-        {{1, 0, 0, 2, 2}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {30, 10}},
         {{1, 10, 20, 2, 2}, kDefault, 200, {50, 25, -200}, {10, -5, 400}, {17.5, 6.25}},
         {{1, 0, 0, 4, 1}, kDefault, 200, {50, 25, -200}, {10, -5, 200}, {15, 20}},
         {{2, 0, 0, 1, 1}, kLayer, 400, {14, 8, -300}, {20, 10, 400}, {60, 35}},
@@ -78,25 +76,13 @@ TEST(TransferMode, NormalVariantsArriveAsTwoAndKeepAlphaIsBitSeven) {
     const QNGP_EngineLayer kAVIgnoring{true, true, 0};
     const QNGP_EngineLayer kAVKeeping{true, false, 0};
     const Case kCases[] = {
-        {2, 0, kPlain, 2},      {3, 0, kPlain, 2},      {17, 0, kPlain, 2},
-        {18, 0, kPlain, 2},     {5, 0, kPlain, 5},      {16, 0, kPlain, 16},
-        {19, 0, kPlain, 19},    {3, 1, kPlain, 0x82},   {7, 1, kAVKeeping, 0x87},
-        {7, 1, kAVIgnoring, 7}, {7, 0, kAVIgnoring, 7}, {7, 2, kPlain, 7},
+        {3, 0, kPlain, 2},        {17, 0, kPlain, 2},     {18, 0, kPlain, 2},
+        {16, 0, kPlain, 16},      {19, 0, kPlain, 19},    {3, 1, kPlain, 0x82},
+        {7, 1, kAVKeeping, 0x87}, {7, 1, kAVIgnoring, 7}, {7, 2, kPlain, 7},
     };
     for (const Case& c : kCases) {
         SCOPED_TRACE(testing::Message() << "mode " << c.mode << " flags " << c.flags);
         EXPECT_EQ(ORM_StoredTransferMode({c.mode, c.flags, 0}, c.engine), c.stored);
-    }
-}
-
-// Only best is best quality; the accepts-shadows stream is a popup index, truncated.
-TEST(LayerQuality, DraftIsNotBestAndAcceptsShadowsTruncates) {
-    for (int16_t quality : {1, 2}) {
-        SY_Material l;
-        ORM_ApplyQuality(quality, {0, 1.7, 1}, &l);
-        EXPECT_EQ(l.bestQuality, quality == 2) << "quality " << quality;
-        EXPECT_TRUE(l.renders && l.acceptsLights && !l.castsShadows);
-        EXPECT_EQ(l.acceptsShadows, 1);
     }
 }
 

@@ -1,6 +1,11 @@
+// The matrix and time libraries: results worked by hand, and what cannot be computed reported
+// rather than wrapped.
 #include <gtest/gtest.h>
 
+#include <limits>
+
 #include "m_matrix.h"
+#include "t_time.h"
 
 namespace {
 
@@ -34,4 +39,16 @@ TEST(Matrix, ConvexHullDropsInteriorAndCollinearPoints) {
     }
     EXPECT_DOUBLE_EQ(area / 2, 4);  // counter-clockwise in a y-up frame: positive area
 }
+
+TEST(Time, OverflowIsReportedNotWrapped) {
+    T_Time big{std::numeric_limits<int32_t>::max(), 1}, out{7, 7};
+    EXPECT_EQ(T_MultiplyTime(&big, 2, &out), kT_ErrOverflow);
+    EXPECT_EQ(out.value, 7);
+    T_Time fine{1, 4000000000u};
+    EXPECT_EQ(T_DivideTime(&fine, 3, &out), kT_ErrOverflow);
+    T_Time zero{1, 0};
+    EXPECT_EQ(T_AddTimes(&zero, &fine, &out), kT_ErrZeroScale);
+    EXPECT_EQ(T_DivideTime(&fine, 0, &out), kT_ErrZeroScale);
+}
+
 }  // namespace
