@@ -64,6 +64,7 @@ std::vector<std::string> RenderCommand(const SubmitOptions& options, const Rende
     add("--fields", given.fields, "off");
     add("--multiprocessing", given.multiprocessing, "on");
     if (given.background) command.push_back("--background");
+    add("--max-memory", given.maxMemory, "");
     for (const fs::path& folder : pluginFolders)
         add("--plugins", folder.string(), "");
     return command;
