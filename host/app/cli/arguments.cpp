@@ -94,4 +94,18 @@ int64_t ParseMemorySize(const std::string& text) {
     return static_cast<int64_t>(bytes);
 }
 
+std::string FrameList(const std::vector<int32_t>& frames) {
+    std::string text;
+    for (size_t i = 0; i < frames.size();) {
+        size_t j = i;
+        while (j + 1 < frames.size() && frames[j + 1] == frames[j] + 1)
+            ++j;
+        if (!text.empty()) text += ", ";
+        text += std::to_string(frames[i]);
+        if (j > i) text.append("-").append(std::to_string(frames[j]));
+        i = j + 1;
+    }
+    return text;
+}
+
 }  // namespace ostrel

@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <string>
+#include <vector>
 
 #include "m_matrix.h"
 
@@ -28,6 +29,9 @@ Downsample ParseDownsample(const std::string& text);
 
 // "LEFT,TOP,RIGHT,BOTTOM" in comp pixels, right and bottom exclusive.
 M_LRect ParseRegion(const std::string& text);
+
+// Frames as ranges: 3, 4, 5, 9 → "3-5, 9".
+std::string FrameList(const std::vector<int32_t>& frames);
 
 // A size of memory in bytes: a number, whole or not, with K, M, G or T for powers of 1024
 // ("512M", "1.5G"), at least a megabyte.

@@ -3,6 +3,7 @@
 #include <chrono>
 #include <cstdio>
 #include <filesystem>
+#include <iostream>
 #include <optional>
 #include <sstream>
 #include <stdexcept>
@@ -190,6 +191,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         }
     };
     std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
+    std::vector<int32_t> failed;                         // with --keep-going
     for (int32_t frame : frames) {
         if (Interrupted()) {
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
@@ -206,9 +208,19 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             Clock::time_point entry = Clock::now();
             int32_t code = instance.Render(session);
             times.entry += Seconds(Clock::now() - entry);
-            if (code)
-                throw HostError(
-                    FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit));
+            if (code) {
+                std::string failure =
+                    FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit);
+                if (!options.keepGoing || code == kQNGP_ErrUserCancel) throw HostError(failure);
+                progress.Clear();
+                std::cerr << "ostrel: " << failure << '\n';
+                failed.push_back(frame);
+                break;
+            }
+        }
+        if (!failed.empty() && failed.back() == frame) {
+            progress.EndFrame();
+            continue;
         }
         times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
         if (options.background || comp.renderBackground)
@@ -236,6 +248,10 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     all.output += Seconds(Clock::now() - lastWrite);
     if (inFlight) report(*inFlight);
     progress.Clear();
+    if (!failed.empty()) {
+        throw HostError(comp.file.string() + ": " + std::to_string(failed.size()) + " of " +
+                        std::to_string(frameCount) + " frames failed: " + FrameList(failed));
+    }
     // The bar is gone: one line says what became of the run. A log of a resumed run needs
     // it too, for the frames it left out.
     if (options.terminal || options.skipExisting) {

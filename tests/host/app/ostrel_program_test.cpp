@@ -196,6 +196,33 @@ TEST(OstrelProgram, OutOfMemoryIsAnErrorNotAnAbort) {
     EXPECT_EQ(FilesIn(folder.Path()), 2u);
 }
 
+// With --keep-going a frame that fails is reported and the run goes on; it fails at the end,
+// naming the frames. The broken image shows only on frame 1.
+TEST(OstrelProgram, KeepGoingRendersTheFramesThatCanBe) {
+    TempFolder folder;
+    fs::copy(fs::path(OSTREL_EXAMPLES_DIR) / "cards", folder.Path());
+    std::string png = ReadAll(folder.Path() / "disc.png");
+    png[png.find("IDAT") + 100] ^= 0x40;  // whole, but its data no longer checks
+    folder.WriteText("bad.png", png);
+    nlohmann::json comp = nlohmann::json::parse(ReadAll(folder.Path() / "cards.json"));
+    comp["layers"][3].update({{"source", "bad.png"}, {"in", 0.04}, {"out", 0.08}});
+    folder.WriteText("c.json", comp.dump());
+    std::string command = "cd '" + folder.Path().string() +
+                          "' && '" OSTREL_PROGRAM
+                          "' render c.json --frames 0-2 --keep-going -o f.####.png >/dev/null "
+                          "2>err.txt";
+    int status = std::system(command.c_str());
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+    std::string errors = ReadAll(folder.Path() / "err.txt");
+    EXPECT_NE(errors.find("bad.png': "), std::string::npos) << errors;
+    EXPECT_NE(errors.find("(frame 1)\nostrel: c.json: 1 of 3 frames failed: 1\n"),
+              std::string::npos)
+        << errors;
+    EXPECT_TRUE(fs::exists(folder.Path() / "f.0000.png") &&
+                fs::exists(folder.Path() / "f.0002.png"));
+    EXPECT_FALSE(fs::exists(folder.Path() / "f.0001.png"));
+}
+
 // A render killed outright leaves at most the temporaries of a process that is gone, which the
 // next render into the folder removes; an interrupted one stops with whole frames only.
 TEST(OstrelProgram, KilledAndInterruptedRendersLeaveWholeFramesOnly) {
