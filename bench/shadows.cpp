@@ -9,47 +9,18 @@
 //   float. The ratio of the two is the price of shadows.
 #include <benchmark/benchmark.h>
 
-#include <map>
-#include <memory>
-#include <random>
-#include <vector>
-
-#include "m_matrix.h"
-#include "pf_world.h"
+#include "card_scene.h"
 #include "renderer/frame/frame_driver.h"
 #include "renderer/frame/shadow_maps.h"
-#include "renderer/scene/fetchers.h"
 #include "renderer/scene/render_context.h"
-#include "renderer/scene/scene_desc.h"
 
 namespace {
 
-constexpr int32_t kWidth = 1920, kHeight = 1080;
+using bench::Identity;
+using bench::kHeight;
+using bench::kWidth;
+
 constexpr int32_t kCards = 10, kTextureSize = 512;
-constexpr double kDistance = 2000;  // the camera sees z = 0 at 1:1
-
-class Fetcher : public SY_TTextureFetcher {
-public:
-    std::map<int32_t, PF_World*> worlds;
-    int32_t Fetch(int32_t index, bool, const double*, const M_LRect*, M_Matrix3*,
-                  PF_World** world) override {
-        *world = worlds[index];
-        return 0;
-    }
-    void Release(int32_t, PF_World*) override {}
-};
-
-class NoProgress : public SY_ProgressAbort {
-public:
-    void ReportRenderables(int32_t, int32_t) override {}
-    void ReportRows(int32_t, int32_t) override {}
-};
-
-M_Matrix4 Identity() {
-    M_Matrix4 m;
-    M_IdentityMatrix4(&m);
-    return m;
-}
 
 // Card k: centred on a 5 × 2 grid 340 apart (so neighbours overlap), 80 deeper than card
 // k − 1, turned a little about both axes.
@@ -62,41 +33,16 @@ M_Matrix4 CardPlacement(int32_t k) {
 }
 
 template <class P>
-struct Scene {
-    Scene(bool best, int32_t casters) {
-        M_Matrix4 placement = Identity(), projection = Identity();
-        M_TranslateMatrix4(kWidth / 2.0, kHeight / 2.0, -kDistance, &placement);
-        projection.Project(kDistance);
-        M_TranslateMatrix4(kWidth / 2.0, kHeight / 2.0, 0, &projection);
-        scene.cameraPlacements.Allocate(1);
-        scene.cameraProjections.Allocate(1);
-        scene.cameraPlacements[0] = scene.framePlacement = placement;
-        scene.cameraProjections[0] = scene.frameProjection = projection;
-        scene.layers.Allocate(kCards);
-        std::mt19937 random(11);
-        std::uniform_real_distribution<float> unit(0.0f, 1.0f);
-        using C = typename PF_PixelTraits<P>::Channel;
-        auto channel = [](float v) { return static_cast<C>(v * PF_PixelTraits<P>::kMax); };
+struct Scene : bench::CardScene<P> {
+    using bench::CardScene<P>::scene;
+
+    Scene(bool best, int32_t casters)
+        : bench::CardScene<P>(kCards, kTextureSize, best, 11, &CardPlacement) {
         for (int32_t k = 0; k < kCards; ++k) {
-            auto texture = std::make_unique<PF_WorldX<P>>(kTextureSize, kTextureSize);
-            for (int32_t y = 0; y < kTextureSize; ++y) {
-                for (int32_t x = 0; x < kTextureSize; ++x)
-                    texture->At(x, y) = {channel(1), channel(unit(random)), channel(unit(random)),
-                                         channel(unit(random))};
-            }
             SY_LayerDesc& layer = scene.layers[k];
-            layer.placements.Allocate(1);
-            layer.placements[0] = CardPlacement(k);
-            layer.right = layer.bottom = kTextureSize;
-            layer.material.renderIndex = layer.material.depthIndex = k;
-            layer.material.bestQuality = best;
-            layer.material.engineFlag =
-                best ? SY_SamplingFilter::kBilinear : SY_SamplingFilter::kNearest;
             layer.material.castsShadows = k < casters;
             layer.material.acceptsShadows = kSY_AcceptsShadowsOn;
             layer.lightIds = {0, 1, 2};
-            fetcher.worlds[k] = texture.get();
-            textures.push_back(std::move(texture));
         }
         scene.lights.Allocate(3);
         const int32_t types[] = {kSY_LightAmbient, kSY_LightSpot, kSY_LightPoint};
@@ -122,30 +68,11 @@ struct Scene {
         for (SY_LightDesc& light : scene.lights)
             light.castsShadows = on;
     }
-
-    SY_SceneDesc scene;
-    Fetcher fetcher;
-    NoProgress progress;
-    std::vector<std::unique_ptr<PF_WorldX<P>>> textures;
 };
 
 // Pixels of each card, summed over the cards: each card drawn alone.
 double LitPixels() {
-    static const double lit = [] {
-        Scene<PF_Pixel8> one(false, kCards);
-        double sum = 0;
-        for (int32_t k = 0; k < kCards; ++k) {
-            for (int32_t j = 0; j < kCards; ++j)
-                one.scene.layers[j].material.opacity = j == k ? 1 : 0;
-            PF_WorldX<PF_Pixel8> frame(kWidth, kHeight);
-            SY_RenderFrame(one.scene, &one.fetcher, &one.progress, nullptr, false, &frame, nullptr);
-            for (int32_t y = 0; y < kHeight; ++y) {
-                for (int32_t x = 0; x < kWidth; ++x)
-                    sum += frame.At(x, y).alpha != 0;
-            }
-        }
-        return sum;
-    }();
+    static const double lit = Scene<PF_Pixel8>(false, kCards).CoveredPixels();
     return lit;
 }
 
