@@ -8,17 +8,12 @@
 #include <algorithm>
 #include <atomic>
 #include <cmath>
-#include <map>
 #include <memory>
-#include <random>
 #include <thread>
 #include <vector>
 
-#include "m_matrix.h"
-#include "pf_world.h"
+#include "card_scene.h"
 #include "renderer/frame/frame_driver.h"
-#include "renderer/scene/fetchers.h"
-#include "renderer/scene/scene_desc.h"
 
 #ifdef OSTREL_HAVE_OPENCV
 #include <opencv2/core.hpp>
@@ -27,28 +22,14 @@
 
 namespace {
 
-constexpr int32_t kWidth = 1920, kHeight = 1080;
+using bench::Identity;
+using bench::kDistance;
+using bench::kHeight;
+using bench::kWidth;
+
+// The cards stand between 30 and 600 in front of the plane z = 0, 30 apart, so they are
+// magnified by 1.015 to 1.43 and turned by 0.05 rad (±13 in depth).
 constexpr int32_t kCards = 20, kTextureSize = 512;
-// The camera sees the plane z = 0 at 1:1; the cards stand between 30 and 600 in front of it,
-// 30 apart, so they are magnified by 1.015 to 1.43 and turned by 0.05 rad (±13 in depth).
-constexpr double kDistance = 2000;
-
-class Fetcher : public SY_TTextureFetcher {
-public:
-    std::map<int32_t, PF_World*> worlds;
-    int32_t Fetch(int32_t index, bool, const double*, const M_LRect*, M_Matrix3*,
-                  PF_World** world) override {
-        *world = worlds[index];
-        return 0;
-    }
-    void Release(int32_t, PF_World*) override {}
-};
-
-class NoProgress : public SY_ProgressAbort {
-public:
-    void ReportRenderables(int32_t, int32_t) override {}
-    void ReportRows(int32_t, int32_t) override {}
-};
 
 // Items spread over every hardware thread, each thread with a stable index.
 struct AllThreads {
@@ -78,12 +59,6 @@ struct AllThreads {
     }
 };
 
-M_Matrix4 Identity() {
-    M_Matrix4 m;
-    M_IdentityMatrix4(&m);
-    return m;
-}
-
 // Card k: its centre shows at a point of a 5 × 4 grid over the frame, nearer cards first. The
 // cards are tilted by at most ±26 in depth at their corners; 60 apart they never cross, so the
 // frame measures layers drawn straight (crossing layers are measured by mbuffer_fan).
@@ -100,40 +75,11 @@ M_Matrix4 CardPlacement(int32_t k) {
 }
 
 template <class P>
-struct Scene {
-    explicit Scene(bool best) {
-        M_Matrix4 placement = Identity(), projection = Identity();
-        M_TranslateMatrix4(kWidth / 2.0, kHeight / 2.0, -kDistance, &placement);
-        projection.Project(kDistance);
-        M_TranslateMatrix4(kWidth / 2.0, kHeight / 2.0, 0, &projection);
-        scene.cameraPlacements.Allocate(1);
-        scene.cameraProjections.Allocate(1);
-        scene.cameraPlacements[0] = scene.framePlacement = placement;
-        scene.cameraProjections[0] = scene.frameProjection = projection;
-        scene.layers.Allocate(kCards);
-        std::mt19937 random(7);
-        using C = typename PF_PixelTraits<P>::Channel;
-        std::uniform_real_distribution<float> unit(0.0f, 1.0f);
-        auto channel = [&](float v) { return static_cast<C>(v * PF_PixelTraits<P>::kMax); };
-        for (int32_t k = 0; k < kCards; ++k) {
-            auto texture = std::make_unique<PF_WorldX<P>>(kTextureSize, kTextureSize);
-            for (int32_t y = 0; y < kTextureSize; ++y) {
-                for (int32_t x = 0; x < kTextureSize; ++x)
-                    texture->At(x, y) = {channel(1), channel(unit(random)), channel(unit(random)),
-                                         channel(unit(random))};
-            }
-            SY_LayerDesc& layer = scene.layers[k];
-            layer.placements.Allocate(1);
-            layer.placements[0] = CardPlacement(k);
-            layer.right = layer.bottom = kTextureSize;
-            layer.material.renderIndex = layer.material.depthIndex = k;
-            layer.material.bestQuality = best;
-            layer.material.engineFlag =
-                best ? SY_SamplingFilter::kBilinear : SY_SamplingFilter::kNearest;
-            fetcher.worlds[k] = texture.get();
-            textures.push_back(std::move(texture));
-        }
-    }
+struct Scene : bench::CardScene<P> {
+    using bench::CardScene<P>::scene;
+
+    explicit Scene(bool best)
+        : bench::CardScene<P>(kCards, kTextureSize, best, 7, &CardPlacement) {}
 
     // One ambient, one point and one spot light over the cards, all reaching every card.
     void Light() {
@@ -158,33 +104,14 @@ struct Scene {
     }
 
     void Render(PF_World* destination, bool threaded) {
-        SY_RenderFrame(scene, &fetcher, &progress, threaded ? AllThreads::Suite() : nullptr,
-                       threaded, destination, nullptr);
+        SY_RenderFrame(scene, &this->fetcher, &this->progress,
+                       threaded ? AllThreads::Suite() : nullptr, threaded, destination, nullptr);
     }
-
-    SY_SceneDesc scene;
-    Fetcher fetcher;
-    NoProgress progress;
-    std::vector<std::unique_ptr<PF_WorldX<P>>> textures;
 };
 
 // Pixels covered by each card, summed over the cards: each card drawn alone in draft.
 double CoveredPixels() {
-    static const double covered = [] {
-        Scene<PF_Pixel8> one(false);
-        double sum = 0;
-        for (int32_t k = 0; k < kCards; ++k) {
-            for (int32_t j = 0; j < kCards; ++j)
-                one.scene.layers[j].material.opacity = j == k ? 1 : 0;
-            PF_WorldX<PF_Pixel8> frame(kWidth, kHeight);
-            one.Render(&frame, false);
-            for (int32_t y = 0; y < kHeight; ++y) {
-                for (int32_t x = 0; x < kWidth; ++x)
-                    sum += frame.At(x, y).alpha != 0;
-            }
-        }
-        return sum;
-    }();
+    static const double covered = Scene<PF_Pixel8>(false).CoveredPixels();
     return covered;
 }
 

@@ -49,6 +49,8 @@ int main(int argc, char** argv) {
         ->check(CLI::Range(0, 256));
     renderCommand->add_flag("--stats", render.stats,
                             "Print the time spent inside and outside the plug-in");
+    renderCommand->add_flag("--keep-going", render.keepGoing,
+                            "Go on to the next frame when one fails; fail at the end");
     renderCommand->add_flag("--skip-existing", render.skipExisting,
                             "Leave out frames whose file is already there and reads whole");
 

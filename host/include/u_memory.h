@@ -45,6 +45,10 @@ int64_t U_AccountedBytes();
 using U_PurgeHandler = bool (*)();
 void U_SetPurgeHandler(U_PurgeHandler handler);
 
+// The most bytes the blocks of U_AllocatePtr, U_ResizePtr and U_PurgeLoop may hold at once; an
+// allocation beyond it fails as if the memory were not there. 0 (the default) sets no limit.
+void U_SetAllocationLimit(int64_t bytes);
+
 // Memory-pressure simulation for testing failure paths: the nth allocation from now
 // (1 = the next) through any of the services above fails; 0 turns it off.
 void U_FailAllocationAfter(int64_t n);

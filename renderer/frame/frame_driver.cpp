@@ -6,6 +6,7 @@
 #include <memory>
 
 #include "pf_draw.h"
+#include "renderer/frame/shadow_maps.h"
 #include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/depth_grouping.h"
@@ -123,6 +124,7 @@ void SY_RenderFrame(const SY_SceneDesc& scene, SY_TTextureFetcher* fetcher,
     SY_RenderContext context;
     SY_SetUpContext(&context, scene, fetcher, progress, iterateSuite, multiprocessing, destination);
     SY_PrepareLights(&context);
+    SY_BuildShadowMaps(&context);
     BuildRenderables(&context);
 
     // Pointers into the renderables are taken once the list has stopped growing.

@@ -5,6 +5,7 @@
 
 #include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
+#include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_render.h"
 #include "renderer/scene/render_context.h"
 #include "renderer/scene/render_target.h"
@@ -116,8 +117,18 @@ void DrawSimplePath(SY_RenderContext* context, const RowClosure& closure, int32_
 }
 
 // The simple path's blend record, from the material as the layer's shader takes it.
-SY_SpanBlend ImageBlend(const SY_Material& material) {
-    return {material.mode, material.opacity, SY_DepthOffset(material)};
+SY_SpanBlend ImageBlend(const SY_Material& material, const SY_Shader* shader) {
+    SY_SpanBlend blend{SY_DeliveredMode(material), material.opacity, SY_DepthOffset(material)};
+    blend.colorOnly = material.acceptsShadows == kSY_AcceptsShadowsOnly;
+    // Layers drawn from an image are not lit, but the shadows on them show.
+    const auto* layerShader =
+        shader && shader->IsFrameShader() ? static_cast<const SY_LayerShader*>(shader) : nullptr;
+    if (layerShader && material.acceptsShadows != kSY_AcceptsShadowsOff &&
+        std::any_of(layerShader->lights.begin(), layerShader->lights.end(),
+                    [](const SY_LightState* light) { return light->shadowMap != nullptr; })) {
+        blend.shadows = layerShader;
+    }
+    return blend;
 }
 
 }  // namespace
@@ -150,7 +161,7 @@ void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, 
                                &table,
                                &target,
                                context->scene->colorSettings,
-                               ImageBlend(material),
+                               ImageBlend(material, shader),
                                context->destination->width};
             if (simplePath)
                 DrawSimplePath(context, closure, fieldMode);

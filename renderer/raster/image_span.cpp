@@ -3,7 +3,9 @@
 #include <algorithm>
 
 #include "pf_bit_depth.h"
+#include "renderer/raster/shader.h"
 #include "renderer/raster/span_deliveries.h"
+#include "renderer/raster/span_routine.h"
 #include "renderer/raster/span_state.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_report.h"
@@ -21,11 +23,36 @@ struct ImageSpan {
 // Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
 // key is the smallest value W takes over the pixel square, from its top-left corner, as for
 // the layer's textured spans.
+// The pixel of the image as the layer shows it: white for a layer that shows only shadows,
+// darkened by the shadows on its plane at output pixel (x, y) whose plane W is w.
+template <class P>
+P Shown(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, P pixel, int32_t x, int32_t y,
+        double w) {
+    if (blend.colorOnly) {
+        constexpr auto kMax =
+            static_cast<typename PF_PixelTraits<P>::Channel>(PF_PixelTraits<P>::kMax);
+        pixel.red = pixel.green = pixel.blue = kMax;
+    }
+    if (blend.shadows) {
+        const auto& e = layer.eyeRay.mat;
+        double invW = layer.perspective ? 1.0 / w : 1.0;
+        double point[3];
+        for (int k = 0; k < 3; ++k)
+            point[k] = (e[0][k] * (x + 0.5) + e[1][k] * (y + 0.5) + e[2][k]) * invW;
+        SY_Lighting light;
+        blend.shadows->ShadowOnePixel(point, layer.normal, &light);
+        sy_span::ApplyLighting(light, &pixel);
+    }
+    return pixel;
+}
+
 template <class P, class Delivery>
-void DrawFromImage(const SY_SpanBlend& blend, const PF_World& image, const ImageSpan& span,
+void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, const ImageSpan& span,
                    const P* matte, int32_t y, Delivery& delivery, int32_t thread) {
     using namespace sy_span;
+    const PF_World& image = *layer.texture;
     const P* source = image.PixelAt<P>(span.x, y);
+    const bool changed = blend.colorOnly || blend.shadows;
     const SY_SpanMapping& m = span.depth;
     const double offset = m.low - 0.5 * (m.dwdx + m.dwdy) + blend.depthOffset;
     const SY_Coverage<P> layerCoverage = LayerCoverage<P>(blend.opacity);
@@ -37,7 +64,12 @@ void DrawFromImage(const SY_SpanBlend& blend, const PF_World& image, const Image
         if constexpr (Delivery::kUsesDepth) depth.depth = static_cast<float>(w + offset);
         SY_Coverage<P> coverage =
             matte ? MatteCoverage<P>(matte[i].alpha, layerCoverage) : layerCoverage;
-        delivery.Deliver(span.x + i, source[i], coverage, depth, thread);
+        if (changed) {
+            delivery.Deliver(span.x + i, Shown(blend, layer, source[i], span.x + i, y, w), coverage,
+                             depth, thread);
+        } else {
+            delivery.Deliver(span.x + i, source[i], coverage, depth, thread);
+        }
     }
 }
 
@@ -48,7 +80,7 @@ void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
                  int32_t thread) {
     const P* matte = matteWorld ? matteWorld->PixelAt<P>(span.x, y) : nullptr;
     auto draw = [&](auto delivery) {
-        DrawFromImage(blend, *layer.texture, span, matte, y, delivery, thread);
+        DrawFromImage(blend, layer, span, matte, y, delivery, thread);
     };
     target.Visit(
         [&](PF_World* world) {

@@ -10,12 +10,17 @@
 #include "renderer/scene/render_target.h"
 
 class SY_ScreenGeometry;
+class SY_LayerShader;
 
 // How the image is put into the frame.
 struct SY_SpanBlend {
-    uint8_t mode = 2;       // transfer mode, keep-alpha in bit 7
-    double opacity = 1;     // 0..1
-    float depthOffset = 0;  // added to every depth key, as for the layer's textured spans
+    uint8_t mode = 2;        // transfer mode, keep-alpha in bit 7
+    double opacity = 1;      // 0..1
+    float depthOffset = 0;   // added to every depth key, as for the layer's textured spans
+    bool colorOnly = false;  // shadows only: the colour becomes white, its alpha kept
+    // Darkens each pixel by the shadows that fall on the layer's plane there (the geometry's
+    // eye ray must be set); null: no shadow falls on it.
+    const SY_LayerShader* shadows = nullptr;
 };
 
 // Draws count pixels of row y from x on from the geometry's texture, an image in output

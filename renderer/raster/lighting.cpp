@@ -208,8 +208,8 @@ struct PixelLighting {
             diffuse[c] = L::SelectSingle(active, diffuse[c] * a[c], diffuse[c]);
     }
 
-    void Run() {
-        if (shader.material.acceptsLights) {
+    void Run(bool shadowsOnly) {
+        if (shader.material.acceptsLights && !shadowsOnly) {
             Lit();
         } else {
             ShadowOnly();
@@ -219,14 +219,14 @@ struct PixelLighting {
 
 template <class L>
 void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
-           SY_Lighting* const out[L::kCount]) {
+           SY_Lighting* const out[L::kCount], bool shadowsOnly = false) {
     PixelLighting<L> lighting{shader, {}, {}, {}, {}};
     for (int k = 0; k < 3; ++k) {
         // Without the need the span routine does not work out the points.
         lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);
         lighting.n[k] = L::Splat(n[k]);
     }
-    lighting.Run();
+    lighting.Run(shadowsOnly);
     lighting.Store(out);
 }
 
@@ -243,4 +243,10 @@ void SY_LayerShader::LightTwoPixels(const double p1[3], const double p2[3], cons
     const double* const points[2] = {p1, p2};
     SY_Lighting* const outs[2] = {out1, out2};
     Light<SY_TwoLanes>(*this, points, n, outs);
+}
+
+void SY_LayerShader::ShadowOnePixel(const double p[3], const double n[3], SY_Lighting* out) const {
+    const double* const points[1] = {p};
+    SY_Lighting* const outs[1] = {out};
+    Light<SY_OneLane>(*this, points, n, outs, true);
 }

@@ -23,6 +23,41 @@ public:
     virtual bool IsFrameShader() const { return true; }
 };
 
+// The shader of a layer drawn into a light's shadow map: each covered texel becomes an occluder
+// that lets through what the layer's colour, alpha, opacity and light transmission let through.
+// A diffused light draws the layer at several blur levels, each placed farther behind the layer
+// the more it is blurred, so a shadow sharpens where it meets its caster and softens away from it.
+class SY_ShadowShader : public SY_Shader {
+public:
+    static constexpr int32_t kMaxLevels = 11;
+
+    // diffusion: the light's blur in map texels; perspective: the map is a face of a spot or
+    // point light, whose depth is the inverse of the distance, rather than a parallel light's.
+    SY_ShadowShader(const SY_Material& material, double diffusion, bool perspective);
+
+    int32_t ShadowBlurRadius() const override;
+    bool IsFrameShader() const override { return false; }
+
+    // The depth key of blur level `level` for a layer point at map depth w (larger is nearer).
+    float DepthKey(double w, int32_t level) const {
+        if (!soft) return static_cast<float>(w);
+        return static_cast<float>(perspective ? w / (1.0 + ratio[level])
+                                              : w - ratio[level] * diffusion);
+    }
+
+    uint16_t layerId = 0;
+    uint16_t opacity = 32768;   // 0..32768
+    uint16_t transmission = 0;  // share of the layer's colour the light keeps, 0..32768
+    double diffusion = 0;
+    bool soft = false;
+    bool perspective = true;
+    int32_t levelCount = 1;
+    float radius[kMaxLevels] = {};  // blur radius of each level, in map texels
+    // How far behind the layer a level lies, relative to the layer's distance from the light
+    // (or to the diffusion, for a parallel light): radius / (diffusion − radius).
+    float ratio[kMaxLevels] = {};
+};
+
 // Per-channel lighting of one pixel: texel × diffuse + specular × channel maximum.
 struct SY_RenderContext;
 class SY_TRLayer;
@@ -45,6 +80,9 @@ public:
     // LightOnePixel. Span routines pair pixels through it when U_G_CPU_DataP()->hasVectorUnits.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2) const;
+    // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
+    // for layers drawn from an image, which are not lit.
+    void ShadowOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
 
     uint16_t layerId = 0;  // passed to every shadow lookup
     // The layer's material. A shader made by hand starts with no light terms and takes no

@@ -7,8 +7,15 @@
 #include "pf_pixel.h"
 #include "pf_xfer.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/mbuffer/record_apply.h"
 #include "renderer/raster/span_render.h"
 #include "renderer/raster/span_routine.h"
+
+// The mode byte a layer's pixels are delivered with: a layer that shows only the shadows on it
+// catches them with kSY_ShadowCatchMode, whatever its own mode.
+inline uint8_t SY_DeliveredMode(const SY_Material& material) {
+    return material.acceptsShadows == kSY_AcceptsShadowsOnly ? kSY_ShadowCatchMode : material.mode;
+}
 
 // Kind 1: blended into the row of the world with the layer's transfer mode; with bit 7 of the
 // mode byte the destination keeps its alpha. Normal mode without linear blending replaces the
@@ -21,9 +28,12 @@ struct SY_CompositeDelivery {
 
     SY_CompositeDelivery(P* destinationRow, uint8_t mode, const PF_LinearBlendingTables* blending)
         : row(destinationRow),
-          blend(PF_Get_Xfer1_Opacity<P>(mode & 127)),
+          // A layer that catches shadows blends by SY_CatchShadow; the host has no such mode.
+          blend(PF_Get_Xfer1_Opacity<P>((mode & 127) == kSY_ShadowCatchMode ? kPF_XferMultiply
+                                                                            : mode & 127)),
           tables(blending),
           keepAlpha((mode & 128) != 0),
+          catchesShadows((mode & 127) == kSY_ShadowCatchMode),
           opaqueReplaces((mode & 127) == kPF_XferNormal && !blending && !keepAlpha) {}
 
     void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth&,
@@ -31,6 +41,9 @@ struct SY_CompositeDelivery {
         P* destination = row + x;
         if (opaqueReplaces && coverage == kFull && pixel.alpha == kFull) {
             *destination = pixel;
+        } else if (catchesShadows) {
+            SY_CatchShadow(pixel, static_cast<float>(coverage) / PF_PixelTraits<P>::kMax,
+                           destination);
         } else if (keepAlpha) {
             auto alpha = destination->alpha;
             blend(&pixel, tables, coverage, destination);
@@ -44,6 +57,7 @@ struct SY_CompositeDelivery {
     PF_Xfer1OpacityFunc<P> blend;
     const PF_LinearBlendingTables* tables;
     bool keepAlpha;
+    bool catchesShadows;  // kSY_ShadowCatchMode
     bool opaqueReplaces;
 };
 

@@ -2,8 +2,10 @@
 
 #include "pf_bit_depth.h"
 #include "renderer/mbuffer/mbuffer.h"
+#include "renderer/raster/shadow_span.h"
 #include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_routine.h"
+#include "renderer/raster/span_start.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_cpu.h"
 #include "u_report.h"
@@ -21,13 +23,6 @@ SY_SpanRayState RayAt(const SY_ScreenGeometry& geometry, double x, double y) {
     return ray;
 }
 
-void StartTexture(const SY_ScreenGeometry& geometry, SY_SpanTexture* texture) {
-    texture->world = geometry.texture;
-    texture->samplingFilter = geometry.samplingFilter;
-    texture->sampling.src = geometry.texture;
-    texture->perspective = geometry.perspective;
-}
-
 template <class P, class State>
 void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, const P* matte,
              int32_t x, int32_t count, int32_t y, const PF_LinearBlendingTables* tables,
@@ -38,12 +33,13 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
     };
     target.Visit(
         [&](PF_World* world) {
-            draw(SY_CompositeDelivery<P>(world->Row<P>(y), shader.material.mode, tables));
+            draw(SY_CompositeDelivery<P>(world->Row<P>(y), SY_DeliveredMode(shader.material),
+                                         tables));
         },
         [&](SY_MBuffer* buffer) {
             if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
             draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                             shader.material.mode));
+                                             SY_DeliveredMode(shader.material)));
         },
         [&](const SY_SpanImageRecord& record) {
             draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});
@@ -56,30 +52,11 @@ void RenderAtDepth(const SY_ScreenGeometry& geometry, const SY_LayerShader& shad
                    const PF_World* matteWorld, int32_t x, int32_t count, int32_t y,
                    const PF_LinearBlendingTables* tables, const SY_RenderTarget& target,
                    int32_t thread) {
-    double cx = x + 0.5, cy = y + 0.5;
-    SY_SpanRayState ray = RayAt(geometry, cx, cy);
+    SY_SpanRayState ray = RayAt(geometry, x + 0.5, y + 0.5);
     const P* matte = matteWorld ? matteWorld->PixelAt<P>(x, y) : nullptr;
-    int32_t matrices = geometry.screenToTexture.Count();
-    if (matrices == 1) {
-        SY_SpanSampleState<P> state;
-        StartTexture(geometry, &state.texture);
-        state.mapping.Start(geometry.screenToTexture[0], cx, cy, geometry.perspective, 1.0f);
+    SY_WithSpanState<P>(geometry, x, y, [&](auto& state) {
         Deliver(shader, state, ray, matte, x, count, y, tables, target, thread);
-        return;
-    }
-    SY_SpanSubsampleState<P> state;
-    StartTexture(geometry, &state.texture);
-    state.count = matrices;
-    state.first = geometry.firstValid;
-    state.last = geometry.lastValid;
-    for (int32_t i = state.first; i <= state.last; ++i) {
-        const M_Matrix3& m = geometry.screenToTexture[i];
-        if (m.IsZeroWithinEpsilon(0.0))
-            state.mappings[i].StartAbsent();
-        else
-            state.mappings[i].Start(m, cx, cy, geometry.perspective, 0.5f);
-    }
-    Deliver(shader, state, ray, matte, x, count, y, tables, target, thread);
+    });
 }
 
 }  // namespace
@@ -88,7 +65,21 @@ void SY_RenderLayerSpan_SwitchDepth(const SY_ScreenGeometry& geometry, const SY_
                                     const PF_World* matte, int32_t x, int32_t count, int32_t y,
                                     const PF_LinearBlendingTables* tables,
                                     const SY_RenderTarget& target, int32_t thread) {
-    if (count <= 0 || target.mode() == kSY_TargetShadowArray) return;
+    if (count <= 0) return;
+    if (target.mode() == kSY_TargetShadowArray) {
+        // Occluders take the texture at whatever depth it comes; the map has none of its own.
+        SY_ShadowFragmentArray* occluders = target.Visit(
+            [](PF_World*) -> SY_ShadowFragmentArray* { return nullptr; },
+            [](SY_MBuffer*) -> SY_ShadowFragmentArray* { return nullptr; },
+            [](const SY_SpanImageRecord&) -> SY_ShadowFragmentArray* { return nullptr; },
+            [](SY_ShadowFragmentArray* array) { return array; });
+        // Only the shadow shader draws occluders; a frame's layer shader has none to give.
+        if (!shader->IsFrameShader()) {
+            SY_RenderShadowSpan(geometry, static_cast<const SY_ShadowShader&>(*shader), x, count, y,
+                                occluders, thread);
+        }
+        return;
+    }
     // A texture of another depth than the target's is refused as an unknown depth is.
     int16_t depth = SY_TargetBitDepth(target);
     if (geometry.texture->GetBitDepth() != depth) depth = 0;

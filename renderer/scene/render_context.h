@@ -13,6 +13,7 @@
 #include "renderer/scene/renderable_list.h"
 #include "renderer/scene/scene_desc.h"
 #include "renderer/scene/specular_table.h"
+#include "renderer/scene/sum_table_cache.h"
 
 struct SY_RenderContext {
     const SY_SceneDesc* scene = nullptr;
@@ -32,6 +33,8 @@ struct SY_RenderContext {
     int32_t renderableCount = 0;
     int32_t renderablesDone = 0;
     SY_SpecularTables specularTables;
+    // Caster textures' sums while shadow maps are built; a cache, so filled through const.
+    mutable SY_SumTableCache shadowSums;
 };
 
 // Context set-up: stores the frame's objects, prepares the threads, and validates the camera

@@ -5,6 +5,7 @@
 #include <cstdint>
 
 #include "m_matrix.h"
+#include "pf_tables.h"
 #include "pf_world.h"
 #include "renderer/scene/fetchers.h"
 #include "renderer/scene/owned_array.h"
@@ -31,7 +32,8 @@ public:
 
     // Builds the geometry of a renderable's subsamples under the camera matrices. The geometry
     // stays empty (no texture) when the host delivers none. Throws failing matrix operations,
-    // fetch results, and the zero-length code for a layer without a usable normal.
+    // fetch results, the zero-length code for a layer without a usable normal, and 4 when the
+    // summed-area table of a blurred layer finds no memory.
     void Build(const SY_RenderContext& context, const SY_TRLayer& renderable,
                const M_Matrix4* cameraMatrices, int32_t cameraCount, const SY_GeometryFlags& flags);
 
@@ -40,6 +42,9 @@ public:
     SY_TTextureFetcher* textureFetcher = nullptr;
     int32_t renderIndex = 0;
     PF_World* texture = nullptr;
+    // Sums over the texture for the box averages of a blurred shadow caster, kept by the
+    // render context; null otherwise.
+    const PF_SummedAreaTable* sumTable = nullptr;
     // Per subsample: U = m0·x + m3·y + m6, V = m1·x + m4·y + m7, W = m2·x + m5·y + m8 for the
     // screen point (x, y); the texture position is (U/W, V/W) under perspective and (U, V)
     // otherwise, and a larger W is nearer. All zero for a subsample that is not valid.

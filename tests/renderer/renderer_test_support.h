@@ -79,7 +79,9 @@ inline M_Matrix4 Turned(double cx, double cy, double rx, double ry, double x, do
     return m;
 }
 
-inline void SetPlacements(SY_LayerDesc* layer, std::initializer_list<M_Matrix4> placements) {
+// Placements of a layer or a light.
+template <class Record>
+void SetPlacements(Record* layer, std::initializer_list<M_Matrix4> placements) {
     layer->placements.Allocate(static_cast<int32_t>(placements.size()));
     int32_t i = 0;
     for (const M_Matrix4& m : placements)

@@ -1,6 +1,7 @@
 #include "cli/arguments.h"
 
 #include <charconv>
+#include <cmath>
 #include <stdexcept>
 #include <vector>
 
@@ -71,6 +72,40 @@ M_LRect ParseRegion(const std::string& text) {
                                     " is not a region like LEFT,TOP,RIGHT,BOTTOM in pixels");
     }
     return {v[0], v[1], v[2], v[3]};
+}
+
+int64_t ParseMemorySize(const std::string& text) {
+    size_t digits = 0;
+    double number = 0;
+    try {
+        number = std::stod(text, &digits);
+    } catch (const std::logic_error&) {
+        digits = 0;
+    }
+    std::string unit = text.substr(digits);
+    const std::string kUnits = "KMGT";
+    size_t power = unit.empty() ? 0 : kUnits.find(unit) + 1;
+    double bytes = number * std::pow(1024.0, static_cast<double>(power));
+    if (!digits || (!unit.empty() && (unit.size() != 1 || power == 0)) || !(bytes >= 1 << 20) ||
+        bytes > 1e18) {
+        throw std::invalid_argument(QuoteUserText(text) +
+                                    " is not a size of memory like 512M or 8G (at least 1M)");
+    }
+    return static_cast<int64_t>(bytes);
+}
+
+std::string FrameList(const std::vector<int32_t>& frames) {
+    std::string text;
+    for (size_t i = 0; i < frames.size();) {
+        size_t j = i;
+        while (j + 1 < frames.size() && frames[j + 1] == frames[j] + 1)
+            ++j;
+        if (!text.empty()) text += ", ";
+        text += std::to_string(frames[i]);
+        if (j > i) text.append("-").append(std::to_string(frames[j]));
+        i = j + 1;
+    }
+    return text;
 }
 
 }  // namespace ostrel

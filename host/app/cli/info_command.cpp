@@ -1,7 +1,10 @@
 #include "cli/info_command.h"
 
+#include <algorithm>
 #include <iomanip>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "cli/artisan_instance.h"
 #include "composition/render_order.h"
@@ -60,6 +63,40 @@ std::string Quoted(const std::string& name) {
     return "\"" + name + "\"";
 }
 
+// Whether the light builds shadow maps at the frame and how large, by the renderer's rule: a
+// light that casts at a darkness above 0, when some layer casts and some accepts shadows; the
+// side is the chosen size ("Comp Size": the larger of 400 and the output's larger side), a
+// third of it when no receiver is at best quality, at least 64; a spot wider than 80° takes
+// five faces and a point light six.
+std::string ShadowMaps(const Composition& comp, const Layer& light, double seconds,
+                       const std::vector<int32_t>& order) {
+    if (!light.light.castsShadows) return "";
+    if (light.light.shadowDarkness.ValueAt(seconds) == 0) return ", casts shadows of darkness 0";
+    bool casts = false, accepts = false, bestReceiver = false;
+    for (int32_t index : order) {
+        const Layer& layer = comp.layers[static_cast<size_t>(index)];
+        if (layer.quality == Quality::kWireframe) continue;
+        casts = casts || layer.material.castsShadows != ShadowMode::kOff;
+        bool receives = layer.material.acceptsShadows != ShadowMode::kOff;
+        accepts = accepts || receives;
+        bestReceiver = bestReceiver || (receives && layer.quality == Quality::kBest);
+    }
+    if (!casts) return ", casts shadows but no layer casts any";
+    if (!accepts) return ", casts shadows but no layer accepts any";
+    int32_t faces = 1;
+    if (light.light.type == LightType::kPoint) faces = 6;
+    if (light.light.type == LightType::kSpot && light.light.coneAngle.ValueAt(seconds) > 80)
+        faces = 5;
+    std::string count = faces == 1 ? "a map" : std::to_string(faces) + " maps";
+    std::optional<int32_t> choice = ShadowMapSizeChoice(comp.rendererOptions);
+    int32_t chosen = choice ? kShadowMapSizes[static_cast<size_t>(*choice)] : 0;
+    int32_t side = chosen != 0 ? chosen : std::max({400, comp.width, comp.height});
+    if (!bestReceiver) side /= 3;
+    side = std::max(side, 64);
+    return ", casts shadows: " + count + " of " + std::to_string(side) + " x " +
+           std::to_string(side);
+}
+
 }  // namespace
 
 void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
@@ -92,13 +129,13 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
             << '\n';
     }
 
+    std::vector<int32_t> order = RenderOrder(comp, seconds);
     out << "  lights      ";
     bool anyLight = false;
     for (const Layer& layer : comp.layers) {
         if (layer.kind != LayerKind::kLight || !layer.IsActiveAt(seconds)) continue;
         out << (anyLight ? ", " : " ") << Quoted(layer.name) << " ("
-            << LightTypeName(layer.light.type)
-            << (layer.light.castsShadows ? ", casts shadows" : "") << ')';
+            << LightTypeName(layer.light.type) << ShadowMaps(comp, layer, seconds, order) << ')';
         anyLight = true;
     }
     if (!comp.lightsAndDepthOfField) {
@@ -114,8 +151,6 @@ void PrintInfo(const Composition& comp, int32_t frame, std::ostream& out) {
             : *choice > 0 ? ShadowMapSizeText(*choice) + " pixels"
                           : ShadowMapSizeText(0))
         << '\n';
-
-    std::vector<int32_t> order = RenderOrder(comp, seconds);
     out << "  layers rendered at frame " << frame << ", in render order:\n";
     if (order.empty()) out << "    none\n";
     for (size_t i = 0; i < order.size(); ++i) {

@@ -58,6 +58,11 @@ void AddRenderArguments(CLI::App& command, RenderArguments& arguments) {
         ->check(kNonEmpty);
     command.add_flag("--background", arguments.background,
                      "Composite the frames over the comp's background colour");
+    command
+        .add_option("--max-memory", arguments.maxMemory,
+                    "The most memory the frame's buffers may hold, such as 8G or 512M "
+                    "(default: three quarters of the machine's)")
+        ->check(kNonEmpty);
 }
 
 void ApplyRenderArguments(const RenderArguments& arguments, RenderOptions& options) {
@@ -81,6 +86,10 @@ void ApplyRenderArguments(const RenderArguments& arguments, RenderOptions& optio
     options.multiprocessing = arguments.multiprocessing == "on";
     options.pluginFolders.assign(arguments.pluginFolders.begin(), arguments.pluginFolders.end());
     options.background = arguments.background;
+    if (!arguments.maxMemory.empty()) {
+        options.maxMemory =
+            Option("--max-memory", [&] { return ParseMemorySize(arguments.maxMemory); });
+    }
 }
 
 }  // namespace ostrel

@@ -25,10 +25,11 @@ struct RenderArguments {
     std::string multiprocessing = "on";
     std::vector<std::string> pluginFolders;
     bool background = false;
+    std::string maxMemory;
 };
 
 // COMP, -o, --frames, --depth, --downsample, --fields, --region, --multiprocessing, --plugins,
-// --background.
+// --background, --max-memory.
 void AddRenderArguments(CLI::App& command, RenderArguments& arguments);
 
 // Sets the options the arguments give. Throws HostError naming the option that is wrong.

@@ -3,6 +3,7 @@
 #include <chrono>
 #include <cstdio>
 #include <filesystem>
+#include <iostream>
 #include <optional>
 #include <sstream>
 #include <stdexcept>
@@ -13,12 +14,14 @@
 #include "composition/composition_loader.h"
 #include "composition/image_file.h"
 #include "host_error.h"
+#include "memory_size.h"
 #include "output/background.h"
 #include "output/frame_writer.h"
 #include "qngp_suites.h"
 #include "session/frame_suites.h"
 #include "suites/iterate_suite.h"
 #include "suites/persistent_data_suite.h"
+#include "u_memory.h"
 #include "u_report.h"
 
 namespace ostrel {
@@ -74,7 +77,7 @@ auto Checked(const Composition& comp, const std::string& option, Parse&& parse) 
 }
 
 std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_t frame,
-                         int32_t code, const std::string& hostFailure) {
+                         int32_t code, const std::string& hostFailure, int64_t memoryLimit) {
     std::string where = comp.file.string() + ": frame " + std::to_string(frame) + ": ";
     if (code == kQNGP_ErrUserCancel) return where + "interrupted";
     if (!hostFailure.empty()) return hostFailure + " (frame " + std::to_string(frame) + ")";
@@ -82,9 +85,21 @@ std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_
     text << where << "the renderer \"" << artisan.displayName << "\" failed with error " << code
          << " (0x" << std::hex << code << ")";
     if (code == kU_ErrUnexpectedBitDepth) text << ": pixels of a depth other than 8, 16 or 32 bits";
-    if (code == kU_ErrOutOfMemory) text << ": out of memory";
+    if (code == kU_ErrOutOfMemory) {
+        text << ": out of memory; the frame's buffers may hold at most "
+             << SizeText(static_cast<double>(memoryLimit)) << " (--max-memory)";
+    }
     return text.str();
 }
+
+// The most the frame's buffers may hold, for this run only.
+class AllocationLimit {
+public:
+    explicit AllocationLimit(int64_t bytes) { U_SetAllocationLimit(bytes); }
+    ~AllocationLimit() { U_SetAllocationLimit(0); }
+    AllocationLimit(const AllocationLimit&) = delete;
+    AllocationLimit& operator=(const AllocationLimit&) = delete;
+};
 
 void MakeOutputFolder(const std::filesystem::path& file) {
     std::filesystem::path folder = file.parent_path();
@@ -142,6 +157,10 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
 
     SetApplicationSetting("Tessary 3D", "Enable Multiprocessing", options.multiprocessing ? 1 : 0);
     SetIterateThreads(options.threads);
+    // Three quarters of the machine leaves room for the program, its images and the system.
+    const int64_t memoryLimit =
+        options.maxMemory ? options.maxMemory : static_cast<int64_t>(PhysicalMemoryBytes() / 4 * 3);
+    AllocationLimit limit(memoryLimit);
     HostSuites suites;
     PluginHost plugins;
     std::vector<std::filesystem::path> folders = options.pluginFolders;
@@ -172,6 +191,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         }
     };
     std::optional<std::filesystem::path> cleanedFolder;  // of stale temporaries
+    std::vector<int32_t> failed;                         // with --keep-going
     for (int32_t frame : frames) {
         if (Interrupted()) {
             throw HostError(comp.file.string() + ": frame " + std::to_string(frame) +
@@ -188,7 +208,19 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             Clock::time_point entry = Clock::now();
             int32_t code = instance.Render(session);
             times.entry += Seconds(Clock::now() - entry);
-            if (code) throw HostError(FrameFailure(comp, artisan, frame, code, session.Failure()));
+            if (code) {
+                std::string failure =
+                    FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit);
+                if (!options.keepGoing || code == kQNGP_ErrUserCancel) throw HostError(failure);
+                progress.Clear();
+                std::cerr << "ostrel: " << failure << '\n';
+                failed.push_back(frame);
+                break;
+            }
+        }
+        if (!failed.empty() && failed.back() == frame) {
+            progress.EndFrame();
+            continue;
         }
         times.pixels = static_cast<double>(session.PixelDeliveryNanoseconds()) * 1e-9;
         if (options.background || comp.renderBackground)
@@ -216,6 +248,10 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
     all.output += Seconds(Clock::now() - lastWrite);
     if (inFlight) report(*inFlight);
     progress.Clear();
+    if (!failed.empty()) {
+        throw HostError(comp.file.string() + ": " + std::to_string(failed.size()) + " of " +
+                        std::to_string(frameCount) + " frames failed: " + FrameList(failed));
+    }
     // The bar is gone: one line says what became of the run. A log of a resumed run needs
     // it too, for the frames it left out.
     if (options.terminal || options.skipExisting) {

@@ -26,6 +26,8 @@ struct RenderOptions {
     bool stats = false;
     bool background = false;    // frames over the comp's background colour, whatever it says
     bool skipExisting = false;  // leave out frames whose file is there and decodes whole
+    bool keepGoing = false;     // a frame that fails is reported and the next one rendered
+    int64_t maxMemory = 0;      // bytes the frame's buffers may hold; 0: a share of the machine's
     bool terminal = false;      // draw a progress bar instead of a line per frame
 };
 

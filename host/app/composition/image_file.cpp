@@ -1,16 +1,15 @@
 #include "composition/image_file.h"
 
 #include <OpenImageIO/imageio.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <fstream>
 #include <string>
 
 #include "composition/composition_error.h"
 #include "composition/library_console.h"
+#include "memory_size.h"
 
 namespace ostrel {
 namespace {
@@ -26,12 +25,6 @@ std::string OneLine(std::string words) {
     for (size_t at; (at = words.find('\n')) != std::string::npos;)
         words.replace(at, 1, "; ");
     return words;
-}
-
-std::string Gigabytes(double bytes) {
-    char text[32];
-    std::snprintf(text, sizeof text, "%.1f GB", bytes / 1e9);
-    return text;
 }
 
 // A PNG cut short makes the PNG reader leave its error text behind in memory, so the chunks are
@@ -66,13 +59,12 @@ void CheckPngChunks(const std::filesystem::path& file) {
 void CheckDecodedSize(const std::filesystem::path& file, const OIIO::ImageSpec& layout) {
     double needed = static_cast<double>(layout.width) * layout.height *
                     (4.0 * std::max(layout.nchannels, 0) + 16.0);
-    double memory =
-        static_cast<double>(sysconf(_SC_PHYS_PAGES)) * static_cast<double>(sysconf(_SC_PAGESIZE));
+    auto memory = static_cast<double>(PhysicalMemoryBytes());
     if (needed > memory) {
         Fail(file, "the image is " + std::to_string(layout.width) + " × " +
                        std::to_string(layout.height) + " pixels of " +
                        std::to_string(layout.nchannels) + " channels; decoding it needs " +
-                       Gigabytes(needed) + ", more than this machine's " + Gigabytes(memory) +
+                       SizeText(needed) + ", more than this machine's " + SizeText(memory) +
                        " of memory");
     }
 }

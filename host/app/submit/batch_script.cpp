@@ -58,7 +58,7 @@ std::string BatchScript(const BatchJob& job) {
            << "exec";
     for (const std::string& word : job.render)
         script << ' ' << ShellQuoted(word);
-    script << " --skip-existing --threads \"${SLURM_CPUS_PER_TASK:-1}\" \\\n"
+    script << " --skip-existing --keep-going --threads \"${SLURM_CPUS_PER_TASK:-1}\" \\\n"
            << "    --frames \"${chunks[$SLURM_ARRAY_TASK_ID]}\"\n";
     return script.str();
 }

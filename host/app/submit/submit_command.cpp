@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "cli/arguments.h"
 #include "cli/artisan_instance.h"
 #include "composition/composition_error.h"
 #include "host_error.h"
@@ -64,23 +65,10 @@ std::vector<std::string> RenderCommand(const SubmitOptions& options, const Rende
     add("--fields", given.fields, "off");
     add("--multiprocessing", given.multiprocessing, "on");
     if (given.background) command.push_back("--background");
+    add("--max-memory", given.maxMemory, "");
     for (const fs::path& folder : pluginFolders)
         add("--plugins", folder.string(), "");
     return command;
-}
-
-// Frames as ranges: 3, 4, 5, 9 → "3-5, 9".
-std::string FrameList(const std::vector<int32_t>& frames) {
-    std::string text;
-    for (size_t i = 0; i < frames.size();) {
-        size_t j = i;
-        while (j + 1 < frames.size() && frames[j + 1] == frames[j] + 1)
-            ++j;
-        text += (text.empty() ? "" : ", ") + std::to_string(frames[i]) +
-                (j > i ? "-" + std::to_string(frames[j]) : "");
-        i = j + 1;
-    }
-    return text;
 }
 
 // After the job: each task whose frames are not all there and whole, with its log.

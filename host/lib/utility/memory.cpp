@@ -3,6 +3,7 @@
 #include "block_cache.h"
 
 #include <atomic>
+#include <cstdint>
 #include <cstring>
 #include <new>
 
@@ -14,6 +15,8 @@ struct alignas(16) BlockHeader {
 };
 
 std::atomic<int64_t> gAccountedBytes{0};
+std::atomic<int64_t> gHeldBytes{0};   // in blocks handed out, headers included
+std::atomic<int64_t> gLimitBytes{0};  // 0: none
 std::atomic<int64_t> gFailCountdown{0};
 std::atomic<U_PurgeHandler> gPurgeHandler{nullptr};
 
@@ -25,6 +28,16 @@ bool SimulatedFailure() {
     return false;
 }
 
+// Counts bytes as held, unless that would pass the limit.
+bool Hold(int64_t bytes) {
+    int64_t limit = gLimitBytes.load(std::memory_order_relaxed);
+    int64_t held = gHeldBytes.load(std::memory_order_relaxed);
+    do {
+        if (limit > 0 && held + bytes > limit) return false;
+    } while (!gHeldBytes.compare_exchange_weak(held, held + bytes, std::memory_order_relaxed));
+    return true;
+}
+
 void* HeaderOf(void* block) {
     return static_cast<BlockHeader*>(block) - 1;
 }
@@ -32,9 +45,14 @@ void* HeaderOf(void* block) {
 }  // namespace
 
 void* U_AllocatePtr(uint32_t, const char*, size_t bytes) {
-    if (SimulatedFailure() || bytes > SIZE_MAX - sizeof(BlockHeader)) return nullptr;
-    auto* header = static_cast<BlockHeader*>(u_memory::TakeRawBlock(sizeof(BlockHeader) + bytes));
-    if (!header) return nullptr;
+    if (SimulatedFailure() || bytes > INT64_MAX / 2) return nullptr;
+    const size_t whole = sizeof(BlockHeader) + bytes;
+    if (!Hold(static_cast<int64_t>(whole))) return nullptr;
+    auto* header = static_cast<BlockHeader*>(u_memory::TakeRawBlock(whole));
+    if (!header) {
+        gHeldBytes.fetch_sub(static_cast<int64_t>(whole), std::memory_order_relaxed);
+        return nullptr;
+    }
     header->bytes = bytes;
     return header + 1;
 }
@@ -55,7 +73,9 @@ int32_t U_ResizePtr(uint32_t tag, size_t bytes, const char* name, void** address
 void U_FreePtr(void* block) {
     if (!block) return;
     auto* header = static_cast<BlockHeader*>(HeaderOf(block));
-    u_memory::GiveBackRawBlock(header, sizeof(BlockHeader) + header->bytes);
+    const size_t whole = sizeof(BlockHeader) + header->bytes;
+    gHeldBytes.fetch_sub(static_cast<int64_t>(whole), std::memory_order_relaxed);
+    u_memory::GiveBackRawBlock(header, whole);
 }
 
 int32_t U_PurgeLoop(size_t bytes, U_ElementConstructor constructor, U_PurgeRecord* record,
@@ -91,6 +111,10 @@ int64_t U_AccountedBytes() {
 
 void U_SetPurgeHandler(U_PurgeHandler handler) {
     gPurgeHandler.store(handler);
+}
+
+void U_SetAllocationLimit(int64_t bytes) {
+    gLimitBytes.store(bytes < 0 ? 0 : bytes);
 }
 
 void U_FailAllocationAfter(int64_t n) {

@@ -24,6 +24,12 @@ TEST(Arguments, MalformedTextIsRefused) {
         SCOPED_TRACE(bad);
         EXPECT_THROW(ParseRegion(bad), std::invalid_argument);
     }
+    for (const char* bad : {"", "G", "8X", "8GB", "1023K", "-1G", "1e30", "nanG"}) {
+        SCOPED_TRACE(bad);
+        EXPECT_THROW(ParseMemorySize(bad), std::invalid_argument);
+    }
+    EXPECT_EQ(ParseMemorySize("1.5G"), int64_t{3} << 29);
+    EXPECT_EQ(ParseMemorySize("1048576"), int64_t{1} << 20);
 }
 
 }  // namespace

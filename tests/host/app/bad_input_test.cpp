@@ -195,7 +195,7 @@ const Case kCases[] = {
     {"/layers/3/source=\"checksum.png\"", "",
      "c.json: layers[3].source: …checksum.png': …(frame 0)"},
     {"/layers/3/source=\"huge.ppm\"", "",
-     "…huge.ppm': the image is 100000 × 100000 pixels of 3 channels; decoding it needs 280.0 GB, "
+     "…huge.ppm': the image is 100000 × 100000 pixels of 3 channels; decoding it needs 260.8 GiB, "
      "more than this machine's"},
     {"/layers/3/source=\"wide.ppm\"", "",
      "c.json: layers[3].source: the image is 40000 × 1 pixels; sides must be 1 to 30000"},
@@ -232,6 +232,10 @@ const Case kCases[] = {
     {"", "render c.json --region 0,0,2000,10", "c.json: render settings: a region of interest"},
     {"", "render c.json --region 1,2,3", "--region: "},
     {"", "render c.json --depth 12", "--depth: 12 not in {8,16,32}"},
+    {"", "render c.json --frames 0 --max-memory 4M",
+     "c.json: frame 0: the renderer \"Ostrel 3D\" failed with error 4 (0x4): out of memory; the "
+     "frame's buffers may hold at most 4.0 MiB (--max-memory)"},
+    {"", "render c.json --max-memory lots", "--max-memory: \"lots\" is not a size of memory"},
     {"", "render c.json --threads 300", "--threads: "},
     {"", "render c.json --fields sideways", "--fields: "},
     {"", "render c.json --multiprocessing maybe", "--multiprocessing: "},

@@ -76,8 +76,8 @@ TEST(OstrelProgram, RunsAsTheArgumentsSay) {
          "info shot/cards.json",
          0,
          {"960 x 540", "8 bits", "frames       0-47 at 24 fps", "\"camera\", perspective",
-          "\"key light\" (spot, casts shadows)", "\"fill light\" (ambient)", "\"disc\"", "\"grid\"",
-          "\"floor\""},
+          "\"key light\" (spot, casts shadows: a map of 960 x 960)", "\"fill light\" (ambient)",
+          "\"disc\"", "\"grid\"", "\"floor\""},
          "",
          {}},
         {"about", "about", 0, {"Ostrel 3D\n"}, "", {}},
@@ -188,11 +188,39 @@ TEST(OstrelProgram, OutOfMemoryIsAnErrorNotAnAbort) {
                           "' render fan.json -o f.####.tif >/dev/null 2>err.txt";
     int status = std::system(command.c_str());
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
-    EXPECT_EQ(
-        ReadAll(folder.Path() / "err.txt"),
-        "ostrel: fan.json: frame 0: the renderer \"Ostrel 3D\" failed with error 4 (0x4): out "
-        "of memory\n");
+    EXPECT_EQ(ReadAll(folder.Path() / "err.txt")
+                  .rfind("ostrel: fan.json: frame 0: the renderer \"Ostrel 3D\" failed with error "
+                         "4 (0x4): out of memory; ",
+                         0),
+              0u);
     EXPECT_EQ(FilesIn(folder.Path()), 2u);
+}
+
+// With --keep-going a frame that fails is reported and the run goes on; it fails at the end,
+// naming the frames. The broken image shows only on frame 1.
+TEST(OstrelProgram, KeepGoingRendersTheFramesThatCanBe) {
+    TempFolder folder;
+    fs::copy(fs::path(OSTREL_EXAMPLES_DIR) / "cards", folder.Path());
+    std::string png = ReadAll(folder.Path() / "disc.png");
+    png[png.find("IDAT") + 100] ^= 0x40;  // whole, but its data no longer checks
+    folder.WriteText("bad.png", png);
+    nlohmann::json comp = nlohmann::json::parse(ReadAll(folder.Path() / "cards.json"));
+    comp["layers"][3].update({{"source", "bad.png"}, {"in", 0.04}, {"out", 0.08}});
+    folder.WriteText("c.json", comp.dump());
+    std::string command = "cd '" + folder.Path().string() +
+                          "' && '" OSTREL_PROGRAM
+                          "' render c.json --frames 0-2 --keep-going -o f.####.png >/dev/null "
+                          "2>err.txt";
+    int status = std::system(command.c_str());
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+    std::string errors = ReadAll(folder.Path() / "err.txt");
+    EXPECT_NE(errors.find("bad.png': "), std::string::npos) << errors;
+    EXPECT_NE(errors.find("(frame 1)\nostrel: c.json: 1 of 3 frames failed: 1\n"),
+              std::string::npos)
+        << errors;
+    EXPECT_TRUE(fs::exists(folder.Path() / "f.0000.png") &&
+                fs::exists(folder.Path() / "f.0002.png"));
+    EXPECT_FALSE(fs::exists(folder.Path() / "f.0001.png"));
 }
 
 // A render killed outright leaves at most the temporaries of a process that is gone, which the

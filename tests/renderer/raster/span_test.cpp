@@ -146,7 +146,8 @@ TYPED_TEST(Span, MatteAndOpacityScaleTheCoverage) {
 }
 
 // Ambient light of half strength halves every colour channel: c·½ + ½, truncated for integer
-// channels; the shadows-only layer lights the channel maximum instead of the texel's colour.
+// channels; the shadows-only layer lights the channel maximum instead of the texel's colour and
+// multiplies what lies beneath, opaque white here.
 TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     using P = TypeParam;
     SY_LightState ambient;
@@ -162,11 +163,11 @@ TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     };
     for (uint8_t acceptsShadows : {0, 2}) {
         shader.material.acceptsShadows = acceptsShadows;
-        PF_WorldX<P> destination(kWidth, kHeight);
-        this->Draw(false, SY_RenderTarget(destination), 1, 3, 4);  // a pair and the tail
+        auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, Opaque<P>(255, 255, 255));
+        this->Draw(false, SY_RenderTarget(*destination), 1, 3, 4);  // a pair and the tail
         for (int32_t i = 1; i < 4; ++i) {
             const P texel = acceptsShadows ? Opaque<P>(255, 255, 255) : PatternTexel<P>(i, 4);
-            const P& got = destination.At(i, 4);
+            const P& got = destination->At(i, 4);
             EXPECT_EQ(got.alpha, texel.alpha);
             EXPECT_FLOAT_EQ(got.red, half(texel.red)) << i;
             EXPECT_FLOAT_EQ(got.green, half(texel.green)) << i;

@@ -1,0 +1,333 @@
+#include "renderer/frame/shadow_maps.h"
+
+#include <algorithm>
+#include <cmath>
+#include <memory>
+#include <new>
+
+#include "renderer/mbuffer/shadow_fragments.h"
+#include "renderer/raster/shader.h"
+#include "renderer/scene/depth_grouping.h"
+#include "renderer/scene/layer_projection.h"
+#include "renderer/scene/render_context.h"
+#include "renderer/scene/render_target.h"
+
+namespace {
+
+// A parallel light's map puts everything less than this far behind the light's plane in front
+// of it, so that layers on both sides of the light's position cast.
+constexpr double kParallelDepthShift = 50000;
+// A cube face spans 100°, so neighbouring faces overlap by 10° for the blend at their seams.
+constexpr double kTanHalfFace = 1.19175359259421;  // tan 50°
+// A spot whose cone is wider than 40° overflows one face and takes five.
+constexpr double kCosWidestSingleFace = 0.76604444;
+constexpr double kQuarterTurn = 1.5707963267948966;
+constexpr double kHalfTurn = 3.141592653589793;
+
+void Check(int32_t error) {
+    if (error) throw error;
+}
+
+bool LitBy(const SY_LayerDesc& layer, int32_t lightId) {
+    return std::find(layer.lightIds.begin(), layer.lightIds.end(), lightId) != layer.lightIds.end();
+}
+
+struct ShadowRoles {
+    bool anyCaster = false;
+    bool anyReceiver = false;
+    bool bestReceiver = false;  // some layer accepts shadows at best quality
+};
+
+ShadowRoles RolesOf(const SY_SceneDesc& scene) {
+    ShadowRoles roles;
+    for (const SY_LayerDesc& layer : scene.layers) {
+        roles.anyCaster = roles.anyCaster || layer.material.castsShadows;
+        bool accepts = layer.material.acceptsShadows != kSY_AcceptsShadowsOff;
+        roles.anyReceiver = roles.anyReceiver || accepts;
+        roles.bestReceiver = roles.bestReceiver || (accepts && layer.material.bestQuality);
+    }
+    return roles;
+}
+
+// The diffusion in map texels: it is given in output pixels of a full-quality map, whose side
+// is the output's larger side.
+double DiffusionTexels(const SY_LightState& light, int32_t size, int32_t width, int32_t height) {
+    return light.shadowDiffusion * size / std::max({400, width, height});
+}
+
+struct FaceTurn {
+    double x;
+    double y;
+};
+
+// The turns of the faces a spot or point light renders, the one along its axis first.
+int32_t FaceTurns(const SY_LightDesc& light, FaceTurn turns[6]) {
+    int32_t count = 0;
+    turns[count++] = {0, 0};
+    float cosOuter = static_cast<float>(std::cos(light.coneHalfAngle));
+    if (light.type == kSY_LightPoint || cosOuter < kCosWidestSingleFace) {
+        turns[count++] = {0, -kQuarterTurn};
+        turns[count++] = {0, kQuarterTurn};
+        turns[count++] = {-kQuarterTurn, 0};
+        turns[count++] = {kQuarterTurn, 0};
+        if (light.type == kSY_LightPoint) turns[count++] = {0, kHalfTurn};
+    }
+    return count;
+}
+
+M_LRect PixelRect(const SY_TRLayer& renderable, int32_t size) {
+    auto clamp = [size](double v) {
+        return static_cast<int32_t>(std::clamp(v, 0.0, double(size)));
+    };
+    return {clamp(std::floor(renderable.bounds[0])), clamp(std::floor(renderable.bounds[1])),
+            clamp(std::ceil(renderable.bounds[2])), clamp(std::ceil(renderable.bounds[3]))};
+}
+
+// Merges the occluder lists of every array at each texel into one run, nearest the light first.
+// Each entry's transmission is the product of what every layer passed so far lets through, a
+// layer counting by its last entry passed (its blur levels replace one another).
+class MapMerge {
+public:
+    explicit MapMerge(const SY_ShadowFragmentArrayList& arrays) : arrays_(arrays) {
+        int32_t n = arrays.Count();
+        texels_ = arrays[0]->Bounds();
+        size_t total = 0;
+        for (int32_t k = 0; k < n; ++k) {
+            const M_LRect& b = arrays[k]->Bounds();
+            texels_.left = std::min(texels_.left, b.left);
+            texels_.top = std::min(texels_.top, b.top);
+            texels_.right = std::max(texels_.right, b.right);
+            texels_.bottom = std::max(texels_.bottom, b.bottom);
+            total += arrays[k]->fragmentCount.load(std::memory_order_relaxed);
+        }
+        size_t texelCount = size_t(texels_.right - texels_.left) * (texels_.bottom - texels_.top);
+        starts_ = SY_ShadowBlock<uint32_t>("shadow map", texelCount + 1);
+        entries_ = SY_ShadowBlock<SY_ShadowEntry>("shadow map vertices", total);
+        next_.resize(size_t(n));
+        passed_.resize(size_t(n) * 3);
+        rowArrays_.reserve(size_t(n));
+        covering_.reserve(size_t(n));
+    }
+
+    const M_LRect& Texels() const { return texels_; }
+
+    void Run() {
+        size_t texel = 0;
+        for (int32_t y = texels_.top; y < texels_.bottom; ++y) {
+            rowArrays_.clear();
+            for (int32_t k = 0; k < arrays_.Count(); ++k) {
+                const M_LRect& b = arrays_[k]->Bounds();
+                if (y >= b.top && y < b.bottom) rowArrays_.push_back(k);
+            }
+            for (int32_t x = texels_.left; x < texels_.right; ++x) {
+                starts_[texel++] = written_;
+                MergeTexel(x, y);
+            }
+        }
+        starts_[texel] = written_;
+    }
+
+    SY_ShadowBlock<uint32_t> TakeStarts() { return std::move(starts_); }
+    SY_ShadowBlock<SY_ShadowEntry> TakeEntries() { return std::move(entries_); }
+
+private:
+    void MergeTexel(int32_t x, int32_t y) {
+        covering_.clear();
+        for (int32_t k : rowArrays_) {
+            const M_LRect& b = arrays_[k]->Bounds();
+            if (x < b.left || x >= b.right) continue;
+            if (const SY_ShadowFragment* f = *arrays_[k]->HeadAt(x, y)) {
+                next_[k] = f;
+                std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
+                covering_.push_back(k);
+            }
+        }
+        if (covering_.empty()) return;
+        uint32_t begin = written_;
+        for (;;) {
+            // The nearest next occluder; on a tie the earlier array's goes first.
+            int32_t nearest = -1;
+            for (int32_t k : covering_) {
+                if (next_[k] && (nearest < 0 || next_[k]->depth > next_[nearest]->depth))
+                    nearest = k;
+            }
+            if (nearest < 0) break;
+            const SY_ShadowFragment& f = *next_[nearest];
+            next_[nearest] = f.next;
+            float* own = &passed_[size_t(nearest) * 3];
+            own[0] = f.red * (1.0f / 32768);
+            own[1] = f.green * (1.0f / 32768);
+            own[2] = f.blue * (1.0f / 32768);
+            SY_ShadowEntry& e = entries_[written_++];
+            e.depth = f.depth;
+            e.tag = f.value16 < kSY_ShadowNoLayer ? f.value16 : kSY_ShadowNoLayer;
+            if (covering_.size() == 1) {
+                e.red = f.red;
+                e.green = f.green;
+                e.blue = f.blue;
+                continue;
+            }
+            float product[3] = {1, 1, 1};
+            for (int32_t k : covering_) {
+                for (int c = 0; c < 3; ++c)
+                    product[c] *= passed_[size_t(k) * 3 + c];
+            }
+            e.red = static_cast<uint16_t>(product[0] * 32768 + 0.5f);
+            e.green = static_cast<uint16_t>(product[1] * 32768 + 0.5f);
+            e.blue = static_cast<uint16_t>(product[2] * 32768 + 0.5f);
+        }
+        for (uint32_t i = begin; i + 1 < written_; ++i) {
+            if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
+                entries_[i].tag |= kSY_ShadowStep;
+        }
+    }
+
+    const SY_ShadowFragmentArrayList& arrays_;
+    M_LRect texels_;
+    SY_ShadowBlock<uint32_t> starts_;
+    SY_ShadowBlock<SY_ShadowEntry> entries_;
+    uint32_t written_ = 0;
+    SY_AccountedVector<const SY_ShadowFragment*> next_;
+    SY_AccountedVector<float> passed_;  // red, green, blue let through by each array so far
+    SY_AccountedVector<int32_t> rowArrays_;
+    SY_AccountedVector<int32_t> covering_;
+};
+
+// What one face of a light needs to render its map.
+struct FaceJob {
+    const M_Matrix4* view;  // world to the light's eye
+    FaceTurn turn;
+    double focal;  // 0: parallel light
+    int32_t size;
+    const SY_LightState* light;
+    double diffusion;  // map texels
+};
+
+// Renders the casting layers of the light into occluder lists through the face, and builds the
+// face's map from them; null when no layer shadows another in the face.
+std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const FaceJob& job) {
+    M_Matrix4 worldToMap = *job.view;
+    if (job.turn.x != 0 || job.turn.y != 0)
+        Check(M_RotateMatrix4XYZ(job.turn.x, job.turn.y, 0, &worldToMap));
+    bool perspective = job.focal != 0;
+    if (perspective)
+        worldToMap.Project(job.focal);
+    else
+        Check(M_TranslateMatrix4(0, 0, kParallelDepthShift, &worldToMap));
+    // The light's axis through the map's centre.
+    Check(M_TranslateMatrix4(job.size * 0.5, job.size * 0.5, 0, &worldToMap));
+
+    const SY_CameraView camera{&worldToMap, 1, perspective};
+    SY_SetUpOptions options;
+    options.output = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
+    SY_Renderables casters, receivers;
+    for (const SY_LayerDesc& layer : context->scene->layers) {
+        const SY_Material& material = layer.material;
+        bool accepts = material.acceptsShadows != kSY_AcceptsShadowsOff;
+        if (material.opacity == 0 || !(material.castsShadows || accepts) ||
+            !LitBy(layer, job.light->id)) {
+            continue;
+        }
+        options.depthOffset = material.depthIndex * kSY_DepthStepPerIndex;
+        if (accepts) {
+            SY_TRLayer receiver(layer);
+            options.margin = 0;
+            if (SY_SetUpRenderable(layer, camera, options, &receiver))
+                receivers.push_back(std::move(receiver));
+        }
+        if (material.castsShadows) {
+            // A blurred shadow spreads beyond its caster's outline.
+            SY_TRLayer caster(layer);
+            options.margin = std::ceil(job.diffusion);
+            if (SY_SetUpRenderable(layer, camera, options, &caster))
+                casters.push_back(std::move(caster));
+        }
+    }
+
+    context->renderablesDone = 0;
+    context->renderableCount = static_cast<int32_t>(casters.size());
+    const SY_DepthSense sense = SY_DepthSenseOf(perspective);
+    SY_ShadowFragmentArrayList arrays;
+    for (SY_TRLayer& caster : casters) {
+        // Only a caster that lies in front of some other receiver somewhere is drawn.
+        bool shadowsAny = std::any_of(receivers.begin(), receivers.end(), [&](const SY_TRLayer& r) {
+            return r.material.renderIndex != caster.material.renderIndex &&
+                   SY_RelateRenderables(caster, r, sense).bFirst;
+        });
+        M_LRect rect = PixelRect(caster, job.size);
+        if (!shadowsAny || rect.right <= rect.left || rect.bottom <= rect.top) continue;
+        SY_ShadowFragmentArray* array = arrays.Append(rect);
+        SY_ShadowShader shader(caster.material, job.diffusion, perspective);
+        caster.Render(context, camera, &shader, 0, SY_RenderTarget(*array));
+    }
+    arrays.Compact();
+    if (arrays.Count() == 0) return nullptr;
+
+    MapMerge merge(arrays);
+    merge.Run();
+    const double face[4] = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
+    return std::make_unique<SY_PlanarShadowMap>(worldToMap, perspective, face, merge.Texels(),
+                                                merge.TakeStarts(), merge.TakeEntries());
+}
+
+std::unique_ptr<SY_ShadowMap> BuildLightMap(SY_RenderContext* context, const SY_LightDesc& desc,
+                                            const SY_LightState& light, int32_t size) {
+    M_Matrix4 view;
+    Check(M_InverseMatrix4(&desc.placements[desc.placements.Count() / 2], &view));
+    FaceJob job{
+        &view,
+        {0, 0},
+        0,
+        size,
+        &light,
+        DiffusionTexels(light, size, context->destination->width, context->destination->height)};
+    if (desc.type == kSY_LightParallel) return RenderFace(context, job);
+
+    job.focal = 0.5 * size / kTanHalfFace;
+    FaceTurn turns[6];
+    int32_t count = FaceTurns(desc, turns);
+    auto cube = std::make_unique<SY_CubicShadowMap>();
+    for (int32_t i = 0; i < count; ++i) {
+        job.turn = turns[i];
+        if (std::unique_ptr<SY_PlanarShadowMap> face = RenderFace(context, job))
+            cube->Add(std::move(face));
+    }
+    if (cube->FaceCount() == 1) return cube->TakeOnlyFace();
+    if (cube->FaceCount() == 0) return nullptr;
+    return cube;
+}
+
+}  // namespace
+
+SY_ShadowMapPlan SY_PlanShadowMap(const SY_SceneDesc& scene, int32_t lightIndex,
+                                  int32_t outputWidth, int32_t outputHeight) {
+    const SY_LightDesc& light = scene.lights[lightIndex];
+    ShadowRoles roles = RolesOf(scene);
+    SY_ShadowMapPlan plan;
+    if (!roles.anyCaster || !roles.anyReceiver || !light.castsShadows ||
+        light.shadowDarkness == 0 || light.type == kSY_LightAmbient || light.placements.Empty()) {
+        return plan;
+    }
+    plan.size = SY_ShadowMapSize(light.shadowMapSize, outputWidth, outputHeight, scene.downsampleX,
+                                 roles.bestReceiver);
+    FaceTurn turns[6];
+    plan.faces = light.type == kSY_LightParallel ? 1 : FaceTurns(light, turns);
+    return plan;
+}
+
+void SY_BuildShadowMaps(SY_RenderContext* context) {
+    const SY_SceneDesc& scene = *context->scene;
+    try {
+        for (int32_t i = 0; i < scene.lights.Count(); ++i) {
+            SY_ShadowMapPlan plan = SY_PlanShadowMap(scene, i, context->destination->width,
+                                                     context->destination->height);
+            if (plan.size == 0) continue;
+            SY_LightState& light = context->lightStates[i];
+            light.shadowMap = BuildLightMap(context, scene.lights[i], light, plan.size);
+        }
+        context->shadowSums.Clear();
+    } catch (const std::bad_alloc&) {
+        // Maps built so far stay with their light states, which the frame releases.
+        throw kU_ErrOutOfMemory;
+    }
+}

@@ -1,0 +1,251 @@
+#include "renderer/raster/shadow_span.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "pf_bit_depth.h"
+#include "pf_tables.h"
+#include "renderer/mbuffer/shadow_fragments.h"
+#include "renderer/raster/samplers.h"
+#include "renderer/raster/shader.h"
+#include "renderer/raster/span_start.h"
+#include "renderer/scene/screen_geometry.h"
+#include "u_report.h"
+
+namespace {
+
+constexpr uint32_t kOne = 32768;
+
+// The powers of two that blur levels take below 90 % of the diffusion.
+constexpr float kLevelRadii[] = {2, 4, 8, 16, 32, 64, 128, 256, 512};
+
+uint16_t ToFixed(double fraction) {
+    return static_cast<uint16_t>(std::lround(std::clamp(fraction, 0.0, 1.0) * kOne));
+}
+
+template <class P>
+uint32_t To16(typename PF_PixelTraits<P>::Channel c) {
+    if constexpr (PF_PixelTraits<P>::kIsFloat)
+        return PF_FloatTo16(std::clamp(c, 0.0f, 1.0f));
+    else if constexpr (PF_PixelTraits<P>::kBitDepth == 8)
+        return PF_8To16(c);
+    else
+        return c;
+}
+
+// What the layer sample lets through, × 32768: grey as the layer is opaque, tinted by its
+// colour as far as its light transmission goes. False where the layer is transparent.
+template <class P>
+bool Occluder(const P& sample, const SY_ShadowShader& shader, PF_Pixel16* out) {
+    uint32_t alpha = To16<P>(sample.alpha);
+    if (alpha == 0) return false;
+    uint32_t a = PF_Mul16(alpha, shader.opacity);
+    uint32_t open = kOne - a;  // light that misses the layer
+    uint32_t t = shader.transmission;
+    uint32_t colour[3] = {To16<P>(sample.red), To16<P>(sample.green), To16<P>(sample.blue)};
+    uint16_t* channels[3] = {&out->red, &out->green, &out->blue};
+    for (int c = 0; c < 3; ++c) {
+        uint32_t filtered = kOne - PF_Mul16(kOne - colour[c], a);  // white where transparent
+        uint32_t v = t == 0 ? open : t >= kOne ? filtered : (((filtered - open) * t) >> 15) + open;
+        *channels[c] = static_cast<uint16_t>(v);
+    }
+    return true;
+}
+
+// Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
+// the layer's summed-area table (sums of type S).
+template <class P, class S>
+void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& texture,
+               const SY_SpanMapping& m, float scale, P* out) {
+    using sy_sampling::kFarTexels;
+    if (!sy_sampling::InFront(m, texture.perspective)) {
+        *out = P{};
+        return;
+    }
+    sy_sampling::Footprint f = sy_sampling::FootprintOf(m, texture.perspective);
+    double ru = std::min(scale * f.ru, kFarTexels), rv = std::min(scale * f.rv, kFarTexels);
+    double u = std::clamp(f.u, -kFarTexels, kFarTexels),
+           v = std::clamp(f.v, -kFarTexels, kFarTexels);
+    // Filtered mappings put texel centres on whole numbers; the table counts from corners.
+    bool filtered = texture.samplingFilter != SY_SamplingFilter::kNearest;
+    double cu = filtered ? u + 0.5 : u, cv = filtered ? v + 0.5 : v;
+    // Whole-texel boxes for draft layers, and wherever the box is wide enough that its
+    // fractional edges (under a quarter of its width) do not show.
+    constexpr double kWholeTexelsFrom = 2.0;
+    if (!filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom)) {
+        PF_SummedAreaTable_SampleDraft(
+            table.Width(), table.Height(), sums, static_cast<int32_t>(std::floor(cu - ru)),
+            static_cast<int32_t>(std::floor(cv - rv)), static_cast<int32_t>(std::ceil(cu + ru)),
+            static_cast<int32_t>(std::ceil(cv + rv)), out);
+        return;
+    }
+    if (ru > 0.5 && rv > 0.5) {
+        PF_SummedAreaTable_SampleAA(table.Width(), table.Height(), sums,
+                                    static_cast<float>(cu - ru), static_cast<float>(cv - rv),
+                                    static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
+        return;
+    }
+    sy_sampling::Filter(texture, u, v, ru, rv, out);
+}
+
+template <class P>
+const SY_SpanMapping* FirstPresent(const SY_SpanSampleState<P>& state) {
+    return &state.mapping;
+}
+template <class P>
+const SY_SpanMapping* FirstPresent(const SY_SpanSubsampleState<P>& state) {
+    for (int32_t i = state.first; i <= state.last; ++i) {
+        if (state.mappings[i].invW > 0) return &state.mappings[i];
+    }
+    return nullptr;
+}
+
+template <class P, class S>
+void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSampleState<P>& state,
+                   float scale, P* out) {
+    SampleBox(table, sums, state.texture, state.mapping, scale, out);
+}
+
+// The box average over the present subsamples, alpha falling with the absent ones.
+template <class P, class S>
+void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsampleState<P>& state,
+                   float scale, P* out) {
+    sy_sampling::Accumulator sum;
+    for (int32_t i = state.first; i <= state.last; ++i) {
+        if (!(state.mappings[i].invW > 0)) continue;
+        P texel;
+        SampleBox(table, sums, state.texture, state.mappings[i], scale, &texel);
+        sum.Add(texel);
+    }
+    sum.Resolve(state.count, out);
+}
+
+// Steps the state across the span; sample(level, out) gives the layer's colour at a level.
+bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
+    return a.red == b.red && a.green == b.green && a.blue == b.blue;
+}
+
+// Steps the state across the span; sample(level, out) gives the layer's colour at a level. A
+// level that lets through what both its neighbours let through adds nothing that blending
+// between them would not give, so only the levels where the light changes are kept: inside
+// an opaque layer one occluder stands for all of them.
+template <class P, class State, class Sample>
+void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t count, int32_t y,
+              SY_ShadowFragmentArray* array, int32_t thread, Sample sample) {
+    SY_ShadowFragment** heads = array->HeadAt(x, y);
+    const int32_t levels = shader.levelCount;
+    PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
+    bool present[SY_ShadowShader::kMaxLevels];
+    for (int32_t i = 0; i < count; ++i, state.Step()) {
+        const SY_SpanMapping* depth = FirstPresent(state);
+        if (!depth) continue;
+        // Where the widest box is wholly opaque, so is every box inside it, and a layer that
+        // passes no colour then lets the same grey through at every level.
+        P widest;
+        sample(levels - 1, &widest);
+        constexpr auto kOpaque = static_cast<decltype(widest.alpha)>(PF_PixelTraits<P>::kMax);
+        if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
+            PF_Pixel16 occluder;
+            Occluder(widest, shader, &occluder);
+            array->AddShadowFragment(&occluder, shader.DepthKey(depth->w, 0), 0.0f, shader.layerId,
+                                     heads + i, thread);
+            continue;
+        }
+        present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
+        for (int32_t level = 0; level + 1 < levels; ++level) {
+            P texel;
+            sample(level, &texel);
+            present[level] = Occluder(texel, shader, &occluders[level]);
+        }
+        for (int32_t level = 0; level < levels; ++level) {
+            if (!present[level]) continue;
+            bool likeBefore = level > 0 && present[level - 1] &&
+                              SameLight(occluders[level - 1], occluders[level]);
+            bool likeAfter =
+                level + 1 == levels ||
+                (present[level + 1] && SameLight(occluders[level + 1], occluders[level]));
+            if (likeBefore && likeAfter) continue;
+            array->AddShadowFragment(&occluders[level], shader.DepthKey(depth->w, level), 0.0f,
+                                     shader.layerId, heads + i, thread);
+        }
+    }
+}
+
+template <class P, class State>
+void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& shader, State& state,
+                   int32_t x, int32_t count, int32_t y, SY_ShadowFragmentArray* array,
+                   int32_t thread) {
+    if (!shader.soft) {
+        bool filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
+        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t, P* out) {
+            if (filtered)
+                SY_SampleFiltered(state, out);
+            else
+                SY_SampleNearest(state, out);
+        });
+        return;
+    }
+    const PF_SummedAreaTable& table = *geometry.sumTable;
+    auto draw = [&](const auto* sums) {
+        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
+            // The box reaches the level's radius, and at least the texel's own footprint.
+            float scale = 2.0f * std::max(0.5f, shader.radius[level]);
+            SampleBlurred(table, sums, state, scale, out);
+        });
+    };
+    if (table.HasDoubleSums())
+        draw(table.DoubleSums());
+    else
+        draw(table.FloatSums());
+}
+
+template <class P>
+void DrawAtDepth(const SY_ScreenGeometry& geometry, const SY_ShadowShader& shader, int32_t x,
+                 int32_t count, int32_t y, SY_ShadowFragmentArray* array, int32_t thread) {
+    SY_WithSpanState<P>(geometry, x, y, [&](auto& state) {
+        DrawWithState<P>(geometry, shader, state, x, count, y, array, thread);
+    });
+}
+
+}  // namespace
+
+SY_ShadowShader::SY_ShadowShader(const SY_Material& material, double diffusionTexels,
+                                 bool perspectiveMap)
+    : layerId(SY_ShadowLayerId(material.renderIndex)),
+      opacity(ToFixed(material.opacity)),
+      transmission(ToFixed(material.lightTransmission)),
+      diffusion(diffusionTexels),
+      soft(diffusionTexels > 0),
+      perspective(perspectiveMap) {
+    if (!soft) return;
+    // A sharp level where the shadow meets its caster, then the blurrier ones behind it.
+    levelCount = 1;
+    const double d = diffusion;
+    for (float r : kLevelRadii) {
+        if (!(r < 0.9 * d)) break;
+        radius[levelCount] = r;
+        ratio[levelCount] = static_cast<float>(r / (d - r));
+        ++levelCount;
+    }
+    float last = static_cast<float>(0.9 * d);
+    float previous = radius[levelCount - 1];
+    if (std::fabs(last - previous) > std::max(1e-6f * last, 563.0f / (1 << 20))) {
+        radius[levelCount] = last;
+        ratio[levelCount] = 9.0f;
+        ++levelCount;
+    }
+}
+
+int32_t SY_ShadowShader::ShadowBlurRadius() const {
+    return static_cast<int32_t>(std::ceil(diffusion));
+}
+
+void SY_RenderShadowSpan(const SY_ScreenGeometry& geometry, const SY_ShadowShader& shader,
+                         int32_t x, int32_t count, int32_t y, SY_ShadowFragmentArray* array,
+                         int32_t thread) {
+    if (count <= 0) return;
+    PF_DispatchBitDepth(
+        geometry.texture->GetBitDepth(),
+        [&]<class P>() { DrawAtDepth<P>(geometry, shader, x, count, y, array, thread); },
+        U_BitDepthVerification("Unexpected bitdepth in SY_RenderLayerSpan_SwitchDepth()"));
+}

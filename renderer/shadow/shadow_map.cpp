@@ -1,0 +1,243 @@
+#include "renderer/shadow/shadow_map.h"
+
+#include <array>
+#include <cmath>
+
+namespace {
+
+constexpr float kFromFixed = 1.0f / 32768.0f;
+// A point this close to a spot or point light's eye plane, or in front of a parallel light's
+// far plane, lies outside the map.
+constexpr double kNearestDepth = 0.001;
+
+// Filter weights of the soft lookup by squared texel distance q: weight[trunc(16·q)] is
+// exp(−q), a table rather than a call per texel.
+const std::array<float, 32> kSoftWeights = [] {
+    std::array<float, 32> w{};
+    for (int i = 0; i < 32; ++i)
+        w[i] = static_cast<float>(std::exp(-i / 16.0));
+    return w;
+}();
+
+void SetFull(float t[3]) {
+    t[0] = t[1] = t[2] = 1.0f;
+}
+
+void SetEntry(const SY_ShadowEntry& e, float t[3]) {
+    t[0] = e.red * kFromFixed;
+    t[1] = e.green * kFromFixed;
+    t[2] = e.blue * kFromFixed;
+}
+
+double Row(const M_Matrix4& m, int column, const double p[3]) {
+    return p[0] * m.mat[0][column] + p[1] * m.mat[1][column] + p[2] * m.mat[2][column] +
+           m.mat[3][column];
+}
+
+}  // namespace
+
+SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspective,
+                                       const double mapRect[4], const M_LRect& texels,
+                                       SY_ShadowBlock<uint32_t> starts,
+                                       SY_ShadowBlock<SY_ShadowEntry> entries)
+    : matrix_(worldToMap),
+      perspective_(perspective),
+      texels_(texels),
+      stride_(texels.right - texels.left),
+      starts_(std::move(starts)),
+      entries_(std::move(entries)),
+      centre_{(mapRect[0] + mapRect[2]) * 0.5, (mapRect[1] + mapRect[3]) * 0.5},
+      half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {}
+
+bool SY_PlanarShadowMap::Project(const double p[3], double* x, double* y, double* d) const {
+    if (perspective_) {
+        double w = Row(matrix_, 3, p);
+        if (w < kNearestDepth) return false;
+        *x = Row(matrix_, 0, p) / w;
+        *y = Row(matrix_, 1, p) / w;
+        *d = 1.0 / w;
+        return true;
+    }
+    // The map's z grows away from the light; the depth key grows toward it.
+    *d = -Row(matrix_, 2, p);
+    if (*d > -kNearestDepth) return false;
+    *x = Row(matrix_, 0, p);
+    *y = Row(matrix_, 1, p);
+    return true;
+}
+
+namespace {
+
+// The light left at depth d behind the occluders [first, end) of one texel, for the layer
+// receiverId; false, with t untouched, where all of it is left.
+[[gnu::always_inline]] inline bool ListTransmission(const SY_ShadowEntry* first,
+                                                    const SY_ShadowEntry* end, double d,
+                                                    uint16_t receiverId, float t[3]) {
+    if (first == end || d >= first->depth) return false;
+    // e: the last occluder nearer the light than the point. Lists are short, a few layers and
+    // their blur levels, so a walk from the front costs less than keeping a cursor per thread.
+    const SY_ShadowEntry* e = first;
+    while (e + 1 < end && e[1].depth > d)
+        ++e;
+    if (receiverId != kSY_ShadowNoLayer && (e->tag & kSY_ShadowIdMask) == receiverId) {
+        // The receiver's own occluders: the light that reached its front counts.
+        while (e >= first && (e->tag & kSY_ShadowIdMask) == receiverId)
+            --e;
+        if (e < first) return false;
+        SetEntry(*e, t);
+        return true;
+    }
+    SetEntry(*e, t);
+    if (e + 1 < end && !(e->tag & kSY_ShadowStep)) {
+        // Between two blur levels of one layer the shadow softens gradually with depth.
+        float f = static_cast<float>((d - e->depth) / (e[1].depth - e->depth));
+        float next[3];
+        SetEntry(e[1], next);
+        for (int c = 0; c < 3; ++c)
+            t[c] += (next[c] - t[c]) * f;
+    }
+    return true;
+}
+
+}  // namespace
+
+void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId,
+                                           float t[3]) const {
+    SetFull(t);
+    if (i < texels_.left || i >= texels_.right || j < texels_.top || j >= texels_.bottom) return;
+    size_t texel = static_cast<size_t>(j - texels_.top) * stride_ + (i - texels_.left);
+    ListTransmission(entries_.Data() + starts_[texel], entries_.Data() + starts_[texel + 1], d,
+                     receiverId, t);
+}
+
+void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t receiverId,
+                                        bool soft, float t[3]) const {
+    if (!soft) {
+        double i = std::floor(x), j = std::floor(y);
+        if (!(i >= texels_.left && i < texels_.right && j >= texels_.top && j < texels_.bottom)) {
+            SetFull(t);
+            return;
+        }
+        TexelTransmission(static_cast<int32_t>(i), static_cast<int32_t>(j), d, receiverId, t);
+        return;
+    }
+    // Far outside the texels nothing is near enough to filter (and the texel index would not
+    // fit its type).
+    if (!(x > texels_.left - 3 && x < texels_.right + 3 && y > texels_.top - 3 &&
+          y < texels_.bottom + 3)) {
+        SetFull(t);
+        return;
+    }
+    // Texel centres lie at half-integers; the 4 × 4 texels around the point within a squared
+    // distance of 2 are weighed by exp(−q).
+    double cx = x - 0.5, cy = y - 0.5;
+    double fi = std::floor(cx), fj = std::floor(cy);
+    double fx = cx - fi, fy = cy - fj;
+    int32_t i0 = static_cast<int32_t>(fi), j0 = static_cast<int32_t>(fj);
+    bool inside = i0 - 1 >= texels_.left && i0 + 2 < texels_.right && j0 - 1 >= texels_.top &&
+                  j0 + 2 < texels_.bottom;
+    double qx[4], qy[4];
+    for (int k = 0; k < 4; ++k) {
+        qx[k] = (k - 1 - fx) * (k - 1 - fx);
+        qy[k] = (k - 1 - fy) * (k - 1 - fy);
+    }
+    const SY_ShadowEntry* entries = entries_.Data();
+    float sum[3] = {0, 0, 0}, weights = 0;
+    bool shaded = false;  // some texel keeps back some light
+    for (int32_t dj = 0; dj < 4; ++dj) {
+        const uint32_t* row =
+            inside ? &starts_[static_cast<size_t>(j0 - 1 + dj - texels_.top) * stride_ +
+                              (i0 - 1 - texels_.left)]
+                   : nullptr;
+        for (int32_t di = 0; di < 4; ++di) {
+            double q = qx[di] + qy[dj];
+            if (q >= 2.0) continue;
+            float w = kSoftWeights[static_cast<int32_t>(16.0 * q)];
+            float texel[3] = {1.0f, 1.0f, 1.0f};
+            if (inside) {
+                shaded |= ListTransmission(entries + row[di], entries + row[di + 1], d, receiverId,
+                                           texel);
+            } else {
+                TexelTransmission(i0 - 1 + di, j0 - 1 + dj, d, receiverId, texel);
+                shaded = true;
+            }
+            for (int c = 0; c < 3; ++c)
+                sum[c] += w * texel[c];
+            weights += w;
+        }
+    }
+    if (!shaded) {
+        SetFull(t);
+        return;
+    }
+    for (int c = 0; c < 3; ++c)
+        t[c] = weights > 0 ? sum[c] / weights : 0.0f;
+}
+
+bool SY_PlanarShadowMap::SeenByNoOtherFace(double x, double y) const {
+    // Within 40° of the axis a point lies 50° or more off the axes of the faces around, which
+    // span 50° to each side: tan 40° / tan 50° of the half size, a little less to be safe.
+    constexpr double kOwnShare = 0.7;
+    return std::fabs(x - centre_[0]) < kOwnShare * half_[0] &&
+           std::fabs(y - centre_[1]) < kOwnShare * half_[1];
+}
+
+float SY_PlanarShadowMap::FaceWeight(double x, double y, double inset) const {
+    double wx = 1.0 - std::fabs(x - centre_[0]) / (half_[0] - inset);
+    double wy = 1.0 - std::fabs(y - centre_[1]) / (half_[1] - inset);
+    return wx > 0 && wy > 0 ? static_cast<float>(wx * wy) : 0.0f;
+}
+
+void SY_PlanarShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+    double x, y, d;
+    if (!Project(p, &x, &y, &d)) {
+        SetFull(out + 1);
+        return;
+    }
+    TransmissionAt(x, y, d, receiverId, false, out + 1);
+}
+
+void SY_PlanarShadowMap::SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+    double x, y, d;
+    if (!Project(p, &x, &y, &d)) {
+        SetFull(out + 1);
+        return;
+    }
+    TransmissionAt(x, y, d, receiverId, true, out + 1);
+}
+
+void SY_CubicShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
+                               float out[4]) const {
+    // The soft filter reaches two texels beyond the point, so its faces end two texels sooner.
+    double inset = soft ? 2.0 : 0.0;
+    float sum[3] = {0, 0, 0}, weights = 0;
+    for (int32_t f = 0; f < count_; ++f) {
+        double x, y, d;
+        if (!faces_[f]->Project(p, &x, &y, &d)) continue;
+        if (faces_[f]->SeenByNoOtherFace(x, y)) {
+            faces_[f]->TransmissionAt(x, y, d, receiverId, soft, out + 1);
+            return;
+        }
+        float w = faces_[f]->FaceWeight(x, y, inset);
+        if (w <= 0) continue;
+        float t[3];
+        faces_[f]->TransmissionAt(x, y, d, receiverId, soft, t);
+        for (int c = 0; c < 3; ++c)
+            sum[c] += w * t[c];
+        weights += w;
+    }
+    if (weights <= 0) {
+        SetFull(out + 1);
+        return;
+    }
+    for (int c = 0; c < 3; ++c)
+        out[1 + c] = sum[c] / weights;
+}
+
+void SY_CubicShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+    Lookup(p, receiverId, false, out);
+}
+
+void SY_CubicShadowMap::SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+    Lookup(p, receiverId, true, out);
+}
