@@ -16,46 +16,17 @@
 #include <cmath>
 #include <cstdio>
 #include <map>
-#include <memory>
 #include <string>
 #include <vector>
 
-#include "m_matrix.h"
-#include "pf_world.h"
-#include "renderer/frame/frame_driver.h"
-#include "renderer/scene/fetchers.h"
-#include "renderer/scene/scene_desc.h"
+#include "card_scene.h"
 
 namespace {
 
+using bench::Identity;
+
 constexpr double kPi = 3.14159265358979323846;
 constexpr int32_t kTextureSize = 64;
-
-// Every layer shows the same small texture: the curves measure drawing, not fetching.
-class OneTexture : public SY_TTextureFetcher {
-public:
-    OneTexture() : texture(kTextureSize, kTextureSize) {
-        for (int32_t y = 0; y < kTextureSize; ++y) {
-            for (int32_t x = 0; x < kTextureSize; ++x)
-                texture.At(x, y) = {255, static_cast<uint8_t>(x * 4), static_cast<uint8_t>(y * 4),
-                                    160};
-        }
-    }
-    int32_t Fetch(int32_t, bool, const double*, const M_LRect*, M_Matrix3*,
-                  PF_World** world) override {
-        *world = &texture;
-        return 0;
-    }
-    void Release(int32_t, PF_World*) override {}
-
-    PF_WorldX<PF_Pixel8> texture;
-};
-
-class NoProgress : public SY_ProgressAbort {
-public:
-    void ReportRenderables(int32_t, int32_t) override {}
-    void ReportRows(int32_t, int32_t) override {}
-};
 
 // A card of width × height screen pixels at rest, its centre at (x, y) of the frame and z in
 // front of (negative) or behind the plane the camera sees at 1:1, turned about its vertical
@@ -67,7 +38,17 @@ struct Card {
 class Frame {
 public:
     Frame(int32_t width, int32_t height, int32_t samples, bool best)
-        : width_(width), height_(height), samples_(samples), best_(best) {
+        : width_(width),
+          height_(height),
+          samples_(samples),
+          best_(best),
+          texture_(kTextureSize, kTextureSize) {
+        // Every layer shows the same small texture: the curves measure drawing, not fetching.
+        for (int32_t y = 0; y < kTextureSize; ++y) {
+            for (int32_t x = 0; x < kTextureSize; ++x)
+                texture_.At(x, y) = {255, static_cast<uint8_t>(x * 4), static_cast<uint8_t>(y * 4),
+                                     160};
+        }
         const double distance = 2.0 * width;  // keeps the view the same at every size
         M_Matrix4 placement = Identity(), projection = Identity();
         M_TranslateMatrix4(width / 2.0, height / 2.0, -distance, &placement);
@@ -105,6 +86,7 @@ public:
             layer.material.engineFlag =
                 best_ ? SY_SamplingFilter::kBilinear : SY_SamplingFilter::kNearest;
             layer.lightIds = lightIds_;
+            fetcher_.worlds[k] = &texture_;
         }
     }
 
@@ -131,18 +113,13 @@ public:
     }
 
 private:
-    static M_Matrix4 Identity() {
-        M_Matrix4 m;
-        M_IdentityMatrix4(&m);
-        return m;
-    }
-
     int32_t width_, height_, samples_;
     bool best_;
     std::vector<int32_t> lightIds_;
+    PF_WorldX<PF_Pixel8> texture_;
     SY_SceneDesc scene_;
-    OneTexture fetcher_;
-    NoProgress progress_;
+    bench::Fetcher fetcher_;
+    bench::NoProgress progress_;
 };
 
 // n cards of 16 × 16 spread evenly but in no order over the frame, between 100 in front and
