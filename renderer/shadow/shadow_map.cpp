@@ -188,22 +188,22 @@ float SY_PlanarShadowMap::FaceWeight(double x, double y, double inset) const {
     return wx > 0 && wy > 0 ? static_cast<float>(wx * wy) : 0.0f;
 }
 
-void SY_PlanarShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+void SY_PlanarShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
+                                float out[4]) const {
     double x, y, d;
     if (!Project(p, &x, &y, &d)) {
         SetFull(out + 1);
         return;
     }
-    TransmissionAt(x, y, d, receiverId, false, out + 1);
+    TransmissionAt(x, y, d, receiverId, soft, out + 1);
+}
+
+void SY_PlanarShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
+    Lookup(p, receiverId, false, out);
 }
 
 void SY_PlanarShadowMap::SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const {
-    double x, y, d;
-    if (!Project(p, &x, &y, &d)) {
-        SetFull(out + 1);
-        return;
-    }
-    TransmissionAt(x, y, d, receiverId, true, out + 1);
+    Lookup(p, receiverId, true, out);
 }
 
 void SY_CubicShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,

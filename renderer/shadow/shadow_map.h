@@ -114,6 +114,7 @@ public:
     bool SeenByNoOtherFace(double x, double y) const;
 
 private:
+    void Lookup(const double p[3], uint16_t receiverId, bool soft, float out[4]) const;
     void TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId, float t[3]) const;
 
     M_Matrix4 matrix_;

@@ -203,22 +203,20 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         session.SetProgress(&progress);
         progress.BeginFrame(frame);
         int32_t layers = session.LayerContextCount();
-        for (int32_t pass = 0; pass < session.PassCount(); ++pass) {
+        int32_t code = 0;
+        for (int32_t pass = 0; !code && pass < session.PassCount(); ++pass) {
             session.BeginPass(pass);
             Clock::time_point entry = Clock::now();
-            int32_t code = instance.Render(session);
+            code = instance.Render(session);
             times.entry += Seconds(Clock::now() - entry);
-            if (code) {
-                std::string failure =
-                    FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit);
-                if (!options.keepGoing || code == kQNGP_ErrUserCancel) throw HostError(failure);
-                progress.Clear();
-                std::cerr << "ostrel: " << failure << '\n';
-                failed.push_back(frame);
-                break;
-            }
         }
-        if (!failed.empty() && failed.back() == frame) {
+        if (code) {
+            std::string failure =
+                FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit);
+            if (!options.keepGoing || code == kQNGP_ErrUserCancel) throw HostError(failure);
+            progress.Clear();
+            std::cerr << "ostrel: " << failure << '\n';
+            failed.push_back(frame);
             progress.EndFrame();
             continue;
         }
