@@ -4,7 +4,7 @@
 set -euo pipefail
 cd "$(dirname "$0")/../renderer"
 
-layers=(shadow scene mbuffer raster frame)  # bottom to top
+layers=(shadow scene mbuffer dof raster frame)  # bottom to top
 rank() {
     local i
     for i in "${!layers[@]}"; do
