@@ -6,6 +6,8 @@
 #include <memory>
 
 #include "pf_draw.h"
+#include "renderer/dof/dof_buffer.h"
+#include "renderer/frame/layer_render.h"
 #include "renderer/frame/shadow_maps.h"
 #include "renderer/mbuffer/mbuffer.h"
 #include "renderer/raster/shader.h"
@@ -63,13 +65,56 @@ void DrawOutline(const PF_World& destination, const SY_TRLayer& renderable) {
     }
 }
 
+// A layer goes through depth of field when the blur widens it, or when the iris boosts
+// highlights and the camera blurs at all.
+bool NeedsDepthOfField(const SY_RenderContext& context, const SY_TRLayer& renderable) {
+    const int32_t* m = renderable.dofMargin;
+    if (m[0] != m[2] && m[1] != m[3]) return true;
+    const SY_CameraDOFDesc& dof = context.scene->dof;
+    return dof.enabled && dof.highlightGain != 0 && dof.irisShape >= 3 && SY_DOFModel(dof).Blurs();
+}
+
+// The layer's pixel rectangle within the output, widened on the sides where it meets the
+// output's edge by the blur margin, so that what lies beyond the edge blurs into the frame.
+M_LRect DepthOfFieldRect(const SY_TRLayer& renderable, const PF_World& destination) {
+    const double* b = renderable.bounds;
+    const int32_t* m = renderable.dofMargin;
+    M_LRect rect{std::max(static_cast<int32_t>(std::floor(b[0])), 0),
+                 std::max(static_cast<int32_t>(std::floor(b[1])), 0),
+                 std::min(static_cast<int32_t>(std::ceil(b[2])), destination.width),
+                 std::min(static_cast<int32_t>(std::ceil(b[3])), destination.height)};
+    if (rect.left == 0) rect.left += m[0];
+    if (rect.top == 0) rect.top += m[1];
+    if (rect.right == destination.width) rect.right += m[2];
+    if (rect.bottom == destination.height) rect.bottom += m[3];
+    return rect;
+}
+
+// Drawn flat into a depth-of-field buffer, then combined into the target blurred by depth.
+void DrawThroughDepthOfField(SY_RenderContext* context, SY_TRLayer* renderable,
+                             const SY_CameraView& camera, SY_Shader* shader,
+                             const SY_RenderTarget& target) {
+    const SY_CameraDOFDesc& dof = context->scene->dof;
+    if (!context->dofKernels) context->dofKernels = BuildShapeKernels(dof);
+    std::unique_ptr<SY_DOFBuffer> buffer =
+        SY_DOFBuffer::New(DepthOfFieldRect(*renderable, *context->destination),
+                          context->destination->GetBitDepth(), dof, context->dofKernels);
+    renderable->Render(context, camera, shader, 0, SY_RenderTarget(buffer->Target()));
+    buffer->PrepareTables();
+    SY_CombineDepthOfField(context, *renderable, camera, shader, *buffer, target);
+}
+
 void DrawRenderable(SY_RenderContext* context, SY_TRLayer* renderable,
                     const SY_RenderTarget& target) {
     if (renderable->material.renders) {
         std::unique_ptr<SY_LayerShader> shader = SY_MakeLayerShader(context, *renderable);
         SY_CameraView camera =
             renderable->material.motionBlur ? MotionCamera(*context) : FrameCamera(*context);
-        renderable->Render(context, camera, shader.get(), context->scene->fieldMode, target);
+        if (NeedsDepthOfField(*context, *renderable)) {
+            DrawThroughDepthOfField(context, renderable, camera, shader.get(), target);
+        } else {
+            renderable->Render(context, camera, shader.get(), context->scene->fieldMode, target);
+        }
     }
     if (renderable->material.wireframe) DrawOutline(*context->destination, *renderable);
 }

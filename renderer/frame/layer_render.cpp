@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
+#include "renderer/dof/dof_buffer.h"
+#include "renderer/frame/layer_render.h"
 #include "renderer/raster/image_span.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_deliveries.h"
@@ -87,7 +89,7 @@ void CountDone(SY_RenderContext* context) {
 }
 
 void RunRows(SY_RenderContext* context, int32_t firstRow, int32_t rows, int32_t fieldMode,
-             SY_RowDrawer draw, const RowClosure& closure) {
+             SY_RowDrawer draw, const void* closure) {
     SY_RowWork work;
     work.iterate = context->iterate;
     work.progress = context->progress;
@@ -95,7 +97,7 @@ void RunRows(SY_RenderContext* context, int32_t firstRow, int32_t rows, int32_t 
     work.itemCount = rows;
     work.fieldMode = fieldMode;
     work.draw = draw;
-    work.closure = &closure;
+    work.closure = closure;
     SY_RunRowWork(work);
 }
 
@@ -108,12 +110,12 @@ void DrawGeneralPath(SY_RenderContext* context, const SY_TRLayer& renderable,
     SY_BuildSpanTable(polygon.data(), static_cast<int32_t>(polygon.size()), table);
     if (table->rows.empty()) return;
     RunRows(context, table->firstRow, static_cast<int32_t>(table->rows.size()), fieldMode, &DrawRow,
-            closure);
+            &closure);
 }
 
 // Every row of the destination, drawn whole from the layer's image in output coordinates.
 void DrawSimplePath(SY_RenderContext* context, const RowClosure& closure, int32_t fieldMode) {
-    RunRows(context, 0, context->destination->height, fieldMode, &DrawImageRow, closure);
+    RunRows(context, 0, context->destination->height, fieldMode, &DrawImageRow, &closure);
 }
 
 // The simple path's blend record, from the material as the layer's shader takes it.
@@ -131,21 +133,77 @@ SY_SpanBlend ImageBlend(const SY_Material& material, const SY_Shader* shader) {
     return blend;
 }
 
-}  // namespace
+// The simple path draws an unbounded layer from its image, unless a shadow map is being made.
+bool TakesSimplePath(const SY_TRLayer& renderable, const SY_Shader* shader) {
+    return renderable.unbounded && (!shader || shader->IsFrameShader());
+}
 
-void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, SY_Shader* shader,
-                        int32_t fieldMode, const SY_RenderTarget& target) {
-    bool simplePath = unbounded && (!shader || shader->IsFrameShader());
+SY_GeometryFlags GeometryFlagsFor(const SY_TRLayer& renderable, const SY_CameraView& camera,
+                                  const SY_Shader* shader) {
+    bool simplePath = TakesSimplePath(renderable, shader);
     SY_GeometryFlags flags;
     flags.perspective = camera.perspective;
-    flags.screenSizedTexture = collapsed && !simplePath;
+    flags.screenSizedTexture = renderable.collapsed && !simplePath;
     flags.needsSurfacePoint = shader && shader->NeedsSurfacePoint();
     flags.blurred = shader && shader->ShadowBlurRadius() != 0;
     flags.wholeLayer = simplePath;
-    flags.samplingFilter = SY_SamplingFilterOf(material);
+    flags.samplingFilter = SY_SamplingFilterOf(renderable.material);
+    return flags;
+}
 
+// A layer drawn through depth of field, taken blurred from its buffer. The buffer already
+// holds the layer lit and shadowed, so only the mode, opacity and depth remain to apply.
+struct BlurredRowClosure {
+    RowClosure rows;
+    const SY_DOFBuffer* buffer;
+    int32_t left;  // the first column drawn; rows.width columns from it
+};
+
+void DrawBlurredRow(const void* closure, int32_t row, int32_t, int32_t thread) {
+    const auto& c = *static_cast<const BlurredRowClosure*>(closure);
+    DrawMatted(
+        c.rows, c.left, c.rows.width, row, [&](int32_t x, int32_t count, const PF_World* matte) {
+            SY_RenderLayerSpanFromDOFBuffer_SwitchDepth(c.rows.blend, *c.rows.geometry, *c.buffer,
+                                                        matte, x, count, row, c.rows.blending,
+                                                        *c.rows.target, thread);
+        });
+}
+
+}  // namespace
+
+void SY_CombineDepthOfField(SY_RenderContext* context, const SY_TRLayer& renderable,
+                            const SY_CameraView& camera, const SY_Shader* shader,
+                            const SY_DOFBuffer& buffer, const SY_RenderTarget& target) {
     SY_ScreenGeometry geometry;
-    geometry.Build(*context, *this, camera.worldToScreen, camera.count, flags);
+    geometry.Build(*context, renderable, camera.worldToScreen, camera.count,
+                   GeometryFlagsFor(renderable, camera, shader));
+    if (geometry.Empty()) return;
+    MatteHold matteHold;
+    PF_World* matte = renderable.trackMatte ? matteHold.Fetch(renderable.trackMatte) : nullptr;
+    bool outsideClear = renderable.trackMatte && renderable.trackMatte->OutsideIsClear();
+    if (renderable.trackMatte && !matte && outsideClear) return;
+    const PF_World& destination = *context->destination;
+    int32_t left = std::max(buffer.originX, 0), top = std::max(buffer.originY, 0);
+    int32_t right = std::min(buffer.originX + buffer.width, destination.width);
+    int32_t bottom = std::min(buffer.originY + buffer.height, destination.height);
+    if (right <= left || bottom <= top) return;
+    const SY_Material& material = renderable.material;
+    BlurredRowClosure closure{
+        {&geometry, shader, matte, matte && outsideClear, nullptr, &target,
+         context->scene->colorSettings,
+         SY_SpanBlend{SY_DeliveredMode(material), material.opacity, SY_DepthOffset(material)},
+         right - left},
+        &buffer,
+        left};
+    RunRows(context, top, bottom - top, context->scene->fieldMode, &DrawBlurredRow, &closure);
+}
+
+void SY_TRLayer::Render(SY_RenderContext* context, const SY_CameraView& camera, SY_Shader* shader,
+                        int32_t fieldMode, const SY_RenderTarget& target) {
+    bool simplePath = TakesSimplePath(*this, shader);
+    SY_ScreenGeometry geometry;
+    geometry.Build(*context, *this, camera.worldToScreen, camera.count,
+                   GeometryFlagsFor(*this, camera, shader));
     if (!geometry.Empty()) {
         MatteHold matteHold;
         PF_World* matte = nullptr;

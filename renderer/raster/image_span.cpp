@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "pf_bit_depth.h"
+#include "renderer/dof/dof_buffer.h"
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_deliveries.h"
 #include "renderer/raster/span_routine.h"
@@ -20,9 +21,6 @@ struct ImageSpan {
     bool perspective;
 };
 
-// Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
-// key is the smallest value W takes over the pixel square, from its top-left corner, as for
-// the layer's textured spans.
 // The pixel of the image as the layer shows it: white for a layer that shows only shadows,
 // darkened by the shadows on its plane at output pixel (x, y) whose plane W is w.
 template <class P>
@@ -46,12 +44,37 @@ P Shown(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, P pixel, int3
     return pixel;
 }
 
-template <class P, class Delivery>
+// The pixels of the layer's image along the span, as they are.
+template <class P>
+struct ImagePixels {
+    static constexpr bool kBlurred = false;
+    const P* row;  // the image's row, from the span's first pixel on
+    P At(int32_t i, double) const { return row[i]; }
+};
+
+// The pixels of a depth-of-field buffer along the span, each blurred by the radius that the
+// plane's depth at the pixel calls for.
+template <class P>
+struct BlurredPixels {
+    static constexpr bool kBlurred = true;
+    const SY_DOFBufferX<P>* buffer;
+    float x;  // centre of the span's first pixel
+    float y;
+    P At(int32_t i, double w) const {
+        P pixel;
+        buffer->Sample(x + static_cast<float>(i), y, buffer->RadiusAtW(w), &pixel);
+        return pixel;
+    }
+};
+
+// Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
+// key is the smallest value W takes over the pixel square, from its top-left corner, as for
+// the layer's textured spans.
+template <class P, class Source, class Delivery>
 void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, const ImageSpan& span,
-                   const P* matte, int32_t y, Delivery& delivery, int32_t thread) {
+                   const Source& source, const P* matte, int32_t y, Delivery& delivery,
+                   int32_t thread) {
     using namespace sy_span;
-    const PF_World& image = *layer.texture;
-    const P* source = image.PixelAt<P>(span.x, y);
     const bool changed = blend.colorOnly || blend.shadows;
     const SY_SpanMapping& m = span.depth;
     const double offset = m.low - 0.5 * (m.dwdx + m.dwdy) + blend.depthOffset;
@@ -61,26 +84,31 @@ void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, co
         if (matte && matte[i].alpha == 0) continue;
         double w = m.w + i * static_cast<double>(m.dwdx);
         if (span.perspective && w <= 0) continue;
+        const P pixel = source.At(i, w);
+        // Most of a blurred layer's rectangle lies beyond its edges, where nothing is left.
+        if constexpr (Source::kBlurred) {
+            if (pixel.alpha == 0) continue;
+        }
         if constexpr (Delivery::kUsesDepth) depth.depth = static_cast<float>(w + offset);
         SY_Coverage<P> coverage =
             matte ? MatteCoverage<P>(matte[i].alpha, layerCoverage) : layerCoverage;
         if (changed) {
-            delivery.Deliver(span.x + i, Shown(blend, layer, source[i], span.x + i, y, w), coverage,
+            delivery.Deliver(span.x + i, Shown(blend, layer, pixel, span.x + i, y, w), coverage,
                              depth, thread);
         } else {
-            delivery.Deliver(span.x + i, source[i], coverage, depth, thread);
+            delivery.Deliver(span.x + i, pixel, coverage, depth, thread);
         }
     }
 }
 
-template <class P>
+template <class P, class Source>
 void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
-                 const PF_World* matteWorld, const ImageSpan& span, int32_t y,
+                 const PF_World* matteWorld, const ImageSpan& span, const Source& source, int32_t y,
                  const PF_LinearBlendingTables* tables, const SY_RenderTarget& target,
                  int32_t thread) {
     const P* matte = matteWorld ? matteWorld->PixelAt<P>(span.x, y) : nullptr;
     auto draw = [&](auto delivery) {
-        DrawFromImage(blend, layer, span, matte, y, delivery, thread);
+        DrawFromImage(blend, layer, span, source, matte, y, delivery, thread);
     };
     target.Visit(
         [&](PF_World* world) {
@@ -91,7 +119,30 @@ void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
             draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
                                              blend.mode));
         },
-        [](const auto&) {});  // the other kinds are turned away before the depth is chosen
+        [&](const SY_SpanImageRecord& record) {
+            draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});
+        },
+        [](SY_ShadowFragmentArray*) {});
+}
+
+// The span cut to the columns [left, right) and rows [top, bottom) that hold pixels, with the
+// plane's depth at its first pixel; false when nothing is left.
+bool CutSpan(const SY_ScreenGeometry& layer, int32_t x, int32_t count, int32_t y, int32_t left,
+             int32_t top, int32_t right, int32_t bottom, ImageSpan* span) {
+    if (y < top || y >= bottom) return false;
+    span->x = std::max(x, left);
+    span->count = std::min(x + count, right) - span->x;
+    if (span->count <= 0) return false;
+    span->perspective = layer.perspective;
+    span->depth.Start(layer.screenToTexture[layer.firstValid], span->x + 0.5, y + 0.5,
+                      layer.perspective, 1.0f);
+    return true;
+}
+
+// Kinds 1 and 2 take the layer's pixels, kind 3 stores them; the depth of the target and of
+// the pixels must agree.
+bool ServedKind(const SY_RenderTarget& target) {
+    return target.mode() != kSY_TargetShadowArray;
 }
 
 }  // namespace
@@ -101,8 +152,7 @@ void SY_RenderLayerSpanFromImage_SwitchDepth(const SY_SpanBlend& blend,
                                              int32_t x, int32_t count, int32_t y,
                                              const PF_LinearBlendingTables* tables,
                                              const SY_RenderTarget& target, int32_t thread) {
-    if (count <= 0) return;
-    if (target.mode() != kSY_TargetDestination && target.mode() != kSY_TargetFragmentBuffer) return;
+    if (count <= 0 || !ServedKind(target)) return;
     // An image of another depth than the target's is refused as an unknown depth is.
     int16_t depth = SY_TargetBitDepth(target);
     if (layer.texture->GetBitDepth() != depth) depth = 0;
@@ -110,15 +160,45 @@ void SY_RenderLayerSpanFromImage_SwitchDepth(const SY_SpanBlend& blend,
         depth,
         [&]<class P>() {
             const PF_World& image = *layer.texture;
-            if (y < 0 || y >= image.height) return;
+            // A store reaches no further than the pixels it stores into.
+            int32_t left = 0, top = 0, right = image.width, bottom = image.height;
+            target.Visit([](const auto&) {},
+                         [&](const SY_SpanImageRecord& record) {
+                             left = std::max(left, record.x0);
+                             top = std::max(top, record.y0);
+                             right = std::min(right, record.x0 + record.image->width);
+                             bottom = std::min(bottom, record.y0 + record.image->height);
+                         });
             ImageSpan span;
-            span.x = std::max(x, 0);
-            span.count = std::min(x + count, image.width) - span.x;
-            if (span.count <= 0) return;
-            span.perspective = layer.perspective;
-            span.depth.Start(layer.screenToTexture[layer.firstValid], span.x + 0.5, y + 0.5,
-                             layer.perspective, 1.0f);
-            DrawAtDepth<P>(blend, layer, matte, span, y, tables, target, thread);
+            if (!CutSpan(layer, x, count, y, left, top, right, bottom, &span)) return;
+            DrawAtDepth<P>(blend, layer, matte, span, ImagePixels<P>{image.PixelAt<P>(span.x, y)},
+                           y, tables, target, thread);
         },
         U_BitDepthVerification("Unexpected bitdepth in SY_RenderLayerSpanFromImage_SwitchDepth()"));
+}
+
+void SY_RenderLayerSpanFromDOFBuffer_SwitchDepth(const SY_SpanBlend& blend,
+                                                 const SY_ScreenGeometry& layer,
+                                                 const SY_DOFBuffer& buffer, const PF_World* matte,
+                                                 int32_t x, int32_t count, int32_t y,
+                                                 const PF_LinearBlendingTables* tables,
+                                                 const SY_RenderTarget& target, int32_t thread) {
+    if (count <= 0 || target.mode() == kSY_TargetDepthOfField || !ServedKind(target)) return;
+    int16_t depth = SY_TargetBitDepth(target);
+    if (buffer.GetBitDepth() != depth) depth = 0;
+    PF_DispatchBitDepth(
+        depth,
+        [&]<class P>() {
+            ImageSpan span;
+            if (!CutSpan(layer, x, count, y, buffer.originX, buffer.originY,
+                         buffer.originX + buffer.width, buffer.originY + buffer.height, &span)) {
+                return;
+            }
+            BlurredPixels<P> source{static_cast<const SY_DOFBufferX<P>*>(&buffer),
+                                    static_cast<float>(span.x) + 0.5f,
+                                    static_cast<float>(y) + 0.5f};
+            DrawAtDepth<P>(blend, layer, matte, span, source, y, tables, target, thread);
+        },
+        U_BitDepthVerification(
+            "Unexpected bitdepth in SY_RenderLayerSpanFromDOFBuffer_SwitchDepth()"));
 }

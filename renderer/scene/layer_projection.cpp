@@ -4,6 +4,8 @@
 #include <cmath>
 #include <cstring>
 
+#include "bee_engine.h"
+#include "renderer/scene/dof_model.h"
 #include "renderer/scene/messages.h"
 
 namespace {
@@ -82,8 +84,33 @@ bool KeepWhere(SY_Polygon* polygon, SY_Polygon* scratch, Distance distance) {
     return !polygon->empty();
 }
 
+// The margin by which the camera's blur widens a layer whose transformed corners are given:
+// the largest blur radius at a corner (depth along the layer is linear in 1/W, so no point
+// between them blurs more), spread by the iris. Blur under half a pixel adds nothing.
+void DepthOfFieldMargin(const SY_CameraDOFDesc& dof, const SY_Polygon& corners, bool perspective,
+                        int32_t margin[4]) {
+    const SY_DOFModel model(dof);
+    float radius = 0;
+    for (const SY_Vertex& v : corners) {
+        if (!perspective) break;  // an orthographic camera has no depth of field
+        radius =
+            std::max(radius, std::fabs(v.w) > 1e-12 ? model.RadiusAtW(1 / v.w) : model.maxRadius);
+    }
+    if (radius < 0.5f) return;
+    const auto xStretch = static_cast<float>(SY_DOFXScale(dof));
+    // A box blur spreads as a round iris without turn or aspect does.
+    if (dof.irisShape < 3) {
+        BEE_ComputeDOFExpansionRect(1, xStretch, 0, radius, margin);
+    } else {
+        BEE_ComputeDOFExpansionRect(static_cast<float>(dof.irisAspect), xStretch,
+                                    static_cast<float>(dof.irisRotation), radius, margin);
+    }
+}
+
+// dof, when given, sets margin and widens the clip rectangle by it.
 void ProjectQuadrilateral(const SY_LayerDesc& layer, const M_Matrix4& layerToScreen,
-                          bool perspective, const SY_SetUpOptions& options, SY_Polygon* polygon,
+                          bool perspective, const SY_SetUpOptions& options,
+                          const SY_CameraDOFDesc* dof, int32_t margin[4], SY_Polygon* polygon,
                           SY_Polygon* scratch) {
     // Best quality samples half a pixel beyond the source so that its edges are filtered.
     double grow = layer.material.bestQuality ? 0.5 : 0.0;
@@ -99,6 +126,7 @@ void ProjectQuadrilateral(const SY_LayerDesc& layer, const M_Matrix4& layerToScr
         ThrowIfFailed(M_TransformVector4NoDivide(&layerToScreen, corner, v));
         polygon->push_back({v[0], v[1], v[2], v[3]});
     }
+    if (dof) DepthOfFieldMargin(*dof, *polygon, perspective, margin);
 
     if (perspective) {
         if (!KeepWhere(polygon, scratch, [](const SY_Vertex& v) { return v.w - kNearLimit; })) {
@@ -115,8 +143,8 @@ void ProjectQuadrilateral(const SY_LayerDesc& layer, const M_Matrix4& layerToScr
     }
     if (options.noClip) return;
     const SY_ScreenRect& r = options.output;
-    double x0 = r.x0 + kClipInset, x1 = r.x1 - kClipInset;
-    double y0 = r.y0 + kClipInset, y1 = r.y1 - kClipInset;
+    double x0 = r.x0 + margin[0] + kClipInset, x1 = r.x1 + margin[2] - kClipInset;
+    double y0 = r.y0 + margin[1] + kClipInset, y1 = r.y1 + margin[3] - kClipInset;
     if (!KeepWhere(polygon, scratch, [x0](const SY_Vertex& v) { return v.x - x0; })) return;
     if (!KeepWhere(polygon, scratch, [x1](const SY_Vertex& v) { return x1 - v.x; })) return;
     if (!KeepWhere(polygon, scratch, [y0](const SY_Vertex& v) { return v.y - y0; })) return;
@@ -165,6 +193,7 @@ bool SY_SetUpRenderable(const SY_LayerDesc& layer, const SY_CameraView& camera,
     double depthShift = camera.perspective ? -options.depthOffset : options.depthOffset;
 
     bool projected = false;
+    bool dofMeasured = false;
     SY_Polygon scratch;
     for (int32_t i = 0; i < count; ++i) {
         SY_Subsample& subsample = renderable->subsamples[i];
@@ -181,11 +210,25 @@ bool SY_SetUpRenderable(const SY_LayerDesc& layer, const SY_CameraView& camera,
         if (options.fill && layer.unbounded) {
             FillOutput(subsample, options.output, &subsample.vertices);
         } else {
-            ProjectQuadrilateral(layer, layerToScreen, camera.perspective, options,
-                                 &subsample.vertices, &scratch);
+            // The blur margin is measured once, on the first subsample that gets here.
+            const SY_CameraDOFDesc* dof =
+                options.dof && options.dof->enabled && !dofMeasured ? options.dof : nullptr;
+            dofMeasured = dofMeasured || dof;
+            ProjectQuadrilateral(layer, layerToScreen, camera.perspective, options, dof,
+                                 renderable->dofMargin, &subsample.vertices, &scratch);
         }
         ExtendBounds(subsample.vertices, renderable->bounds);
         projected = projected || !subsample.vertices.empty();
+    }
+    const int32_t* m = renderable->dofMargin;
+    if (projected && m[0] != m[2] && m[1] != m[3]) {
+        // Blur reaches beyond the layer, but the frame ends at the output.
+        const SY_ScreenRect& r = options.output;
+        double* b = renderable->bounds;
+        b[0] = std::clamp(b[0] + m[0], r.x0, r.x1);
+        b[1] = std::clamp(b[1] + m[1], r.y0, r.y1);
+        b[2] = std::clamp(b[2] + m[2], r.x0, r.x1);
+        b[3] = std::clamp(b[3] + m[3], r.y0, r.y1);
     }
     return projected;
 }

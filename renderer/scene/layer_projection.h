@@ -16,8 +16,8 @@ struct SY_SetUpOptions {
     // Separates a coplanar stack: the frame driver passes depthIndex × 1e-7. A larger offset
     // puts the layer farther from the camera, whichever way the projection counts depth.
     double depthOffset = 0;
-    // Depth of field of the camera, or null. The margin it adds is not computed yet: dofMargin
-    // stays zero.
+    // Depth of field of the camera, or null. When it is on, the blur at the layer's corners
+    // sets the renderable's dofMargin, which widens the clip rectangle and the bounds.
     const SY_CameraDOFDesc* dof = nullptr;
     double margin = 0;  // output pixels by which the quadrilateral grows on every side
     SY_ScreenRect output;

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 
 #include "m_matrix.h"
 #include "pf_iterate.h"
@@ -14,6 +15,8 @@
 #include "renderer/scene/scene_desc.h"
 #include "renderer/scene/specular_table.h"
 #include "renderer/scene/sum_table_cache.h"
+
+struct ShapeKernelArray;
 
 struct SY_RenderContext {
     const SY_SceneDesc* scene = nullptr;
@@ -33,6 +36,8 @@ struct SY_RenderContext {
     int32_t renderableCount = 0;
     int32_t renderablesDone = 0;
     SY_SpecularTables specularTables;
+    // The camera's iris kernels, made when the first layer needs them.
+    std::shared_ptr<const ShapeKernelArray> dofKernels;
     // Caster textures' sums while shadow maps are built; a cache, so filled through const.
     mutable SY_SumTableCache shadowSums;
 };

@@ -65,8 +65,8 @@ protected:
 TYPED_TEST_SUITE(Span, renderer_test::PixelTypes);
 
 // A span draws exactly its pixels, each showing the texel under it; an image span only those
-// the image has. A store target takes them at its image's origin (3, 1), unblended; targets a
-// dispatcher has no routine for receive nothing.
+// the image has. A store target takes them at its image's origin (3, 1), unblended, and no
+// further; shadow arrays receive nothing from either dispatcher.
 TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
     using P = TypeParam;
     struct Case {
@@ -84,7 +84,7 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
         {true, kSY_TargetDestination, 3, 5, 2, 3, 8},
         {true, kSY_TargetDestination, -4, 30, 5, 0, 16},  // clipped to the image
         {true, kSY_TargetDestination, 0, 16, 8, 0, 0},    // the row below the image
-        {true, kSY_TargetDepthOfField, 0, 16, 2, 0, 0},
+        {true, kSY_TargetDepthOfField, 0, 16, 2, 3, 16},  // from the store's first column
         {true, kSY_TargetShadowArray, 0, 16, 2, 0, 0},
     };
     for (const Case& c : cases) {

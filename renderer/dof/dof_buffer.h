@@ -1,0 +1,79 @@
+// The depth-of-field buffer: a layer drawn flat into pixels, then read back blurred, each
+// output pixel averaging the layer over the blur its depth calls for.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+
+#include "m_matrix.h"
+#include "pf_tables.h"
+#include "pf_world.h"
+#include "renderer/dof/shape_kernels.h"
+#include "renderer/scene/dof_model.h"
+#include "renderer/scene/render_target.h"
+#include "renderer/scene/scene_desc.h"
+
+template <class P>
+class SY_DOFBufferX;
+
+// Use: New; draw the layer into Target(); PrepareTables; Sample from any number of threads;
+// destroy. Iris shapes below 3 blur with a box over a summed-area table; the others walk the
+// iris kernels over per-row sums, with highlights boosted.
+class SY_DOFBuffer : public PF_PixelContainer<SY_DOFBufferX<PF_Pixel8>, SY_DOFBufferX<PF_Pixel16>,
+                                              SY_DOFBufferX<PF_PixelFloat>> {
+public:
+    // A cleared buffer over bounds (output pixels) of the depth bitDepth, for the camera's
+    // depth of field. kernels: the frame's iris kernels, null for the simple shapes. Reports
+    // and throws 3 for a depth other than 8, 16 or 32, and throws 4 without memory.
+    static std::unique_ptr<SY_DOFBuffer> New(const M_LRect& bounds, int16_t bitDepth,
+                                             const SY_CameraDOFDesc& dof,
+                                             std::shared_ptr<const ShapeKernelArray> kernels);
+
+    // Builds the sums that sampling reads, once the layer is drawn. Throws 4 without memory.
+    virtual void PrepareTables() = 0;
+
+    // Where a layer render stores its pixels.
+    virtual SY_SpanImageRecord Target() = 0;
+
+    // The blur radius in output pixels at a point of screen W (zoom over eye depth).
+    float RadiusAtW(double w) const { return model.RadiusAtW(w); }
+
+    int32_t originX, originY;  // the buffer's top-left pixel in output coordinates
+    int32_t width, height;
+    float xScale;  // a blur is this much wider than high, so that it is round on screen
+    SY_DOFModel model;
+    double irisShape;
+    double irisAspect;
+    double irisRotation;
+    double highlightGain;       // fraction
+    double highlightThreshold;  // fraction of full scale
+    double highlightSaturation;
+
+protected:
+    SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof);
+};
+
+template <class P>
+class SY_DOFBufferX final : public SY_DOFBuffer {
+public:
+    SY_DOFBufferX(const M_LRect& bounds, const SY_CameraDOFDesc& dof,
+                  std::shared_ptr<const ShapeKernelArray> kernels);
+
+    int16_t GetBitDepth() const override { return PF_PixelTraits<P>::kBitDepth; }
+    void PrepareTables() override;
+    SY_SpanImageRecord Target() override { return {&world, originX, originY}; }
+
+    P* PixelAddress(int32_t x, int32_t y) { return world.Row(y - originY) + (x - originX); }
+
+    // The layer at output point (x, y) (pixel centres at half pixels) blurred over radius
+    // output pixels. A radius too small to show gives the drawn pixel itself.
+    void Sample(float x, float y, float radius, P* out) const;
+
+private:
+    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const;
+
+    PF_WorldX<P> world;
+    std::unique_ptr<PF_SummedAreaTable> areaTable;
+    std::unique_ptr<PF_HorizontalSumTable<P>> rowTable;
+    std::shared_ptr<const ShapeKernelArray> kernels;
+};
