@@ -139,5 +139,28 @@ TEST(ReferenceImages, EveryExampleAtEveryDepth) {
     }
 }
 
+// Blur reaches into a region from layers beyond its edges: a region renders the very pixels
+// of the full frame.
+TEST(ReferenceImages, ARegionOfABlurredFrameIsThatPartOfTheFullFrame) {
+    TempFolder folder;
+    auto render = [&](const std::string& file, const std::string& options) {
+        std::string command = "'" OSTREL_PROGRAM "' render '" +
+                              (kExamples / "depth-of-field/depth-of-field.json").string() +
+                              "' -o '" + (folder.Path() / file).string() + "' --frames 0 " +
+                              options + " >/dev/null";
+        return std::system(command.c_str());
+    };
+    ASSERT_EQ(render("full.tif", "--depth 32"), 0);
+    ASSERT_EQ(render("region.tif", "--depth 32 --region 350,100,700,400"), 0);
+    Image full = Read(folder.Path() / "full.tif"), region = Read(folder.Path() / "region.tif");
+    ASSERT_EQ(region.width, 350);
+    Image cut{350, 300, {}};
+    for (int y = 100; y < 400; ++y) {
+        auto row = full.pixels.begin() + (static_cast<ptrdiff_t>(y) * full.width + 350) * 4;
+        cut.pixels.insert(cut.pixels.end(), row, row + 350 * 4);
+    }
+    EXPECT_EQ(Compare(region, cut, 32), "");
+}
+
 }  // namespace
 }  // namespace ostrel
