@@ -101,6 +101,11 @@ TEST(Capture, OrthographicCameraAndDownsampleReachTheDepthOfField) {
     EXPECT_EQ(std::tuple(scene.dof.zoom, scene.dof.focusDistance, scene.dof.blurLevel,
                          scene.dof.irisShape, scene.dof.irisRoundness),
               std::tuple(0, 900, 1.2, 6, 0.3));
+    // The comp's switch for lights and depth of field turns the camera's blur off.
+    ServedFrame off(
+        CompJson(R"("lightsAndDepthOfField": false)", kOrthographicCamera + kMovingCard));
+    Assemble(off, &scene);
+    EXPECT_FALSE(scene.dof.enabled);
 }
 
 // A card, a light and a light that is switched off.
