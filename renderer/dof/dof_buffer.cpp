@@ -81,8 +81,13 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
         // A box of half a pixel each way is the pixel itself.
         float rx = std::max(xScale * radius, 0.5f), ry = std::max(radius, 0.5f);
         if (rx == 0.5f && ry == 0.5f) return drawn();
-        PF_SummedAreaTable_SampleAA(width, height, areaTable->DoubleSums(), lx - rx, ly - ry,
-                                    lx + rx, ly + ry, out);
+        float x0 = lx - rx, y0 = ly - ry, x1 = lx + rx, y1 = ly + ry;
+        if (averagesWithin) {
+            x0 = std::max(x0, 0.0f), y0 = std::max(y0, 0.0f);
+            x1 = std::min(x1, static_cast<float>(width)),
+            y1 = std::min(y1, static_cast<float>(height));
+        }
+        PF_SummedAreaTable_SampleAA(width, height, areaTable->DoubleSums(), x0, y0, x1, y1, out);
         return;
     }
     const ShapeKernel* kernel =
@@ -93,7 +98,7 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
 
 template <class P>
 void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
-    double sum[4] = {0, 0, 0, 0};
+    double sum[4] = {0, 0, 0, 0}, weight = 0;  // weight: of the pixels within the buffer
     const ShapeKernel::Segment* segments = kernel.Segments();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != kernel.Rows() + kernel.RowCount();
          ++row) {
@@ -107,13 +112,18 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_
             const PF_PixelDouble& a = sums[x0];
             const PF_PixelDouble& b = sums[x1];
             const double w = s.weight;
+            weight += w * (x1 - x0);
             sum[0] += (b.alpha - a.alpha) * w;
             sum[1] += (b.red - a.red) * w;
             sum[2] += (b.green - a.green) * w;
             sum[3] += (b.blue - a.blue) * w;
         }
     }
-    const double n = kernel.Normalization();
+    if (!(weight > 0)) {
+        *out = P{};
+        return;
+    }
+    const double n = averagesWithin ? 1 / weight : kernel.Normalization();
     pf_tables::StoreAverage(
         PF_Float4{static_cast<float>(std::min(sum[0] * n, 1.0)), static_cast<float>(sum[1] * n),
                   static_cast<float>(sum[2] * n), static_cast<float>(sum[3] * n)},

@@ -48,6 +48,9 @@ public:
     double highlightGain;       // fraction
     double highlightThreshold;  // fraction of full scale
     double highlightSaturation;
+    // Blur averages over the buffer's pixels only, as for a layer that goes on beyond them
+    // (an unbounded layer, whose image ends with the output); otherwise beyond is clear.
+    bool averagesWithin = false;
 
 protected:
     SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof);

@@ -76,6 +76,7 @@ bool NeedsDepthOfField(const SY_RenderContext& context, const SY_TRLayer& render
 
 // The layer's pixel rectangle within the output, widened on the sides where it meets the
 // output's edge by the blur margin, so that what lies beyond the edge blurs into the frame.
+// An unbounded layer's image ends with the output: its rectangle does too.
 M_LRect DepthOfFieldRect(const SY_TRLayer& renderable, const PF_World& destination) {
     const double* b = renderable.bounds;
     const int32_t* m = renderable.dofMargin;
@@ -83,6 +84,7 @@ M_LRect DepthOfFieldRect(const SY_TRLayer& renderable, const PF_World& destinati
                  std::max(static_cast<int32_t>(std::floor(b[1])), 0),
                  std::min(static_cast<int32_t>(std::ceil(b[2])), destination.width),
                  std::min(static_cast<int32_t>(std::ceil(b[3])), destination.height)};
+    if (renderable.unbounded) return rect;
     if (rect.left == 0) rect.left += m[0];
     if (rect.top == 0) rect.top += m[1];
     if (rect.right == destination.width) rect.right += m[2];
@@ -99,6 +101,7 @@ void DrawThroughDepthOfField(SY_RenderContext* context, SY_TRLayer* renderable,
     std::unique_ptr<SY_DOFBuffer> buffer =
         SY_DOFBuffer::New(DepthOfFieldRect(*renderable, *context->destination),
                           context->destination->GetBitDepth(), dof, context->dofKernels);
+    buffer->averagesWithin = renderable->unbounded;
     renderable->Render(context, camera, shader, 0, SY_RenderTarget(buffer->Target()));
     buffer->PrepareTables();
     SY_CombineDepthOfField(context, *renderable, camera, shader, *buffer, target);

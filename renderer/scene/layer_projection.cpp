@@ -84,18 +84,16 @@ bool KeepWhere(SY_Polygon* polygon, SY_Polygon* scratch, Distance distance) {
     return !polygon->empty();
 }
 
-// The margin by which the camera's blur widens a layer whose transformed corners are given:
-// the largest blur radius at a corner (depth along the layer is linear in 1/W, so no point
-// between them blurs more), spread by the iris. Blur under half a pixel adds nothing.
-void DepthOfFieldMargin(const SY_CameraDOFDesc& dof, const SY_Polygon& corners, bool perspective,
+// The margin by which the camera's blur widens a layer, from its plane's screen W (zoom over
+// eye depth; 0 at or behind the camera's plane) at the corners of what it covers: the largest
+// blur radius at a corner (depth along the layer is linear in W, so no point between them
+// blurs more), spread by the iris. Blur under half a pixel adds nothing.
+void DepthOfFieldMargin(const SY_CameraDOFDesc& dof, const double (&cornerW)[4],
                         int32_t margin[4]) {
     const SY_DOFModel model(dof);
     float radius = 0;
-    for (const SY_Vertex& v : corners) {
-        if (!perspective) break;  // an orthographic camera has no depth of field
-        radius =
-            std::max(radius, std::fabs(v.w) > 1e-12 ? model.RadiusAtW(1 / v.w) : model.maxRadius);
-    }
+    for (double w : cornerW)
+        radius = std::max(radius, model.RadiusAtW(w));
     if (radius < 0.5f) return;
     const auto xStretch = static_cast<float>(SY_DOFXScale(dof));
     // A box blur spreads as a round iris without turn or aspect does.
@@ -126,7 +124,14 @@ void ProjectQuadrilateral(const SY_LayerDesc& layer, const M_Matrix4& layerToScr
         ThrowIfFailed(M_TransformVector4NoDivide(&layerToScreen, corner, v));
         polygon->push_back({v[0], v[1], v[2], v[3]});
     }
-    if (dof) DepthOfFieldMargin(*dof, *polygon, perspective, margin);
+    if (dof && perspective) {  // an orthographic camera has no depth of field
+        double cornerW[4];
+        for (int k = 0; k < 4; ++k) {
+            double w = (*polygon)[static_cast<size_t>(k)].w;
+            cornerW[k] = std::fabs(w) > 1e-12 ? 1 / w : 0;
+        }
+        DepthOfFieldMargin(*dof, cornerW, margin);
+    }
 
     if (perspective) {
         if (!KeepWhere(polygon, scratch, [](const SY_Vertex& v) { return v.w - kNearLimit; })) {
@@ -207,13 +212,17 @@ bool SY_SetUpRenderable(const SY_LayerDesc& layer, const SY_CameraView& camera,
         if (renderable->firstValid < 0) renderable->firstValid = i;
         renderable->lastValid = i;
 
+        // The blur margin is measured once, on the first subsample that gets here.
+        const SY_CameraDOFDesc* dof =
+            options.dof && options.dof->enabled && !dofMeasured ? options.dof : nullptr;
+        dofMeasured = dofMeasured || dof;
         if (options.fill && layer.unbounded) {
             FillOutput(subsample, options.output, &subsample.vertices);
+            // The corners lie on the plane, at its screen depth, which is W.
+            const SY_Polygon& v = subsample.vertices;
+            if (dof && camera.perspective)
+                DepthOfFieldMargin(*dof, {v[0].z, v[1].z, v[2].z, v[3].z}, renderable->dofMargin);
         } else {
-            // The blur margin is measured once, on the first subsample that gets here.
-            const SY_CameraDOFDesc* dof =
-                options.dof && options.dof->enabled && !dofMeasured ? options.dof : nullptr;
-            dofMeasured = dofMeasured || dof;
             ProjectQuadrilateral(layer, layerToScreen, camera.perspective, options, dof,
                                  renderable->dofMargin, &subsample.vertices, &scratch);
         }
