@@ -40,6 +40,8 @@ public:
     const Row* Rows() const { return rows_; }
     int32_t RowCount() const { return rowCount_; }
     const Segment* Segments() const { return segments_; }
+    // The offsets every run lies within: left, top, right and bottom, inclusive.
+    const int32_t* Extent() const { return extent_; }
     // One over the sum of every pixel's weight: a flat image blurs to itself.
     float Normalization() const { return normalization_; }
 
@@ -47,6 +49,7 @@ private:
     Row* rows_ = nullptr;
     Segment* segments_ = nullptr;  // in the same block as the rows
     int32_t rowCount_ = 0;
+    int32_t extent_[4] = {0, 0, 0, 0};
     size_t bytes_ = 0;
     float normalization_ = 1;
 };

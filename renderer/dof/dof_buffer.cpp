@@ -96,37 +96,64 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
     SampleKernel(*kernel, ix, iy, out);
 }
 
-template <class P>
-void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
-    double sum[4] = {0, 0, 0, 0}, weight = 0;  // weight: of the pixels within the buffer
+namespace {
+
+// Adds the kernel's runs around (x, y) over the row sums of a width × height world to sum
+// (alpha and red, green and blue) and returns the weight of the pixels read. kClipped: the
+// kernel reaches beyond the world, whose rows and ends are then kept within it.
+template <bool kClipped, class Table>
+double AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y, int32_t width,
+                 int32_t height, __m128d sum[2]) {
+    double weight = 0;
     const ShapeKernel::Segment* segments = kernel.Segments();
-    for (const ShapeKernel::Row* row = kernel.Rows(); row != kernel.Rows() + kernel.RowCount();
-         ++row) {
+    const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+    for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
-        if (yy < 0 || yy >= height) continue;
-        const PF_PixelDouble* sums = rowTable->Row(yy);
-        for (int32_t k = row->firstSegment; k < row->firstSegment + row->segmentCount; ++k) {
-            const ShapeKernel::Segment& s = segments[k];
-            const int32_t x0 = std::clamp(x + s.x, 0, width);
-            const int32_t x1 = std::clamp(x + s.x + s.length, 0, width);
-            const PF_PixelDouble& a = sums[x0];
-            const PF_PixelDouble& b = sums[x1];
-            const double w = s.weight;
-            weight += w * (x1 - x0);
-            sum[0] += (b.alpha - a.alpha) * w;
-            sum[1] += (b.red - a.red) * w;
-            sum[2] += (b.green - a.green) * w;
-            sum[3] += (b.blue - a.blue) * w;
+        if (kClipped && (yy < 0 || yy >= height)) continue;
+        const double* sums = &table.Row(yy)[0].alpha;
+        const ShapeKernel::Segment* s = segments + row->firstSegment;
+        for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
+            int32_t x0 = x + s->x, x1 = x0 + s->length;
+            if constexpr (kClipped) {
+                x0 = std::clamp(x0, 0, width);
+                x1 = std::clamp(x1, 0, width);
+                weight += static_cast<double>(s->weight) * (x1 - x0);
+            }
+            const double* a = sums + 4 * ptrdiff_t(x0);
+            const double* b = sums + 4 * ptrdiff_t(x1);
+            const __m128d w = _mm_set1_pd(s->weight);
+            sum[0] =
+                _mm_add_pd(sum[0], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b), _mm_loadu_pd(a)), w));
+            sum[1] = _mm_add_pd(
+                sum[1], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b + 2), _mm_loadu_pd(a + 2)), w));
         }
     }
-    if (!(weight > 0)) {
-        *out = P{};
-        return;
+    return weight;
+}
+
+}  // namespace
+
+template <class P>
+void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
+    __m128d sum[2] = {_mm_setzero_pd(), _mm_setzero_pd()};
+    const int32_t* e = kernel.Extent();
+    double n = kernel.Normalization();
+    if (x + e[0] >= 0 && x + e[2] < width && y + e[1] >= 0 && y + e[3] < height) {
+        AddKernel<false>(kernel, *rowTable, x, y, width, height, sum);
+    } else {
+        const double weight = AddKernel<true>(kernel, *rowTable, x, y, width, height, sum);
+        if (!(weight > 0)) {
+            *out = P{};
+            return;
+        }
+        if (averagesWithin) n = 1 / weight;
     }
-    const double n = averagesWithin ? 1 / weight : kernel.Normalization();
+    double v[4];
+    _mm_storeu_pd(v, sum[0]);
+    _mm_storeu_pd(v + 2, sum[1]);
     pf_tables::StoreAverage(
-        PF_Float4{static_cast<float>(std::min(sum[0] * n, 1.0)), static_cast<float>(sum[1] * n),
-                  static_cast<float>(sum[2] * n), static_cast<float>(sum[3] * n)},
+        PF_Float4{static_cast<float>(std::min(v[0] * n, 1.0)), static_cast<float>(v[1] * n),
+                  static_cast<float>(v[2] * n), static_cast<float>(v[3] * n)},
         1.0f, out);
 }
 

@@ -90,6 +90,8 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
     auto add = [&](int32_t x0, int32_t x1, double weight) {
         if (x1 < x0 || !(weight > 0)) return;
         segments_[segmentCount++] = {x0, x1 - x0 + 1, static_cast<float>(weight)};
+        extent_[0] = std::min(extent_[0], x0);
+        extent_[2] = std::max(extent_[2], x1);
         total += (x1 - x0 + 1) * weight;
     };
     const double rim = 1 + std::max(fringe, 0.0);
@@ -125,7 +127,11 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
             add(i1 + 1, m1, share * rim);
             add(p1, p1, share * (xr - (p1 - 0.5)) * weightOf(p1));
         }
-        if (segmentCount > rowStart) rows_[rowCount_++] = {dy, rowStart, segmentCount - rowStart};
+        if (segmentCount > rowStart) {
+            rows_[rowCount_++] = {dy, rowStart, segmentCount - rowStart};
+            extent_[1] = std::min(extent_[1], dy);
+            extent_[3] = std::max(extent_[3], dy);
+        }
     }
     normalization_ = total > 0 ? static_cast<float>(1 / total) : 0.0f;
 }
