@@ -96,11 +96,16 @@ M_LRect DepthOfFieldRect(const SY_TRLayer& renderable, const PF_World& destinati
 void DrawThroughDepthOfField(SY_RenderContext* context, SY_TRLayer* renderable,
                              const SY_CameraView& camera, SY_Shader* shader,
                              const SY_RenderTarget& target) {
+    const M_LRect rect = DepthOfFieldRect(*renderable, *context->destination);
+    if (rect.right <= rect.left || rect.bottom <= rect.top) {
+        // Nothing on screen to blur; the render still counts the layer as done.
+        renderable->Render(context, camera, shader, context->scene->fieldMode, target);
+        return;
+    }
     const SY_CameraDOFDesc& dof = context->scene->dof;
     if (!context->dofKernels) context->dofKernels = BuildShapeKernels(dof);
     std::unique_ptr<SY_DOFBuffer> buffer =
-        SY_DOFBuffer::New(DepthOfFieldRect(*renderable, *context->destination),
-                          context->destination->GetBitDepth(), dof, context->dofKernels);
+        SY_DOFBuffer::New(rect, context->destination->GetBitDepth(), dof, context->dofKernels);
     buffer->averagesWithin = renderable->unbounded;
     renderable->Render(context, camera, shader, 0, SY_RenderTarget(buffer->Target()));
     buffer->PrepareTables();
