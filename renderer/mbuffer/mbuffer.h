@@ -81,3 +81,37 @@ public:
 extern template class SY_MBufferDraftX<PF_Pixel8>;
 extern template class SY_MBufferDraftX<PF_Pixel16>;
 extern template class SY_MBufferDraftX<PF_PixelFloat>;
+
+template <class P>
+class SY_MBufferAAX;
+
+// Anti-aliased buffers keep each fragment's depth plane over the pixel, so that layers passing
+// through each other inside a pixel share it by the area each is in front in. Edge coverage is
+// already in the fragments' alpha.
+class SY_MBufferAA : public SY_MBuffer,
+                     public PF_PixelContainer<SY_MBufferAAX<PF_Pixel8>, SY_MBufferAAX<PF_Pixel16>,
+                                              SY_MBufferAAX<PF_PixelFloat>> {
+public:
+    bool IsAntialiased() const final { return true; }
+    bool HasMotionBlur() const final { return false; }
+};
+
+template <class P>
+class SY_MBufferAAX final : public SY_MBufferAA, public SY_FragmentArray<SY_FragmentAAX<P>> {
+public:
+    using Record = SY_FragmentAAX<P>;
+
+    // Throws 4 when memory runs out.
+    explicit SY_MBufferAAX(const M_LRect& rect) : SY_FragmentArray<Record>(rect) {}
+
+    // Records whose depth ranges overlap are split inside the pixel where their planes cross;
+    // every blend passes blendTables, so the group blends in the same light as layers drawn
+    // straight. Throws 4 when the memory for splitting a pixel is not there.
+    void Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables* blendTables,
+                 PF_World& destination) override;
+    int16_t GetBitDepth() const override { return PF_PixelTraits<P>::kBitDepth; }
+};
+
+extern template class SY_MBufferAAX<PF_Pixel8>;
+extern template class SY_MBufferAAX<PF_Pixel16>;
+extern template class SY_MBufferAAX<PF_PixelFloat>;
