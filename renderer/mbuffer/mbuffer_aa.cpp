@@ -20,8 +20,11 @@ class PixelResolver {
 public:
     using P = typename F::Pixel;
 
+    // Takes the room most groups need up front: eight allocations.
     explicit PixelResolver(const PF_LinearBlendingTables* tables)
-        : tables_(tables), applier_(tables) {}
+        : tables_(tables), applier_(tables) {
+        members_.reserve(8);
+    }
 
     // Blends the list from first (the farthest record) on, group by group of records whose
     // depth ranges overlap.

@@ -18,6 +18,17 @@ class SY_RegionResolver {
 public:
     using Pixel = typename F::Pixel;
 
+    // Room for runs of a few records, taken once: seven allocations.
+    SY_RegionResolver() {
+        vertices_.reserve(64);
+        front_.reserve(16);
+        behind_.reserve(16);
+        records_.reserve(64);
+        regions_.reserve(16);
+        fresh_.reserve(16);
+        lines_.reserve(8);
+    }
+
     // Composites the run (count ≥ 3 records in list order) onto *pixel, passing tables. Writes
     // each record's position in the run into its scratchIndex.
     void Resolve(F* const* run, int32_t count, const PF_LinearBlendingTables* tables,
