@@ -212,35 +212,32 @@ TEST(MBufferDraft, ResolveBlendsWithoutTablesAndStopsAtACancel) {
     EXPECT_EQ(Channels(world.At(0, 32)), Channels(PF_Pixel8{}));
 }
 
-// A buffer made with three render threads, each filling a row one record longer than a block
-// holds: records never straddle blocks, so each row takes two. An anti-aliased buffer also
-// gets a pixel of three crossing records, and is resolved.
-template <class B>
-PF_WorldX<PF_Pixel16>& ResolvedInto() {
-    static PF_WorldX<PF_Pixel16> world(kSY_FragmentRecordBytes / sizeof(typename B::Record) + 1, 3);
-    return world;
-}
-
-template <class B>
+// A draft buffer made with three render threads, each filling a row one record longer than a
+// block holds: records never straddle blocks, so each row takes two.
 void FillBuffer() {
-    constexpr int32_t kPerBlock = kSY_FragmentRecordBytes / sizeof(typename B::Record);
-    constexpr bool kAntialiased = B::Record::kGradients == 2;
-    auto owner = SY_MBuffer::New({0, 0, kPerBlock + 1, 3}, 16, kAntialiased, false);
-    auto* buffer = static_cast<B*>(owner.get());
+    constexpr int32_t kPerBlock = kSY_FragmentRecordBytes / sizeof(Buffer::Record);
+    auto owner = SY_MBuffer::New({0, 0, kPerBlock + 1, 3}, 16, false, false);
+    auto* buffer = static_cast<Buffer*>(owner.get());
     const PF_Pixel16 p{32768, 1, 2, 3};
     for (int32_t y = 0; y < 3; ++y) {
-        for (int32_t x = 0; x <= kPerBlock; ++x) {
-            if constexpr (kAntialiased)
-                buffer->AddFragment(&p, 32768, 2, 0.0f, 0.0f, 0.0f, buffer->HeadAt(x, y), y);
-            else
-                buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), y);
-        }
+        for (int32_t x = 0; x <= kPerBlock; ++x)
+            buffer->AddFragment(&p, 32768, 2, 0.0f, buffer->HeadAt(x, y), y);
     }
-    if constexpr (kAntialiased) {
+}
+
+// An anti-aliased column of three pixels, one per thread, each of three crossing records,
+// resolved.
+void FillAndResolveAntialiased() {
+    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, false);
+    auto* buffer = static_cast<SY_MBufferAAX<PF_Pixel16>*>(owner.get());
+    const PF_Pixel16 p{32768, 1, 2, 3};
+    for (int32_t y = 0; y < 3; ++y) {
         for (float slope : {-1.0f, 1.0f, 0.5f})
-            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, buffer->HeadAt(0, 0), 0);
-        buffer->Resolve(nullptr, nullptr, ResolvedInto<B>());
+            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, buffer->HeadAt(0, y), y);
     }
+    PF_Pixel16 pixels[3] = {};
+    PF_World world(1, 3, sizeof(PF_Pixel16), 16, pixels);
+    buffer->Resolve(nullptr, nullptr, world);
 }
 
 void AppendShadowArrays() {
@@ -253,16 +250,16 @@ void AppendShadowArrays() {
 // nothing allocated.
 TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
     renderer_test::ThreadedFrame<3> frame;
-    ResolvedInto<SY_MBufferAAX<PF_Pixel16>>();  // made before any allocation fails
     const struct {
         const char* what;
         void (*work)();
         int32_t failures;
     } cases[] = {
         // Object, pool array, three pools, head table, two blocks in each pool.
-        {"draft buffer", &FillBuffer<Buffer>, 1 + 1 + 3 + 1 + 6},
-        // The same, and the eight stores of the resolve that splits pixels.
-        {"anti-aliased buffer", &FillBuffer<SY_MBufferAAX<PF_Pixel16>>, 1 + 1 + 3 + 1 + 6 + 8},
+        {"draft buffer", &FillBuffer, 1 + 1 + 3 + 1 + 6},
+        // Object, pool array, three pools, head table, a block in each pool, and the eight
+        // stores of the resolve that splits pixels.
+        {"anti-aliased buffer", &FillAndResolveAntialiased, 1 + 1 + 3 + 1 + 3 + 8},
         // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
         {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
     };
