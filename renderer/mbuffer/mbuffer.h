@@ -8,10 +8,11 @@
 //
 // A span routine (and a span from an image) asks the target's IsAntialiased, HasMotionBlur and
 // GetBitDepth once per span, casts the SY_MBuffer pointer to the concrete class with
-// static_cast (SY_MBufferDraftX<P> for a draft buffer of P's depth), takes the head of its
-// first pixel with HeadAt(x, y), and calls AddFragment for every covered pixel with
-// consecutive heads along the row and the worker's thread index as pool index. The resolve
-// puts each list in depth order before it walks it.
+// static_cast (SY_MBufferDraftX<P> or SY_MBufferAAX<P> for a draft or anti-aliased buffer of
+// P's depth), takes the head of its first pixel with HeadAt(x, y), and calls AddFragment for
+// every covered pixel with consecutive heads along the row and the worker's thread index as
+// pool index; anti-aliased records also take the depth's steps per pixel. The resolve puts
+// each list in depth order before it walks it.
 #pragma once
 
 #include <cstdint>
@@ -28,8 +29,9 @@
 class SY_MBuffer {
 public:
     // A buffer for the pixels of bounds, of the depth bitDepth (8, 16 or 32) and the class the
-    // flags ask for; motion blur implies anti-aliasing. Throws 4 when memory runs out, with
-    // nothing left allocated; any other depth is reported and throws 3. Never gives null.
+    // flags ask for; motion blur wins over anti-aliasing and, until it has a class of its
+    // own, gets the draft class. Throws 4 when memory runs out, with nothing left allocated;
+    // any other depth is reported and throws 3. Never gives null.
     static std::unique_ptr<SY_MBuffer> New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
                                            bool motionBlur);
 
