@@ -87,9 +87,7 @@ void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
             draw(SY_CompositeDelivery<P>(world->Row<P>(y), blend.mode, tables));
         },
         [&](SY_MBuffer* buffer) {
-            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
-            draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
-                                             blend.mode));
+            SY_WithFragmentDelivery<P>(buffer, span.x, y, blend.mode, draw);
         },
         [](const auto&) {});  // the other kinds are turned away before the depth is chosen
 }
