@@ -1,7 +1,8 @@
-// The draft fragment buffer over a full HD frame of eight cards that all cross one another (a
-// fan through the frame's vertical centre line), each card covering every pixel: fragments per
-// second added, layer after layer as the renderer draws them, on one thread and on all of
-// them; pixels per second resolved; and the bytes the fragment storage peaks at.
+// The draft and the anti-aliased fragment buffer over a full HD frame of eight cards that all
+// cross one another (a fan through the frame's vertical centre line), each card covering every
+// pixel: fragments per second added, layer after layer as the renderer draws them, on one
+// thread and on all of them; pixels per second resolved; and the bytes the fragment storage
+// peaks at.
 #include <benchmark/benchmark.h>
 #include <malloc.h>
 
@@ -57,21 +58,29 @@ int64_t ThreadCpuNs() {
 }
 
 // Rows of one card, handed out one at a time to `threads` workers as the host's iterator does.
-// Adds the workers' CPU time to *cpuNs.
-template <class P>
-void DrawCard(SY_MBufferDraftX<P>* buffer, int32_t card, int32_t threads,
-              std::atomic<int64_t>* cpuNs) {
+// Adds the workers' CPU time to *cpuNs. Anti-aliased records carry the card's plane, keyed by
+// its smallest value over the pixel.
+template <class B>
+void DrawCard(B* buffer, int32_t card, int32_t threads, std::atomic<int64_t>* cpuNs) {
+    using P = typename B::Record::Pixel;
+    constexpr bool kPlanes = B::Record::kGradients == 2;
     const P color = ColorOf<P>(card);
     const float slope = SlopeOf(card);
-    const float keyAtLeft = 1000.0f + (0.5f - kWidth / 2) * slope;
+    const float keyAtLeft =
+        1000.0f + (0.5f - kWidth / 2) * slope - (kPlanes ? 0.5f * std::fabs(slope) : 0.0f);
     std::atomic<int32_t> nextRow{0};
     auto work = [&](int32_t thread) {
         const int64_t start = ThreadCpuNs();
         for (int32_t y; (y = nextRow.fetch_add(1, std::memory_order_relaxed)) < kHeight;) {
             auto** head = buffer->HeadAt(0, y);
             float key = keyAtLeft;
-            for (int32_t x = 0; x < kWidth; ++x, ++head, key += slope)
-                buffer->AddFragment(&color, FullCoverage<P>(), 2, key, head, thread);
+            for (int32_t x = 0; x < kWidth; ++x, ++head, key += slope) {
+                if constexpr (kPlanes)
+                    buffer->AddFragment(&color, FullCoverage<P>(), 2, key, slope, 0.0f, head,
+                                        thread);
+                else
+                    buffer->AddFragment(&color, FullCoverage<P>(), 2, key, head, thread);
+            }
         }
         cpuNs->fetch_add(ThreadCpuNs() - start);
     };
@@ -110,30 +119,35 @@ public:
     ~FrameThreads() { SY_PrepareThreads(false, nullptr); }
 };
 
-template <class P>
+template <class B>
+std::unique_ptr<SY_MBuffer> EmptyBuffer() {
+    using P = typename B::Record::Pixel;
+    return SY_MBuffer::New(kFrame, PF_PixelTraits<P>::kBitDepth, B::Record::kGradients == 2, false);
+}
+
+template <class B>
 std::unique_ptr<SY_MBuffer> FilledBuffer(int32_t threads) {
-    auto owner = SY_MBuffer::New(kFrame, PF_PixelTraits<P>::kBitDepth, false, false);
-    auto* buffer = static_cast<SY_MBufferDraftX<P>*>(owner.get());
+    auto owner = EmptyBuffer<B>();
     std::atomic<int64_t> cpuNs{0};
     for (int32_t card = 0; card < kCards; ++card)
-        DrawCard(buffer, card, threads, &cpuNs);
+        DrawCard(static_cast<B*>(owner.get()), card, threads, &cpuNs);
     return owner;
 }
 
 using Clock = std::chrono::steady_clock;
 
-// Argument: worker threads, 0 for all of them.
-template <class P>
+// B: the buffer class. Argument: worker threads, 0 for all of them.
+template <class B>
 void BM_AddFragments(benchmark::State& state) {
     const int32_t threads = state.range(0) ? static_cast<int32_t>(state.range(0)) : AllThreads();
     FrameThreads frame(threads);
-    FilledBuffer<P>(threads);  // the first frame also pays for fresh pages: not timed
+    FilledBuffer<B>(threads);  // the first frame also pays for fresh pages: not timed
     int64_t peakBytes = 0;
     std::atomic<int64_t> cpuNs{0};
     for (auto _ : state) {
         const int64_t before = U_AccountedBytes();
-        auto owner = SY_MBuffer::New(kFrame, PF_PixelTraits<P>::kBitDepth, false, false);
-        auto* buffer = static_cast<SY_MBufferDraftX<P>*>(owner.get());
+        auto owner = EmptyBuffer<B>();
+        auto* buffer = static_cast<B*>(owner.get());
         const auto start = Clock::now();
         for (int32_t card = 0; card < kCards; ++card)
             DrawCard(buffer, card, threads, &cpuNs);
@@ -149,10 +163,11 @@ void BM_AddFragments(benchmark::State& state) {
     state.counters["peak_fragment_MiB"] = static_cast<double>(peakBytes) / (1 << 20);
 }
 
-template <class P>
+template <class B>
 void BM_Resolve(benchmark::State& state) {
+    using P = typename B::Record::Pixel;
     FrameThreads frame(1);
-    std::unique_ptr<SY_MBuffer> buffer = FilledBuffer<P>(1);
+    std::unique_ptr<SY_MBuffer> buffer = FilledBuffer<B>(1);
     PF_WorldX<P> destination(kWidth, kHeight);
     int64_t cpuNs = 0;
     for (auto _ : state) {
@@ -186,11 +201,17 @@ void Once(benchmark::internal::Benchmark* b) {
 
 }  // namespace
 
-BENCHMARK_TEMPLATE(BM_AddFragments, PF_Pixel8)->Apply(Threads);
-BENCHMARK_TEMPLATE(BM_AddFragments, PF_Pixel16)->Apply(Threads);
-BENCHMARK_TEMPLATE(BM_AddFragments, PF_PixelFloat)->Apply(Threads);
-BENCHMARK_TEMPLATE(BM_Resolve, PF_Pixel8)->Apply(Once);
-BENCHMARK_TEMPLATE(BM_Resolve, PF_Pixel16)->Apply(Once);
-BENCHMARK_TEMPLATE(BM_Resolve, PF_PixelFloat)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferDraftX<PF_Pixel8>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferDraftX<PF_Pixel16>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferDraftX<PF_PixelFloat>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_Pixel8>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_Pixel16>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_PixelFloat>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_Pixel8>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_Pixel16>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_PixelFloat>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_Pixel8>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_Pixel16>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_PixelFloat>)->Apply(Once);
 
 BENCHMARK_MAIN();

@@ -49,6 +49,10 @@ void U_SetPurgeHandler(U_PurgeHandler handler);
 // allocation beyond it fails as if the memory were not there. 0 (the default) sets no limit.
 void U_SetAllocationLimit(int64_t bytes);
 
+// The most bytes the blocks would have held, had the largest block refused since the last
+// call been given (by the limit or by the system); 0 when none was refused. Resets it.
+int64_t U_TakeRefusedDemand();
+
 // Memory-pressure simulation for testing failure paths: the nth allocation from now
 // (1 = the next) through any of the services above fails; 0 turns it off.
 void U_FailAllocationAfter(int64_t n);

@@ -156,7 +156,15 @@ void DrawThroughFragmentBuffer(SY_RenderContext* context, const SY_RenderableGro
         SY_MBuffer::New(GroupRect(group, *context->destination),
                         context->destination->GetBitDepth(), anyBest, anyMotion);
     const SY_RenderTarget target(*buffer);
-    for (SY_TRLayer* renderable : group)
+    // Layers of a stack lie 1e-7 apart per place in the render order, less than a float key
+    // can tell at most depths, and records of equal key are blended in the order they were
+    // added. Adding the bottom of a stack first keeps the top layer on top.
+    SY_RenderableGroup bottomFirst(group);
+    std::stable_sort(bottomFirst.begin(), bottomFirst.end(),
+                     [](const SY_TRLayer* a, const SY_TRLayer* b) {
+                         return a->material.depthIndex > b->material.depthIndex;
+                     });
+    for (SY_TRLayer* renderable : bottomFirst)
         DrawRenderable(context, renderable, target);
     buffer->Resolve(context->progress, context->scene->colorSettings, *context->destination);
 }

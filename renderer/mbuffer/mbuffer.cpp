@@ -10,18 +10,13 @@
 namespace {
 
 template <class P>
-SY_MBuffer* NewDraftStandingInForBestQuality(const M_LRect& bounds) {
-    return new SY_MBufferDraftX<P>(bounds);
-}
-
-template <class P>
 SY_MBuffer* NewOfQuality(SY_MBufferQuality quality, const M_LRect& bounds) {
     switch (quality) {
-        case SY_MBufferQuality::kDraft:
-            return new SY_MBufferDraftX<P>(bounds);
         case SY_MBufferQuality::kAntialiased:
-        case SY_MBufferQuality::kMotionBlur:
-            return NewDraftStandingInForBestQuality<P>(bounds);
+            return new SY_MBufferAAX<P>(bounds);
+        case SY_MBufferQuality::kDraft:
+        case SY_MBufferQuality::kMotionBlur:  // blended by draft rules until it has its own class
+            return new SY_MBufferDraftX<P>(bounds);
     }
     __builtin_unreachable();
 }

@@ -8,10 +8,11 @@
 //
 // A span routine (and a span from an image) asks the target's IsAntialiased, HasMotionBlur and
 // GetBitDepth once per span, casts the SY_MBuffer pointer to the concrete class with
-// static_cast (SY_MBufferDraftX<P> for a draft buffer of P's depth), takes the head of its
-// first pixel with HeadAt(x, y), and calls AddFragment for every covered pixel with
-// consecutive heads along the row and the worker's thread index as pool index. The resolve
-// puts each list in depth order before it walks it.
+// static_cast (SY_MBufferDraftX<P> or SY_MBufferAAX<P> for a draft or anti-aliased buffer of
+// P's depth), takes the head of its first pixel with HeadAt(x, y), and calls AddFragment for
+// every covered pixel with consecutive heads along the row and the worker's thread index as
+// pool index; anti-aliased records also take the depth's steps per pixel. The resolve puts
+// each list in depth order before it walks it.
 #pragma once
 
 #include <cstdint>
@@ -28,8 +29,9 @@
 class SY_MBuffer {
 public:
     // A buffer for the pixels of bounds, of the depth bitDepth (8, 16 or 32) and the class the
-    // flags ask for; motion blur implies anti-aliasing. Throws 4 when memory runs out, with
-    // nothing left allocated; any other depth is reported and throws 3. Never gives null.
+    // flags ask for; motion blur wins over anti-aliasing and, until it has a class of its
+    // own, gets the draft class. Throws 4 when memory runs out, with nothing left allocated;
+    // any other depth is reported and throws 3. Never gives null.
     static std::unique_ptr<SY_MBuffer> New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
                                            bool motionBlur);
 
@@ -81,3 +83,37 @@ public:
 extern template class SY_MBufferDraftX<PF_Pixel8>;
 extern template class SY_MBufferDraftX<PF_Pixel16>;
 extern template class SY_MBufferDraftX<PF_PixelFloat>;
+
+template <class P>
+class SY_MBufferAAX;
+
+// Anti-aliased buffers keep each fragment's depth plane over the pixel, so that layers passing
+// through each other inside a pixel share it by the area each is in front in. Edge coverage is
+// already in the fragments' alpha.
+class SY_MBufferAA : public SY_MBuffer,
+                     public PF_PixelContainer<SY_MBufferAAX<PF_Pixel8>, SY_MBufferAAX<PF_Pixel16>,
+                                              SY_MBufferAAX<PF_PixelFloat>> {
+public:
+    bool IsAntialiased() const final { return true; }
+    bool HasMotionBlur() const final { return false; }
+};
+
+template <class P>
+class SY_MBufferAAX final : public SY_MBufferAA, public SY_FragmentArray<SY_FragmentAAX<P>> {
+public:
+    using Record = SY_FragmentAAX<P>;
+
+    // Throws 4 when memory runs out.
+    explicit SY_MBufferAAX(const M_LRect& rect) : SY_FragmentArray<Record>(rect) {}
+
+    // Records whose depth ranges overlap are split inside the pixel where their planes cross;
+    // every blend passes blendTables, so the group blends in the same light as layers drawn
+    // straight. Throws 4 when the memory for splitting a pixel is not there.
+    void Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables* blendTables,
+                 PF_World& destination) override;
+    int16_t GetBitDepth() const override { return PF_PixelTraits<P>::kBitDepth; }
+};
+
+extern template class SY_MBufferAAX<PF_Pixel8>;
+extern template class SY_MBufferAAX<PF_Pixel16>;
+extern template class SY_MBufferAAX<PF_PixelFloat>;

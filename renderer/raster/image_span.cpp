@@ -115,9 +115,7 @@ void DrawAtDepth(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer,
             draw(SY_CompositeDelivery<P>(world->Row<P>(y), blend.mode, tables));
         },
         [&](SY_MBuffer* buffer) {
-            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
-            draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), span.x, y,
-                                             blend.mode));
+            SY_WithFragmentDelivery<P>(buffer, span.x, y, blend.mode, draw);
         },
         [&](const SY_SpanImageRecord& record) {
             draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});

@@ -1,5 +1,5 @@
 // Where the span routines hand their pixels: composited into a world, stored into an image, or
-// added to a draft fragment buffer. Each delivery takes (x, pixel, coverage, depth, thread).
+// added to a fragment buffer. Each delivery takes (x, pixel, coverage, depth, thread).
 #pragma once
 
 #include <cstdint>
@@ -72,24 +72,45 @@ struct SY_StoreDelivery {
     }
 };
 
-// Kind 2: a fragment in the pixel's list of a draft buffer; the resolve blends the lists later.
-template <class P>
-struct SY_DraftFragmentDelivery {
+// Kind 2: a fragment in the pixel's list of a fragment buffer (SY_MBufferDraftX or
+// SY_MBufferAAX of the pixel type); the resolve blends the lists later.
+template <class Buffer>
+struct SY_FragmentDelivery {
     static constexpr bool kUsesDepth = true;
+    using Record = typename Buffer::Record;
+    using P = typename Record::Pixel;
 
-    SY_DraftFragmentDelivery(SY_MBufferDraftX<P>* target, int32_t x, int32_t y, uint8_t layerMode)
+    SY_FragmentDelivery(Buffer* target, int32_t x, int32_t y, uint8_t layerMode)
         : buffer(target), heads(target->HeadAt(x, y)), firstX(x), mode(layerMode) {}
 
     void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth& d,
                  int32_t thread) {
-        buffer->AddFragment(&pixel, coverage, mode, d.depth, heads + (x - firstX), thread);
+        Record** head = heads + (x - firstX);
+        if constexpr (Record::kGradients == 0)
+            buffer->AddFragment(&pixel, coverage, mode, d.depth, head, thread);
+        else
+            buffer->AddFragment(&pixel, coverage, mode, d.depth, d.dzdx, d.dzdy, head, thread);
     }
 
-    SY_MBufferDraftX<P>* buffer;
-    SY_FragmentDraftX<P>** heads;  // the heads of the span's row, from its first pixel on
+    Buffer* buffer;
+    Record** heads;  // the heads of the span's row, from its first pixel on
     int32_t firstX;
     uint8_t mode;
 };
+
+// Calls draw(delivery) with the delivery into buffer's concrete class for pixels of P, from
+// pixel (x, y) on. Buffers of a class that has no delivery take nothing.
+template <class P, class Draw>
+void SY_WithFragmentDelivery(SY_MBuffer* buffer, int32_t x, int32_t y, uint8_t mode, Draw&& draw) {
+    if (buffer->HasMotionBlur()) return;
+    if (buffer->IsAntialiased()) {
+        using Buffer = SY_MBufferAAX<P>;
+        draw(SY_FragmentDelivery<Buffer>(static_cast<Buffer*>(buffer), x, y, mode));
+    } else {
+        using Buffer = SY_MBufferDraftX<P>;
+        draw(SY_FragmentDelivery<Buffer>(static_cast<Buffer*>(buffer), x, y, mode));
+    }
+}
 
 // The pixel depth of a target of kind 1, 2 or 3. Occluders (kind 4) are not pixels of the
 // frame's depth: 0, which no dispatch takes.

@@ -37,9 +37,7 @@ void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, c
                                          tables));
         },
         [&](SY_MBuffer* buffer) {
-            if (buffer->IsAntialiased() || buffer->HasMotionBlur()) return;
-            draw(SY_DraftFragmentDelivery<P>(static_cast<SY_MBufferDraftX<P>*>(buffer), x, y,
-                                             SY_DeliveredMode(shader.material)));
+            SY_WithFragmentDelivery<P>(buffer, x, y, SY_DeliveredMode(shader.material), draw);
         },
         [&](const SY_SpanImageRecord& record) {
             draw(SY_StoreDelivery<P>{record.image->Row<P>(y - record.y0) - record.x0});

@@ -77,7 +77,8 @@ auto Checked(const Composition& comp, const std::string& option, Parse&& parse) 
 }
 
 std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_t frame,
-                         int32_t code, const std::string& hostFailure, int64_t memoryLimit) {
+                         int32_t code, const std::string& hostFailure, int64_t memoryLimit,
+                         int64_t refusedDemand) {
     std::string where = comp.file.string() + ": frame " + std::to_string(frame) + ": ";
     if (code == kQNGP_ErrUserCancel) return where + "interrupted";
     if (!hostFailure.empty()) return hostFailure + " (frame " + std::to_string(frame) + ")";
@@ -86,8 +87,17 @@ std::string FrameFailure(const Composition& comp, const Artisan& artisan, int32_
          << " (0x" << std::hex << code << ")";
     if (code == kU_ErrUnexpectedBitDepth) text << ": pixels of a depth other than 8, 16 or 32 bits";
     if (code == kU_ErrOutOfMemory) {
-        text << ": out of memory; the frame's buffers may hold at most "
-             << SizeText(static_cast<double>(memoryLimit)) << " (--max-memory)";
+        text << ": out of memory; the frame's buffers ";
+        // How far past the limit the frame reached tells the user what to ask for.
+        if (refusedDemand > 0)
+            text << "needed more than " << SizeText(static_cast<double>(refusedDemand));
+        if (refusedDemand > memoryLimit) text << " and ";
+        if (refusedDemand == 0 || refusedDemand > memoryLimit) {
+            text << "may hold at most " << SizeText(static_cast<double>(memoryLimit))
+                 << " (--max-memory)";
+        } else {
+            text << ", more than the system gave";
+        }
     }
     return text.str();
 }
@@ -204,6 +214,7 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
         progress.BeginFrame(frame);
         int32_t layers = session.LayerContextCount();
         int32_t code = 0;
+        U_TakeRefusedDemand();
         for (int32_t pass = 0; !code && pass < session.PassCount(); ++pass) {
             session.BeginPass(pass);
             Clock::time_point entry = Clock::now();
@@ -211,8 +222,8 @@ void RunRender(const RenderOptions& options, std::ostream& out) {
             times.entry += Seconds(Clock::now() - entry);
         }
         if (code) {
-            std::string failure =
-                FrameFailure(comp, artisan, frame, code, session.Failure(), memoryLimit);
+            std::string failure = FrameFailure(comp, artisan, frame, code, session.Failure(),
+                                               memoryLimit, U_TakeRefusedDemand());
             if (!options.keepGoing || code == kQNGP_ErrUserCancel) throw HostError(failure);
             progress.Clear();
             std::cerr << "ostrel: " << failure << '\n';

@@ -15,8 +15,9 @@ struct alignas(16) BlockHeader {
 };
 
 std::atomic<int64_t> gAccountedBytes{0};
-std::atomic<int64_t> gHeldBytes{0};   // in blocks handed out, headers included
-std::atomic<int64_t> gLimitBytes{0};  // 0: none
+std::atomic<int64_t> gHeldBytes{0};      // in blocks handed out, headers included
+std::atomic<int64_t> gLimitBytes{0};     // 0: none
+std::atomic<int64_t> gRefusedDemand{0};  // the largest total held had a refused block been given
 std::atomic<int64_t> gFailCountdown{0};
 std::atomic<U_PurgeHandler> gPurgeHandler{nullptr};
 
@@ -38,6 +39,14 @@ bool Hold(int64_t bytes) {
     return true;
 }
 
+// Remembers what a refused block would have brought the total to.
+void NoteRefusal(int64_t bytes) {
+    int64_t demand = gHeldBytes.load(std::memory_order_relaxed) + bytes;
+    int64_t largest = gRefusedDemand.load(std::memory_order_relaxed);
+    while (demand > largest && !gRefusedDemand.compare_exchange_weak(largest, demand)) {
+    }
+}
+
 void* HeaderOf(void* block) {
     return static_cast<BlockHeader*>(block) - 1;
 }
@@ -47,10 +56,14 @@ void* HeaderOf(void* block) {
 void* U_AllocatePtr(uint32_t, const char*, size_t bytes) {
     if (SimulatedFailure() || bytes > INT64_MAX / 2) return nullptr;
     const size_t whole = sizeof(BlockHeader) + bytes;
-    if (!Hold(static_cast<int64_t>(whole))) return nullptr;
+    if (!Hold(static_cast<int64_t>(whole))) {
+        NoteRefusal(static_cast<int64_t>(whole));
+        return nullptr;
+    }
     auto* header = static_cast<BlockHeader*>(u_memory::TakeRawBlock(whole));
     if (!header) {
         gHeldBytes.fetch_sub(static_cast<int64_t>(whole), std::memory_order_relaxed);
+        NoteRefusal(static_cast<int64_t>(whole));
         return nullptr;
     }
     header->bytes = bytes;
@@ -115,6 +128,10 @@ void U_SetPurgeHandler(U_PurgeHandler handler) {
 
 void U_SetAllocationLimit(int64_t bytes) {
     gLimitBytes.store(bytes < 0 ? 0 : bytes);
+}
+
+int64_t U_TakeRefusedDemand() {
+    return gRefusedDemand.exchange(0);
 }
 
 void U_FailAllocationAfter(int64_t n) {

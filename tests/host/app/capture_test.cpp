@@ -64,7 +64,7 @@ TEST(Capture, SampleCountsClampedToTwoToSixtyFour) {
         int32_t samples;
         int32_t count;
     };
-    const Case kCases[] = {{0, 2}, {5, 5}, {100, 64}};
+    const Case kCases[] = {{0, 2}, {1, 2}, {5, 5}, {100, 64}};
     for (const Case& c : kCases) {
         SCOPED_TRACE(c.samples);
         ServedFrame frame(CompJson(R"("motionBlur": {"enabled": true})", kMovingCard), 12);

@@ -225,6 +225,21 @@ void FillBuffer() {
     }
 }
 
+// An anti-aliased column of three pixels, one per thread, each of three crossing records,
+// resolved.
+void FillAndResolveAntialiased() {
+    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, false);
+    auto* buffer = static_cast<SY_MBufferAAX<PF_Pixel16>*>(owner.get());
+    const PF_Pixel16 p{32768, 1, 2, 3};
+    for (int32_t y = 0; y < 3; ++y) {
+        for (float slope : {-1.0f, 1.0f, 0.5f})
+            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, buffer->HeadAt(0, y), y);
+    }
+    PF_Pixel16 pixels[3] = {};
+    PF_World world(1, 3, sizeof(PF_Pixel16), 16, pixels);
+    buffer->Resolve(nullptr, nullptr, world);
+}
+
 void AppendShadowArrays() {
     SY_ShadowFragmentArrayList list;
     for (int32_t i = 0; i < 3; ++i)
@@ -242,6 +257,9 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
     } cases[] = {
         // Object, pool array, three pools, head table, two blocks in each pool.
         {"draft buffer", &FillBuffer, 1 + 1 + 3 + 1 + 6},
+        // Object, pool array, three pools, head table, a block in each pool, and the eight
+        // stores of the resolve that splits pixels.
+        {"anti-aliased buffer", &FillAndResolveAntialiased, 1 + 1 + 3 + 1 + 3 + 8},
         // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
         {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
     };
