@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <climits>
 #include <cmath>
+#include <cstring>
 #include <new>
 #include <vector>
 
@@ -69,31 +70,25 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
         bottom = std::max(bottom, p.y * radius);
     }
     // Rows whose pixel band [y − ½, y + ½] overlaps the iris; at radius 0 only the centre.
-    const bool point = !(radius > 0);
-    const auto first = point ? 0 : static_cast<int32_t>(std::floor(top + 0.5));
-    const auto last = point ? 0 : static_cast<int32_t>(std::ceil(bottom - 0.5));
-    const int32_t rowSpace = last - first + 1;
-    bytes_ = static_cast<size_t>(rowSpace) * (sizeof(Row) + 5 * sizeof(Segment));
-    rows_ = static_cast<Row*>(U_AllocatePtr(0, "iris kernel", bytes_));
-    if (!rows_) throw std::bad_alloc();
-    U_AccountAllocationEx(bytes_, 1);
-    segments_ = reinterpret_cast<Segment*>(rows_ + rowSpace);
-    if (point) {
-        rows_[0] = {0, 0, 1};
-        segments_[0] = {0, 1, 1.0f};
-        rowCount_ = 1;
-        return;
-    }
-
+    std::vector<Row> rows;
+    std::vector<Segment> segments;
     double total = 0;
-    int32_t segmentCount = 0;
     auto add = [&](int32_t x0, int32_t x1, double weight) {
         if (x1 < x0 || !(weight > 0)) return;
-        segments_[segmentCount++] = {x0, x1 - x0 + 1, static_cast<float>(weight)};
+        segments.push_back({x0, x1 - x0 + 1, static_cast<float>(weight)});
         extent_[0] = std::min(extent_[0], x0);
         extent_[2] = std::max(extent_[2], x1);
         total += (x1 - x0 + 1) * weight;
     };
+    const bool point = !(radius > 0);
+    const auto first = point ? 1 : static_cast<int32_t>(std::floor(top + 0.5));
+    const auto last = point ? 0 : static_cast<int32_t>(std::ceil(bottom - 0.5));
+    rows.reserve(static_cast<size_t>(std::max(last - first + 1, 1)));
+    segments.reserve(5 * rows.capacity());  // at most five runs a row
+    if (point) {
+        add(0, 0, 1);
+        rows.push_back({0, 0, 1});
+    }
     const double rim = 1 + std::max(fringe, 0.0);
     for (int32_t dy = first; dy <= last; ++dy) {
         double share = std::min(dy + 0.5, bottom) - std::max(dy - 0.5, top);
@@ -113,7 +108,7 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
         }
         auto weightOf = [&](int32_t x) { return x >= innerFirst && x <= innerLast ? 1.0 : rim; };
 
-        const int32_t rowStart = segmentCount;
+        const auto rowStart = static_cast<int32_t>(segments.size());
         const auto p0 = static_cast<int32_t>(std::floor(xl + 0.5));
         const auto p1 = static_cast<int32_t>(std::ceil(xr - 0.5));
         if (p0 >= p1) {
@@ -127,13 +122,24 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
             add(i1 + 1, m1, share * rim);
             add(p1, p1, share * (xr - (p1 - 0.5)) * weightOf(p1));
         }
-        if (segmentCount > rowStart) {
-            rows_[rowCount_++] = {dy, rowStart, segmentCount - rowStart};
+        const auto rowEnd = static_cast<int32_t>(segments.size());
+        if (rowEnd > rowStart) {
+            rows.push_back({dy, rowStart, rowEnd - rowStart});
             extent_[1] = std::min(extent_[1], dy);
             extent_[3] = std::max(extent_[3], dy);
         }
     }
     normalization_ = total > 0 ? static_cast<float>(1 / total) : 0.0f;
+
+    // The frame keeps every kernel: rows and runs go into one block of the host's memory.
+    rowCount_ = static_cast<int32_t>(rows.size());
+    bytes_ = sizeof(Row) * rows.size() + sizeof(Segment) * segments.size();
+    rows_ = static_cast<Row*>(U_AllocatePtr(0, "iris kernel", bytes_));
+    if (!rows_) throw std::bad_alloc();
+    U_AccountAllocationEx(bytes_, 1);
+    segments_ = reinterpret_cast<Segment*>(rows_ + rowCount_);
+    std::memcpy(rows_, rows.data(), sizeof(Row) * rows.size());
+    std::memcpy(segments_, segments.data(), sizeof(Segment) * segments.size());
 }
 
 ShapeKernel::~ShapeKernel() {
