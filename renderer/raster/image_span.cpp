@@ -20,9 +20,6 @@ struct ImageSpan {
     bool perspective;
 };
 
-// Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
-// key is the smallest value W takes over the pixel square, from its top-left corner, as for
-// the layer's textured spans.
 // The pixel of the image as the layer shows it: white for a layer that shows only shadows,
 // darkened by the shadows on its plane at output pixel (x, y) whose plane W is w.
 template <class P>
@@ -46,6 +43,8 @@ P Shown(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, P pixel, int3
     return pixel;
 }
 
+// Hands every pixel the matte shows and the plane lies in front of to the delivery, with the
+// plane's W at the pixel centre as the layer's textured spans give it.
 template <class P, class Delivery>
 void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, const ImageSpan& span,
                    const P* matte, int32_t y, Delivery& delivery, int32_t thread) {
@@ -54,14 +53,13 @@ void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, co
     const P* source = image.PixelAt<P>(span.x, y);
     const bool changed = blend.colorOnly || blend.shadows;
     const SY_SpanMapping& m = span.depth;
-    const double offset = m.low - 0.5 * (m.dwdx + m.dwdy) + blend.depthOffset;
     const SY_Coverage<P> layerCoverage = LayerCoverage<P>(blend.opacity);
     SY_FragmentDepth depth{0, m.dwdx, m.dwdy, 0};
     for (int32_t i = 0; i < span.count; ++i) {
         if (matte && matte[i].alpha == 0) continue;
         double w = m.w + i * static_cast<double>(m.dwdx);
         if (span.perspective && w <= 0) continue;
-        if constexpr (Delivery::kUsesDepth) depth.depth = static_cast<float>(w + offset);
+        if constexpr (Delivery::kUsesDepth) depth.center = w + blend.depthOffset;
         SY_Coverage<P> coverage =
             matte ? MatteCoverage<P>(matte[i].alpha, layerCoverage) : layerCoverage;
         if (changed) {
