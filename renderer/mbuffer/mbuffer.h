@@ -11,8 +11,9 @@
 // static_cast (SY_MBufferDraftX<P> or SY_MBufferAAX<P> for a draft or anti-aliased buffer of
 // P's depth), takes the head of its first pixel with HeadAt(x, y), and calls AddFragment for
 // every covered pixel with consecutive heads along the row and the worker's thread index as
-// pool index; anti-aliased records also take the depth's steps per pixel. The resolve puts
-// each list in depth order before it walks it.
+// pool index. The key is the record class's Key of W at the pixel centre; anti-aliased
+// records also take W's steps per pixel. The resolve puts each list in depth order before it
+// walks it.
 #pragma once
 
 #include <cstdint>

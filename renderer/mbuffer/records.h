@@ -3,6 +3,7 @@
 // occluder's transmission for the shadow maps.
 #pragma once
 
+#include <algorithm>
 #include <cmath>
 #include <cstdint>
 
@@ -27,6 +28,11 @@ struct SY_FragmentDraftX : SY_FragmentHead<SY_FragmentDraftX<P>> {
 
     float Extent() const { return this->depth; }
 
+    // The layer in front at the pixel's centre (at mid-shutter) comes last in the list.
+    static float Key(double center, float, float, float dzdt) {
+        return static_cast<float>(center + 0.5 * dzdt);
+    }
+
     P color;
 };
 
@@ -38,6 +44,12 @@ struct SY_FragmentAAX : SY_FragmentHead<SY_FragmentAAX<P>> {
 
     // The largest depth the plane reaches inside the pixel.
     float Extent() const { return this->depth + std::fabs(dzdx) + std::fabs(dzdy); }
+
+    // The plane's minimum over the square, from its value at the centre: the resolve rebuilds
+    // the plane from it, and records whose ranges overlap meet in one depth group.
+    static float Key(double center, float dzdx, float dzdy, float) {
+        return static_cast<float>(center - 0.5 * (std::fabs(dzdx) + std::fabs(dzdy)));
+    }
 
     float dzdx;  // per pixel step in x
     float dzdy;  // per pixel step in y
@@ -53,6 +65,13 @@ struct SY_FragmentMBX : SY_FragmentHead<SY_FragmentMBX<P>> {
     // The largest depth the record reaches inside the pixel during the shutter interval.
     float Extent() const {
         return this->depth + std::fabs(dzdx) + std::fabs(dzdy) + std::fabs(dzdt);
+    }
+
+    // The minimum over the square and the shutter: the centre value at shutter open moves by
+    // dzdt until it closes.
+    static float Key(double center, float dzdx, float dzdy, float dzdt) {
+        return static_cast<float>(center - 0.5 * (std::fabs(dzdx) + std::fabs(dzdy)) +
+                                  std::min(0.0f, dzdt));
     }
 
     float dzdx;

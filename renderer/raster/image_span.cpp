@@ -67,9 +67,8 @@ struct BlurredPixels {
     }
 };
 
-// Hands every pixel the matte shows and the plane lies in front of to the delivery. The depth
-// key is the smallest value W takes over the pixel square, from its top-left corner, as for
-// the layer's textured spans.
+// Hands every pixel the matte shows and the plane lies in front of to the delivery, with the
+// plane's W at the pixel centre as the layer's textured spans give it.
 template <class P, class Source, class Delivery>
 void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, const ImageSpan& span,
                    const Source& source, const P* matte, int32_t y, Delivery& delivery,
@@ -77,7 +76,6 @@ void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, co
     using namespace sy_span;
     const bool changed = blend.colorOnly || blend.shadows;
     const SY_SpanMapping& m = span.depth;
-    const double offset = m.low - 0.5 * (m.dwdx + m.dwdy) + blend.depthOffset;
     const SY_Coverage<P> layerCoverage = LayerCoverage<P>(blend.opacity);
     SY_FragmentDepth depth{0, m.dwdx, m.dwdy, 0};
     for (int32_t i = 0; i < span.count; ++i) {
@@ -89,7 +87,7 @@ void DrawFromImage(const SY_SpanBlend& blend, const SY_ScreenGeometry& layer, co
         if constexpr (Source::kBlurred) {
             if (pixel.alpha == 0) continue;
         }
-        if constexpr (Delivery::kUsesDepth) depth.depth = static_cast<float>(w + offset);
+        if constexpr (Delivery::kUsesDepth) depth.center = w + blend.depthOffset;
         SY_Coverage<P> coverage =
             matte ? MatteCoverage<P>(matte[i].alpha, layerCoverage) : layerCoverage;
         if (changed) {

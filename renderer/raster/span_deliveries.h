@@ -86,10 +86,11 @@ struct SY_FragmentDelivery {
     void Deliver(int32_t x, const P& pixel, SY_Coverage<P> coverage, const SY_FragmentDepth& d,
                  int32_t thread) {
         Record** head = heads + (x - firstX);
+        const float key = Record::Key(d.center, d.dzdx, d.dzdy, d.dzdt);
         if constexpr (Record::kGradients == 0)
-            buffer->AddFragment(&pixel, coverage, mode, d.depth, head, thread);
+            buffer->AddFragment(&pixel, coverage, mode, key, head, thread);
         else
-            buffer->AddFragment(&pixel, coverage, mode, d.depth, d.dzdx, d.dzdy, head, thread);
+            buffer->AddFragment(&pixel, coverage, mode, key, d.dzdx, d.dzdy, head, thread);
     }
 
     Buffer* buffer;

@@ -13,11 +13,12 @@
 #include "renderer/raster/shader.h"
 #include "renderer/raster/span_state.h"
 
-// What a fragment buffer needs of a pixel's depth: the key (the smallest value the layer's
-// plane takes over the pixel square and the shutter, larger is nearer), its steps per pixel in
-// x and y, and its travel over the shutter. Deliveries into images ignore it.
+// What a fragment buffer needs of a pixel's depth (W, larger is nearer): its value at the pixel
+// centre at shutter open, with the layer's offset, its steps per pixel in x and y, and its
+// travel over the shutter. Each kind of record makes its key from these. Deliveries into images
+// ignore it.
 struct SY_FragmentDepth {
-    float depth;
+    double center;
     float dzdx;
     float dzdy;
     float dzdt;
@@ -101,7 +102,7 @@ struct Pixel {
 template <class P>
 struct SpanSetup {
     SY_Coverage<P> coverage0;
-    float offset0;  // moves the depth key from the pixel centre to its top-left corner
+    float depthOffset;
     bool filtered;
     bool colorOnly;  // shadows only: the texel's colour is replaced by the channel maximum
     bool shaded;
@@ -135,12 +136,10 @@ template <bool kDepth, class P, class State>
     }
     out->coverage = matte ? MatteCoverage<P>(matte->alpha, setup.coverage0) : setup.coverage0;
     if constexpr (kDepth) {
-        double travel = ShutterTravel(state);
-        out->depth.depth =
-            static_cast<float>(first.w + first.low + std::min(0.0, travel) + setup.offset0);
+        out->depth.center = first.w + setup.depthOffset;
         out->depth.dzdx = first.dwdx;
         out->depth.dzdy = first.dwdy;
-        out->depth.dzdt = static_cast<float>(travel);
+        out->depth.dzdt = static_cast<float>(ShutterTravel(state));
     }
 }
 
@@ -165,10 +164,9 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
                  SY_SpanRayState& ray, const P* matte, int32_t x, int32_t count, Delivery& delivery,
                  int32_t thread) {
     using namespace sy_span;
-    const SY_SpanMapping& first = FirstMapping(state);
     SpanSetup<P> setup;
     setup.coverage0 = LayerCoverage<P>(shader.material.opacity);
-    setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
+    setup.depthOffset = shader.depthOffset;
     setup.filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;

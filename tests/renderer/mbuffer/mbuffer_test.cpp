@@ -119,6 +119,23 @@ TEST(FragmentArray, OrderIsStableForShortAndLongLists) {
     }
 }
 
+// A plane of W 2 at the pixel centre, falling ¼ per pixel in x and rising ½ in y, and 1 lower
+// at shutter close: a draft record keys at the centre at mid-shutter (1.5), an anti-aliased one
+// spans the plane's range over the pixel, 2 ∓ ⅜, and a motion-blur one that range over the
+// shutter too, from 0.625 to 2.375: the ranges depth groups are made of.
+TEST(FragmentRecords, KeysAndExtentsSpanThePlaneOverThePixel) {
+    using P = PF_Pixel8;
+    EXPECT_FLOAT_EQ(SY_FragmentDraftX<P>::Key(2, -0.25f, 0.5f, -1), 1.5f);
+    SY_FragmentAAX<P> aa{};
+    aa.depth = SY_FragmentAAX<P>::Key(2, aa.dzdx = -0.25f, aa.dzdy = 0.5f, -1);
+    EXPECT_FLOAT_EQ(aa.depth, 1.625f);
+    EXPECT_FLOAT_EQ(aa.Extent(), 2.375f);
+    SY_FragmentMBX<P> mb{};
+    mb.depth = SY_FragmentMBX<P>::Key(2, mb.dzdx = -0.25f, mb.dzdy = 0.5f, mb.dzdt = -1);
+    EXPECT_FLOAT_EQ(mb.depth, 0.625f);
+    EXPECT_FLOAT_EQ(mb.Extent(), 2.375f);
+}
+
 TEST(ShadowFragments, CompactionDropsEmptyArraysAndKeepsOrder) {
     AccountedBytesCheck memory;
     SY_ShadowFragmentArrayList list;

@@ -187,20 +187,22 @@ TYPED_TEST(Span, PixelsWhereThePlaneIsBehindTheCameraAreNotDrawn) {
         EXPECT_EQ(!IsClear(destination.At(x, 0)), x < 8) << x;
 }
 
-// W = 2 + x/4: a fragment's key is W at its pixel's top-left corner less one W extent (¼),
-// plus the layer's offset (−⅛), from either dispatcher; a transparent image pixel adds none.
-// Two subsamples whose W differ by −2 over the shutter key from the smaller W at the pixel
-// centre (⅛ at x = 0), less the extent.
-TYPED_TEST(Span, FragmentKeysLieOneExtentBelowThePixelsCorner) {
+// W = 2 + x/4 and the layer's offset is −⅛: a draft fragment's key is W at its pixel's centre
+// plus the offset, from either dispatcher; an anti-aliased one's is the plane's minimum over the
+// pixel, ⅛ lower; a transparent image pixel adds none. Two subsamples whose W differ by −2 over
+// the shutter key a draft fragment at mid-shutter, 1 lower.
+TYPED_TEST(Span, FragmentKeysAreThePlaneAtThePixelCentreOrItsMinimum) {
     using P = TypeParam;
     this->texture_->At(5, 1) = P{};
     const struct {
-        bool image;
+        bool image, antialiased;
         int32_t samples;
         double keyAtZero;
-    } cases[] = {{false, 1, 2 - 0.25 - 0.125},
-                 {true, 1, 2 - 0.25 - 0.125},
-                 {false, 2, 2 + 0.125 - 0.125 - 2 - 0.125 - 0.125}};
+    } cases[] = {{false, false, 1, 2},
+                 {true, false, 1, 2},
+                 {false, true, 1, 1.875},
+                 {true, true, 1, 1.875},
+                 {false, false, 2, 1}};
     for (const auto& c : cases) {
         this->SetPlane(Plane(2, 0.25), false);
         if (c.samples == 2) {
@@ -210,18 +212,23 @@ TYPED_TEST(Span, FragmentKeysLieOneExtentBelowThePixelsCorner) {
             this->geometry_.lastValid = 1;
         }
         this->blend_.depthOffset = this->shader_.depthOffset = -0.125f;
-        auto buffer =
-            SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth, false, false);
+        auto buffer = SY_MBuffer::New({0, 0, kWidth, kHeight}, PF_PixelTraits<P>::kBitDepth,
+                                      c.antialiased, false);
         this->Draw(c.image, SY_RenderTarget(*buffer), 2, 6, 1);
-        auto& draft = static_cast<SY_MBufferDraftX<P>&>(*buffer);
-        for (int32_t x = 0; x < kWidth; ++x) {
-            const SY_FragmentDraftX<P>* f = *draft.HeadAt(x, 1);
-            ASSERT_EQ(f != nullptr, x >= 2 && x < 8 && x != 5) << x << " case " << &c - cases;
-            if (!f) continue;
-            EXPECT_EQ(f->next, nullptr);
-            EXPECT_FLOAT_EQ(f->depth, c.keyAtZero + x * 0.25) << x << " case " << &c - cases;
-            EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
-        }
+        auto check = [&](auto& fragments) {
+            for (int32_t x = 0; x < kWidth; ++x) {
+                const auto* f = *fragments.HeadAt(x, 1);
+                ASSERT_EQ(f != nullptr, x >= 2 && x < 8 && x != 5) << x << " case " << &c - cases;
+                if (!f) continue;
+                EXPECT_EQ(f->next, nullptr);
+                EXPECT_FLOAT_EQ(f->depth, c.keyAtZero + x * 0.25) << x << " case " << &c - cases;
+                EXPECT_TRUE(Equal(f->color, PatternTexel<P>(x, 1))) << x;
+            }
+        };
+        if (c.antialiased)
+            check(static_cast<SY_MBufferAAX<P>&>(*buffer));
+        else
+            check(static_cast<SY_MBufferDraftX<P>&>(*buffer));
     }
 }
 
