@@ -8,6 +8,11 @@
 
 #include "renderer/mbuffer/pixel_split.h"
 
+// Where the two Gauss points of a stretch of the shutter lie from its middle, in stretch
+// lengths: their mean is exact for cubics, and they never land on the stretch's ends, where
+// parallel planes can be level over the whole pixel.
+inline constexpr double kSY_GaussOffset = 0.28867513459481288;  // 1 / (2√3)
+
 struct SY_MotionPlane {
     double z000, dzdx, dzdy, dzdt;
 
@@ -87,15 +92,13 @@ inline float SY_ShareInFrontOverShutter(const SY_CubeDifferences& d) {
     } times;
     d.AppendCornerSwaps(&times);
     times.push_back(1);
-    // Two Gauss points per piece are exact for quadratics, and never land on a boundary, where
-    // parallel planes can be level all over the square.
-    constexpr double kGauss = 0.28867513459481288;  // 1 / (2√3)
     double volume = 0;
     for (int32_t i = 1; i < times.count; ++i) {
         const double length = times.t[i] - times.t[i - 1];
         const double middle = times.t[i - 1] + 0.5 * length;
         volume +=
-            0.5 * length * (share(middle - kGauss * length) + share(middle + kGauss * length));
+            0.5 * length *
+            (share(middle - kSY_GaussOffset * length) + share(middle + kSY_GaussOffset * length));
     }
     return static_cast<float>(std::clamp(volume, 0.0, 1.0));
 }

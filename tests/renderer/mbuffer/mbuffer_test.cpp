@@ -225,21 +225,17 @@ void FillBuffer() {
     }
 }
 
-// A column of three pixels of an anti-aliased or (moving) motion-blur buffer, one per thread,
-// each of three crossing records, resolved.
-template <class B>
+// A column of three pixels of an anti-aliased or motion-blur buffer (whose records take their
+// travel over the shutter as well), one per thread, each of three crossing records, resolved.
+template <class B, float... kTravel>
 void FillAndResolveSplitting() {
-    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, B::Record::kGradients == 3);
+    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, sizeof...(kTravel) > 0);
     auto* buffer = static_cast<B*>(owner.get());
     const PF_Pixel16 p{32768, 1, 2, 3};
     for (int32_t y = 0; y < 3; ++y) {
-        for (float slope : {-1.0f, 1.0f, 0.5f}) {
-            if constexpr (B::Record::kGradients == 3)
-                buffer->AddFragment(&p, 32768, 2, -1.5f, slope, 0.0f, -slope, buffer->HeadAt(0, y),
-                                    y);
-            else
-                buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, buffer->HeadAt(0, y), y);
-        }
+        for (float slope : {-1.0f, 1.0f, 0.5f})
+            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, kTravel..., buffer->HeadAt(0, y),
+                                y);
     }
     PF_Pixel16 pixels[3] = {};
     PF_World world(1, 3, sizeof(PF_Pixel16), 16, pixels);
@@ -268,7 +264,7 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
         {"anti-aliased buffer", &FillAndResolveSplitting<SY_MBufferAAX<PF_Pixel16>>,
          1 + 1 + 3 + 1 + 3 + 8},
         // The same, and the list of instants the motion-blur resolve composites at.
-        {"motion-blur buffer", &FillAndResolveSplitting<SY_MBufferMBX<PF_Pixel16>>,
+        {"motion-blur buffer", &FillAndResolveSplitting<SY_MBufferMBX<PF_Pixel16>, 0.0f>,
          1 + 1 + 3 + 1 + 3 + 9},
         // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
         {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
