@@ -37,13 +37,13 @@ public:
             SY_WriteAccumulated(Sample(0).c, pixel);
             return;
         }
-        // Between two instants at which some pair changes sides at a corner of the pixel, each
-        // record keeps its relation to every other one at the corners, and the composite only
-        // follows the regions' areas, which the adaptive rule can trust.
+        // A record can show up in front of another one, or vanish behind it, only where the two
+        // start or stop crossing inside the pixel; in between, the composite follows the
+        // regions' areas, which the adaptive rule can trust.
         times_.clear();
         for (int32_t i = 0; i < count; ++i) {
             for (int32_t j = i + 1; j < count; ++j)
-                Differences(*run[i], *run[j]).AppendCornerSwaps(&times_);
+                Differences(*run[i], *run[j]).AppendCrossingEnds(&times_);
         }
         std::sort(times_.begin(), times_.end());
         times_.push_back(1.0);

@@ -57,6 +57,21 @@ struct SY_CubeDifferences {
             if (t > 0 && t < 1) times->push_back(t);
         }
     }
+
+    // The times inside the shutter at which the two start and stop crossing inside the square
+    // (the first and the last corner to change sign), appended to *times: before and after,
+    // one is in front over the whole square.
+    template <class Out>
+    void AppendCrossingEnds(Out* times) const {
+        if (dt == 0) return;
+        double first = -e[0] / dt, last = first;
+        for (int32_t i = 1; i < 4; ++i) {
+            first = std::min(first, -e[i] / dt);
+            last = std::max(last, -e[i] / dt);
+        }
+        if (first > 0 && first < 1) times->push_back(first);
+        if (last > first && last > 0 && last < 1) times->push_back(last);
+    }
 };
 
 // Whether the two records change places inside the cube: taken with the sign that makes corner
