@@ -1,8 +1,14 @@
-// The draft and the anti-aliased fragment buffer over a full HD frame of eight cards that all
-// cross one another (a fan through the frame's vertical centre line), each card covering every
-// pixel: fragments per second added, layer after layer as the renderer draws them, on one
-// thread and on all of them; pixels per second resolved; and the bytes the fragment storage
-// peaks at.
+// The draft, anti-aliased and motion-blur fragment buffers over a full HD frame of eight cards
+// that all cross one another (a fan through the frame's vertical centre line), each card
+// covering every pixel: fragments per second added, layer after layer as the renderer draws
+// them, on one thread and on all of them; pixels per second resolved; and the bytes the
+// fragment storage peaks at.
+//
+// In the motion-blur buffer the fan moves: over the shutter (16 samples, of which the buffer
+// sees the first and the last) each card travels in depth by its own amount, so the line
+// where two cards cross sweeps a band a few pixels wide and every pixel of the bands is
+// resolved over time. A record is one per card and pixel whatever the number of samples: the
+// fragment memory grows with the area the cards sweep, not with the samples.
 #include <benchmark/benchmark.h>
 #include <malloc.h>
 
@@ -57,17 +63,26 @@ int64_t ThreadCpuNs() {
     return int64_t{t.tv_sec} * 1000000000 + t.tv_nsec;
 }
 
+// Depth travel of card c over the shutter: (c − 3.5) × 2, so that neighbouring cards, whose
+// slopes differ by about 0.27 near the centre line, cross up to 7 pixels from it.
+float TravelOf(int32_t card) {
+    return static_cast<float>((card - 3.5) * 2.0);
+}
+
 // Rows of one card, handed out one at a time to `threads` workers as the host's iterator does.
 // Adds the workers' CPU time to *cpuNs. Anti-aliased records carry the card's plane, keyed by
-// its smallest value over the pixel.
+// its smallest value over the pixel, and motion-blur records its travel too, keyed by the
+// smallest value over the pixel and the shutter.
 template <class B>
 void DrawCard(B* buffer, int32_t card, int32_t threads, std::atomic<int64_t>* cpuNs) {
     using P = typename B::Record::Pixel;
-    constexpr bool kPlanes = B::Record::kGradients == 2;
+    constexpr int32_t kGradients = B::Record::kGradients;
     const P color = ColorOf<P>(card);
     const float slope = SlopeOf(card);
-    const float keyAtLeft =
-        1000.0f + (0.5f - kWidth / 2) * slope - (kPlanes ? 0.5f * std::fabs(slope) : 0.0f);
+    const float travel = kGradients == 3 ? TravelOf(card) : 0.0f;
+    const float keyAtLeft = 1000.0f + (0.5f - kWidth / 2) * slope -
+                            (kGradients >= 2 ? 0.5f * std::fabs(slope) : 0.0f) +
+                            std::min(0.0f, travel);
     std::atomic<int32_t> nextRow{0};
     auto work = [&](int32_t thread) {
         const int64_t start = ThreadCpuNs();
@@ -75,7 +90,10 @@ void DrawCard(B* buffer, int32_t card, int32_t threads, std::atomic<int64_t>* cp
             auto** head = buffer->HeadAt(0, y);
             float key = keyAtLeft;
             for (int32_t x = 0; x < kWidth; ++x, ++head, key += slope) {
-                if constexpr (kPlanes)
+                if constexpr (kGradients == 3)
+                    buffer->AddFragment(&color, FullCoverage<P>(), 2, key, slope, 0.0f, travel,
+                                        head, thread);
+                else if constexpr (kGradients == 2)
                     buffer->AddFragment(&color, FullCoverage<P>(), 2, key, slope, 0.0f, head,
                                         thread);
                 else
@@ -122,7 +140,8 @@ public:
 template <class B>
 std::unique_ptr<SY_MBuffer> EmptyBuffer() {
     using P = typename B::Record::Pixel;
-    return SY_MBuffer::New(kFrame, PF_PixelTraits<P>::kBitDepth, B::Record::kGradients == 2, false);
+    constexpr int32_t kGradients = B::Record::kGradients;
+    return SY_MBuffer::New(kFrame, PF_PixelTraits<P>::kBitDepth, kGradients >= 2, kGradients == 3);
 }
 
 template <class B>
@@ -207,11 +226,17 @@ BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferDraftX<PF_PixelFloat>)->Apply(Thre
 BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_Pixel8>)->Apply(Threads);
 BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_Pixel16>)->Apply(Threads);
 BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferAAX<PF_PixelFloat>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferMBX<PF_Pixel8>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferMBX<PF_Pixel16>)->Apply(Threads);
+BENCHMARK_TEMPLATE(BM_AddFragments, SY_MBufferMBX<PF_PixelFloat>)->Apply(Threads);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_Pixel8>)->Apply(Once);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_Pixel16>)->Apply(Once);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferDraftX<PF_PixelFloat>)->Apply(Once);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_Pixel8>)->Apply(Once);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_Pixel16>)->Apply(Once);
 BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferAAX<PF_PixelFloat>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferMBX<PF_Pixel8>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferMBX<PF_Pixel16>)->Apply(Once);
+BENCHMARK_TEMPLATE(BM_Resolve, SY_MBufferMBX<PF_PixelFloat>)->Apply(Once);
 
 BENCHMARK_MAIN();

@@ -14,8 +14,9 @@ SY_MBuffer* NewOfQuality(SY_MBufferQuality quality, const M_LRect& bounds) {
     switch (quality) {
         case SY_MBufferQuality::kAntialiased:
             return new SY_MBufferAAX<P>(bounds);
+        case SY_MBufferQuality::kMotionBlur:
+            return new SY_MBufferMBX<P>(bounds);
         case SY_MBufferQuality::kDraft:
-        case SY_MBufferQuality::kMotionBlur:  // blended by draft rules until it has its own class
             return new SY_MBufferDraftX<P>(bounds);
     }
     __builtin_unreachable();

@@ -8,12 +8,12 @@
 //
 // A span routine (and a span from an image) asks the target's IsAntialiased, HasMotionBlur and
 // GetBitDepth once per span, casts the SY_MBuffer pointer to the concrete class with
-// static_cast (SY_MBufferDraftX<P> or SY_MBufferAAX<P> for a draft or anti-aliased buffer of
-// P's depth), takes the head of its first pixel with HeadAt(x, y), and calls AddFragment for
-// every covered pixel with consecutive heads along the row and the worker's thread index as
-// pool index. The key is the record class's Key of W at the pixel centre; anti-aliased
-// records also take W's steps per pixel. The resolve puts each list in depth order before it
-// walks it.
+// static_cast (SY_MBufferDraftX<P>, SY_MBufferAAX<P> or SY_MBufferMBX<P> for a draft,
+// anti-aliased or motion-blur buffer of P's depth), takes the head of its first pixel with
+// HeadAt(x, y), and calls AddFragment for every covered pixel with consecutive heads along the
+// row and the worker's thread index as pool index. The key is the record class's Key of W at
+// the pixel centre; anti-aliased records also take W's steps per pixel, motion-blur records its
+// travel over the shutter as well. The resolve puts each list in depth order before it walks it.
 #pragma once
 
 #include <cstdint>
@@ -30,9 +30,8 @@
 class SY_MBuffer {
 public:
     // A buffer for the pixels of bounds, of the depth bitDepth (8, 16 or 32) and the class the
-    // flags ask for; motion blur wins over anti-aliasing and, until it has a class of its
-    // own, gets the draft class. Throws 4 when memory runs out, with nothing left allocated;
-    // any other depth is reported and throws 3. Never gives null.
+    // flags ask for; motion blur wins over anti-aliasing. Throws 4 when memory runs out, with
+    // nothing left allocated; any other depth is reported and throws 3. Never gives null.
     static std::unique_ptr<SY_MBuffer> New(const M_LRect& bounds, int16_t bitDepth, bool antialias,
                                            bool motionBlur);
 
@@ -118,3 +117,39 @@ public:
 extern template class SY_MBufferAAX<PF_Pixel8>;
 extern template class SY_MBufferAAX<PF_Pixel16>;
 extern template class SY_MBufferAAX<PF_PixelFloat>;
+
+template <class P>
+class SY_MBufferMBX;
+
+// Motion-blur buffers keep each fragment's depth plane and its travel over the shutter, so that
+// layers that pass through each other during the shutter share the pixel by the part of the
+// pixel and of the shutter each is in front in. Colour and coverage blurred over the shutter
+// are already in the fragments; this buffer blurs the depth order.
+class SY_MBufferMB : public SY_MBuffer,
+                     public PF_PixelContainer<SY_MBufferMBX<PF_Pixel8>, SY_MBufferMBX<PF_Pixel16>,
+                                              SY_MBufferMBX<PF_PixelFloat>> {
+public:
+    bool IsAntialiased() const final { return true; }
+    bool HasMotionBlur() const final { return true; }
+};
+
+template <class P>
+class SY_MBufferMBX final : public SY_MBufferMB, public SY_FragmentArray<SY_FragmentMBX<P>> {
+public:
+    using Record = SY_FragmentMBX<P>;
+
+    // Throws 4 when memory runs out.
+    explicit SY_MBufferMBX(const M_LRect& rect) : SY_FragmentArray<Record>(rect) {}
+
+    // Records whose depth ranges overlap are split where they cross inside the pixel and the
+    // shutter; runs of three or more that change order during the shutter are composited at
+    // enough instants to follow every change. Blends pass blendTables. Throws 4 when the memory
+    // for splitting a pixel is not there.
+    void Resolve(SY_ProgressAbort* progress, const PF_LinearBlendingTables* blendTables,
+                 PF_World& destination) override;
+    int16_t GetBitDepth() const override { return PF_PixelTraits<P>::kBitDepth; }
+};
+
+extern template class SY_MBufferMBX<PF_Pixel8>;
+extern template class SY_MBufferMBX<PF_Pixel16>;
+extern template class SY_MBufferMBX<PF_PixelFloat>;

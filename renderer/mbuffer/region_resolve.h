@@ -33,6 +33,16 @@ public:
     // each record's position in the run into its scratchIndex.
     void Resolve(F* const* run, int32_t count, const PF_LinearBlendingTables* tables,
                  Pixel* pixel) {
+        Split(run, count, [](const F& r) { return SY_PlaneOf(r); });
+        SY_RegionAccumulator<Pixel> sum(*pixel, tables);
+        AddRegionsTo(&sum);
+        sum.WriteTo(pixel);
+    }
+
+    // Cuts the pixel into regions for the run with each record's plane given by
+    // planeOf(record), an SY_DepthPlane. Writes each record's position into its scratchIndex.
+    template <class PlaneOf>
+    void Split(F* const* run, int32_t count, PlaneOf&& planeOf) {
         vertices_.clear();
         records_.clear();
         regions_.clear();
@@ -43,13 +53,15 @@ public:
         records_.push_back(run[0]);
         regions_.push_back({0, 4, 0, 1});
         for (int32_t r = 1; r < count; ++r)
-            Add(*run[r]);
-        SY_RegionAccumulator<Pixel> sum(*pixel, tables);
+            Add(*run[r], planeOf);
+    }
+
+    // Each region of the last Split, weighted by its area.
+    void AddRegionsTo(SY_RegionAccumulator<Pixel>* sum) const {
         for (const Region& region : regions_) {
-            sum.AddRegion(SY_PolygonArea(&vertices_[region.firstVertex], region.vertexCount),
-                          &records_[region.firstRecord], region.recordCount);
+            sum->AddRegion(SY_PolygonArea(&vertices_[region.firstVertex], region.vertexCount),
+                           &records_[region.firstRecord], region.recordCount);
         }
-        sum.WriteTo(pixel);
     }
 
 private:
@@ -67,8 +79,9 @@ private:
     // Puts record r into every region, in front of the first record it is wholly in front of
     // there; where it is in front of a record in only part of a region, that part becomes a
     // region of its own.
-    void Add(const F& r) {
-        const SY_DepthPlane plane = SY_PlaneOf(r);
+    template <class PlaneOf>
+    void Add(const F& r, PlaneOf& planeOf) {
+        const SY_DepthPlane plane = planeOf(r);
         lines_.assign(r.scratchIndex, CachedLine{{0, 0, 0}, false});
         fresh_.clear();
         const auto regionCount = static_cast<int32_t>(regions_.size());
@@ -76,7 +89,7 @@ private:
             Region region = regions_[g];
             int32_t at = region.recordCount;  // where r goes in the list
             for (int32_t s = 0; s < region.recordCount; ++s) {
-                const double* line = LineOf(plane, *records_[region.firstRecord + s]);
+                const double* line = LineOf(plane, *records_[region.firstRecord + s], planeOf);
                 front_.clear();
                 behind_.clear();
                 SY_SplitPolygon(&vertices_[region.firstVertex], region.vertexCount, line, &front_,
@@ -105,10 +118,11 @@ private:
     // a·u + b·v + c = zR − zS over the square; a record wholly in front of S (level with it
     // counting as in front, as later records of equal key are) or wholly behind it gives a
     // line that leaves the whole region on one side.
-    const double* LineOf(const SY_DepthPlane& plane, const F& s) {
+    template <class PlaneOf>
+    const double* LineOf(const SY_DepthPlane& plane, const F& s, PlaneOf& planeOf) {
         CachedLine& cached = lines_[s.scratchIndex];
         if (!cached.known) {
-            const SY_DepthPlane other = SY_PlaneOf(s);
+            const SY_DepthPlane other = planeOf(s);
             const SY_CornerDifferences d = SY_DifferenceAtCorners(other, plane);
             const double lowest = std::min({d.e[0], d.e[1], d.e[2], d.e[3]});
             const double highest = std::max({d.e[0], d.e[1], d.e[2], d.e[3]});

@@ -8,6 +8,19 @@
 #include "renderer/mbuffer/channel_math.h"
 #include "renderer/mbuffer/record_apply.h"
 
+// The pixel from weighted sums of alpha, red, green and blue; with no alpha summed,
+// transparent black whatever it held.
+template <class P>
+void SY_WriteAccumulated(const float sum[4], P* d) {
+    if (sum[0] == 0.0f) {
+        *d = P{};
+        return;
+    }
+    using M = SY_ChannelMath<P>;
+    *d = {M::AlphaFromSum(sum[0]), M::ColorFromSum(sum[1]), M::ColorFromSum(sum[2]),
+          M::ColorFromSum(sum[3])};
+}
+
 template <class P>
 class SY_RegionAccumulator {
 public:
@@ -31,19 +44,13 @@ public:
         sum_[3] += w * static_cast<float>(composite.blue);
     }
 
-    // The pixel from the sum; with no alpha summed, transparent black whatever it held.
-    void WriteTo(P* d) const {
-        if (sum_[0] == 0.0f) {
-            *d = P{};
-            return;
-        }
-        using M = SY_ChannelMath<P>;
-        *d = {M::AlphaFromSum(sum_[0]), M::ColorFromSum(sum_[1]), M::ColorFromSum(sum_[2]),
-              M::ColorFromSum(sum_[3])};
-    }
+    // Alpha, red, green, blue: area-weighted straight values.
+    const float* Sums() const { return sum_; }
+
+    void WriteTo(P* d) const { SY_WriteAccumulated(sum_, d); }
 
 private:
     P before_;
     SY_RecordApplier<P> applier_;
-    float sum_[4] = {};  // alpha, red, green, blue: area-weighted straight values
+    float sum_[4] = {};
 };

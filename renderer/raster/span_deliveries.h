@@ -72,8 +72,8 @@ struct SY_StoreDelivery {
     }
 };
 
-// Kind 2: a fragment in the pixel's list of a fragment buffer (SY_MBufferDraftX or
-// SY_MBufferAAX of the pixel type); the resolve blends the lists later.
+// Kind 2: a fragment in the pixel's list of a fragment buffer (SY_MBufferDraftX,
+// SY_MBufferAAX or SY_MBufferMBX of the pixel type); the resolve blends the lists later.
 template <class Buffer>
 struct SY_FragmentDelivery {
     static constexpr bool kUsesDepth = true;
@@ -89,8 +89,10 @@ struct SY_FragmentDelivery {
         const float key = Record::Key(d.center, d.dzdx, d.dzdy, d.dzdt);
         if constexpr (Record::kGradients == 0)
             buffer->AddFragment(&pixel, coverage, mode, key, head, thread);
-        else
+        else if constexpr (Record::kGradients == 2)
             buffer->AddFragment(&pixel, coverage, mode, key, d.dzdx, d.dzdy, head, thread);
+        else
+            buffer->AddFragment(&pixel, coverage, mode, key, d.dzdx, d.dzdy, d.dzdt, head, thread);
     }
 
     Buffer* buffer;
@@ -100,11 +102,13 @@ struct SY_FragmentDelivery {
 };
 
 // Calls draw(delivery) with the delivery into buffer's concrete class for pixels of P, from
-// pixel (x, y) on. Buffers of a class that has no delivery take nothing.
+// pixel (x, y) on.
 template <class P, class Draw>
 void SY_WithFragmentDelivery(SY_MBuffer* buffer, int32_t x, int32_t y, uint8_t mode, Draw&& draw) {
-    if (buffer->HasMotionBlur()) return;
-    if (buffer->IsAntialiased()) {
+    if (buffer->HasMotionBlur()) {
+        using Buffer = SY_MBufferMBX<P>;
+        draw(SY_FragmentDelivery<Buffer>(static_cast<Buffer*>(buffer), x, y, mode));
+    } else if (buffer->IsAntialiased()) {
         using Buffer = SY_MBufferAAX<P>;
         draw(SY_FragmentDelivery<Buffer>(static_cast<Buffer*>(buffer), x, y, mode));
     } else {

@@ -242,15 +242,17 @@ void FillBuffer() {
     }
 }
 
-// An anti-aliased column of three pixels, one per thread, each of three crossing records,
-// resolved.
-void FillAndResolveAntialiased() {
-    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, false);
-    auto* buffer = static_cast<SY_MBufferAAX<PF_Pixel16>*>(owner.get());
+// A column of three pixels of an anti-aliased or motion-blur buffer (whose records take their
+// travel over the shutter as well), one per thread, each of three crossing records, resolved.
+template <class B, float... kTravel>
+void FillAndResolveSplitting() {
+    auto owner = SY_MBuffer::New({0, 0, 1, 3}, 16, true, sizeof...(kTravel) > 0);
+    auto* buffer = static_cast<B*>(owner.get());
     const PF_Pixel16 p{32768, 1, 2, 3};
     for (int32_t y = 0; y < 3; ++y) {
         for (float slope : {-1.0f, 1.0f, 0.5f})
-            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, buffer->HeadAt(0, y), y);
+            buffer->AddFragment(&p, 32768, 2, -0.5f, slope, 0.0f, kTravel..., buffer->HeadAt(0, y),
+                                y);
     }
     PF_Pixel16 pixels[3] = {};
     PF_World world(1, 3, sizeof(PF_Pixel16), 16, pixels);
@@ -276,7 +278,11 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
         {"draft buffer", &FillBuffer, 1 + 1 + 3 + 1 + 6},
         // Object, pool array, three pools, head table, a block in each pool, and the eight
         // stores of the resolve that splits pixels.
-        {"anti-aliased buffer", &FillAndResolveAntialiased, 1 + 1 + 3 + 1 + 3 + 8},
+        {"anti-aliased buffer", &FillAndResolveSplitting<SY_MBufferAAX<PF_Pixel16>>,
+         1 + 1 + 3 + 1 + 3 + 8},
+        // The same, and the list of instants the motion-blur resolve composites at.
+        {"motion-blur buffer", &FillAndResolveSplitting<SY_MBufferMBX<PF_Pixel16>, 0.0f>,
+         1 + 1 + 3 + 1 + 3 + 9},
         // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
         {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
     };
