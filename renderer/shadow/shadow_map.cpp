@@ -1,7 +1,9 @@
 #include "renderer/shadow/shadow_map.h"
 
+#include <algorithm>
 #include <array>
 #include <cmath>
+#include <limits>
 
 namespace {
 
@@ -46,8 +48,93 @@ SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspec
       stride_(texels.right - texels.left),
       starts_(std::move(starts)),
       entries_(std::move(entries)),
+      tileStride_(((texels.right - texels.left) >> kTileShift) + 1),
       centre_{(mapRect[0] + mapRect[2]) * 0.5, (mapRect[1] + mapRect[3]) * 0.5},
-      half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {}
+      half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {
+    BuildTiles();
+}
+
+namespace {
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+// Tile front ids: no occupied texel seen yet, and texels with different front layers (or
+// one with no layer), which matches no receiver.
+constexpr uint16_t kFrontUnset = 0xFFFE;
+constexpr uint16_t kFrontMixed = 0xFFFF;
+
+uint16_t IdOf(const SY_ShadowEntry& e) {
+    return e.tag & kSY_ShadowIdMask;
+}
+
+bool Dark(const SY_ShadowEntry& e) {
+    return e.red == 0 && e.green == 0 && e.blue == 0;
+}
+
+uint16_t JoinFront(uint16_t a, uint16_t b) {
+    return a == kFrontUnset ? b : b == kFrontUnset || a == b ? a : kFrontMixed;
+}
+
+}  // namespace
+
+void SY_PlanarShadowMap::BuildTiles() {
+    const int32_t wide = tileStride_;
+    const int32_t high = ((texels_.bottom - texels_.top) >> kTileShift) + 1;
+    const size_t count = static_cast<size_t>(wide) * high;
+    SY_ShadowBlock<Tile> own("shadow map tiles", count);
+    std::fill_n(own.Data(), count, Tile{-kInfinity, -kInfinity, kInfinity, 0, kFrontUnset});
+    const SY_ShadowEntry* entries = entries_.Data();
+    size_t texel = 0;
+    for (int32_t j = 0; j < texels_.bottom - texels_.top; ++j) {
+        Tile* row = &own[static_cast<size_t>(j >> kTileShift) * wide];
+        for (int32_t i = 0; i < stride_; ++i, ++texel) {
+            Tile& t = row[i >> kTileShift];
+            const SY_ShadowEntry* first = entries + starts_[texel];
+            const SY_ShadowEntry* end = entries + starts_[texel + 1];
+            if (first == end) {
+                t.umbraDepth = -kInfinity;
+                continue;
+            }
+            // A point nearer than the first occluder, or behind only its own layer's, is lit.
+            t.litDepth = std::max(t.litDepth, first->depth);
+            const uint16_t id = IdOf(*first);
+            const SY_ShadowEntry* other = first;
+            while (other < end && IdOf(*other) == id)
+                ++other;
+            if (other < end) t.frontPassDepth = std::max(t.frontPassDepth, other->depth);
+            t.frontId = JoinFront(t.frontId, id == kSY_ShadowNoLayer ? kFrontMixed : id);
+            // Behind the first of a run of opaque entries that ends the list no light is left,
+            // unless the receiver owns that first entry and looks past its own layer.
+            const SY_ShadowEntry* dark = end;
+            while (dark > first && Dark(dark[-1]))
+                --dark;
+            if (dark == end) {
+                t.umbraDepth = -kInfinity;
+                continue;
+            }
+            t.umbraDepth = std::min(t.umbraDepth, dark->depth);
+            t.umbraIds |= 1u << (IdOf(*dark) & 31);
+        }
+    }
+    // Each tile takes in its eight neighbours.
+    tiles_ = SY_ShadowBlock<Tile>("shadow map tiles", count);
+    for (int32_t b = 0; b < high; ++b) {
+        for (int32_t a = 0; a < wide; ++a) {
+            Tile sum{-kInfinity, -kInfinity, kInfinity, 0, kFrontUnset};
+            for (int32_t y = std::max(0, b - 1); y <= std::min(high - 1, b + 1); ++y) {
+                for (int32_t x = std::max(0, a - 1); x <= std::min(wide - 1, a + 1); ++x) {
+                    const Tile& t = own[static_cast<size_t>(y) * wide + x];
+                    sum.litDepth = std::max(sum.litDepth, t.litDepth);
+                    sum.frontPassDepth = std::max(sum.frontPassDepth, t.frontPassDepth);
+                    sum.umbraDepth = std::min(sum.umbraDepth, t.umbraDepth);
+                    sum.umbraIds |= t.umbraIds;
+                    sum.frontId = JoinFront(sum.frontId, t.frontId);
+                }
+            }
+            if (sum.frontId == kFrontUnset) sum.frontId = kFrontMixed;
+            tiles_[static_cast<size_t>(b) * wide + a] = sum;
+        }
+    }
+}
 
 bool SY_PlanarShadowMap::Project(const double p[3], double* x, double* y, double* d) const {
     if (perspective_) {
@@ -118,8 +205,18 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
             SetFull(t);
             return;
         }
-        TexelTransmission(static_cast<int32_t>(i), static_cast<int32_t>(j), d, receiverId, t);
-        return;
+        const auto ii = static_cast<int32_t>(i), jj = static_cast<int32_t>(j);
+        switch (SettledAt(ii, jj, d, receiverId)) {
+            case Settled::kLit:
+                SetFull(t);
+                return;
+            case Settled::kDark:
+                t[0] = t[1] = t[2] = 0.0f;
+                return;
+            case Settled::kNo:
+                TexelTransmission(ii, jj, d, receiverId, t);
+                return;
+        }
     }
     // Far outside the texels nothing is near enough to filter (and the texel index would not
     // fit its type).
@@ -136,6 +233,20 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
     int32_t i0 = static_cast<int32_t>(fi), j0 = static_cast<int32_t>(fj);
     bool inside = i0 - 1 >= texels_.left && i0 + 2 < texels_.right && j0 - 1 >= texels_.top &&
                   j0 + 2 < texels_.bottom;
+    if (inside) {
+        // The weighed texels lie within two of (i0 + 1, j0 + 1), so its tile settles them.
+        switch (SettledAt(i0 + 1, j0 + 1, d, receiverId)) {
+            case Settled::kLit:
+                SetFull(t);
+                return;
+            case Settled::kDark:
+                // Every weighed texel gives 0, and so does their mean.
+                t[0] = t[1] = t[2] = 0.0f;
+                return;
+            case Settled::kNo:
+                break;
+        }
+    }
     double qx[4], qy[4];
     for (int k = 0; k < 4; ++k) {
         qx[k] = (k - 1 - fx) * (k - 1 - fx);
