@@ -57,10 +57,8 @@ SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspec
 namespace {
 
 constexpr float kInfinity = std::numeric_limits<float>::infinity();
-// Tile front ids: no occupied texel seen yet, and texels with different front layers (or
-// one with no layer), which matches no receiver.
-constexpr uint16_t kFrontUnset = 0xFFFE;
-constexpr uint16_t kFrontMixed = 0xFFFF;
+// A summary that singles out no layer; it matches no receiver.
+constexpr uint16_t kNoFront = 0xFFFF;
 
 uint16_t IdOf(const SY_ShadowEntry& e) {
     return e.tag & kSY_ShadowIdMask;
@@ -70,68 +68,105 @@ bool Dark(const SY_ShadowEntry& e) {
     return e.red == 0 && e.green == 0 && e.blue == 0;
 }
 
-uint16_t JoinFront(uint16_t a, uint16_t b) {
-    return a == kFrontUnset ? b : b == kFrontUnset || a == b ? a : kFrontMixed;
+// What a group of texels gives a receiver, as it is gathered: one layer (front) is singled
+// out, and the texels whose first occluder is of that layer are kept apart from the others,
+// since a receiver of that layer sees past its own occluders.
+struct TexelSummary {
+    uint16_t front = kNoFront;
+    float frontFirst = -kInfinity;   // nearest first occluder of the front layer's texels
+    float frontPass = -kInfinity;    // nearest occluder after the front layer's in those texels
+    float othersFirst = -kInfinity;  // nearest first occluder of the other occupied texels
+    float umbraDepth = kInfinity;
+    uint32_t umbraIds = 0;
+
+    void Join(const TexelSummary& s) {
+        if (front == kNoFront) {
+            front = s.front;
+            frontFirst = s.frontFirst;
+            frontPass = s.frontPass;
+        } else if (s.front == front) {
+            frontFirst = std::max(frontFirst, s.frontFirst);
+            frontPass = std::max(frontPass, s.frontPass);
+        } else {
+            othersFirst = std::max(othersFirst, s.frontFirst);
+        }
+        othersFirst = std::max(othersFirst, s.othersFirst);
+        umbraDepth = std::min(umbraDepth, s.umbraDepth);
+        umbraIds |= s.umbraIds;
+    }
+};
+
+TexelSummary SummaryOf(const SY_ShadowEntry* first, const SY_ShadowEntry* end) {
+    TexelSummary s;
+    if (first == end) {
+        s.umbraDepth = -kInfinity;
+        return s;
+    }
+    // A point nearer than the first occluder, or behind only its own layer's, is lit.
+    const uint16_t id = IdOf(*first);
+    if (id == kSY_ShadowNoLayer) {
+        s.othersFirst = first->depth;
+    } else {
+        s.front = id;
+        s.frontFirst = first->depth;
+        const SY_ShadowEntry* other = first;
+        while (other < end && IdOf(*other) == id)
+            ++other;
+        if (other < end) s.frontPass = other->depth;
+    }
+    // Behind the first of a run of opaque entries that ends the list no light is left, unless
+    // the receiver owns that first entry and looks past its own layer.
+    const SY_ShadowEntry* dark = end;
+    while (dark > first && Dark(dark[-1]))
+        --dark;
+    if (dark == end) {
+        s.umbraDepth = -kInfinity;
+    } else {
+        s.umbraDepth = dark->depth;
+        s.umbraIds = 1u << (IdOf(*dark) & 31);
+    }
+    return s;
 }
 
 }  // namespace
 
 void SY_PlanarShadowMap::BuildTiles() {
-    const int32_t wide = tileStride_;
-    const int32_t high = ((texels_.bottom - texels_.top) >> kTileShift) + 1;
-    const size_t count = static_cast<size_t>(wide) * high;
-    SY_ShadowBlock<Tile> own("shadow map tiles", count);
-    std::fill_n(own.Data(), count, Tile{-kInfinity, -kInfinity, kInfinity, 0, kFrontUnset});
+    // Cells of 2 × 2 texels, so that a tile's reach, two texels to each side, is whole cells.
+    const int32_t width = stride_, height = texels_.bottom - texels_.top;
+    const int32_t cellsWide = (width >> 1) + 1, cellsHigh = (height >> 1) + 1;
+    SY_ShadowBlock<TexelSummary> cells("shadow map tiles",
+                                       static_cast<size_t>(cellsWide) * cellsHigh);
+    std::fill_n(cells.Data(), static_cast<size_t>(cellsWide) * cellsHigh, TexelSummary{});
     const SY_ShadowEntry* entries = entries_.Data();
     size_t texel = 0;
-    for (int32_t j = 0; j < texels_.bottom - texels_.top; ++j) {
-        Tile* row = &own[static_cast<size_t>(j >> kTileShift) * wide];
-        for (int32_t i = 0; i < stride_; ++i, ++texel) {
-            Tile& t = row[i >> kTileShift];
-            const SY_ShadowEntry* first = entries + starts_[texel];
-            const SY_ShadowEntry* end = entries + starts_[texel + 1];
-            if (first == end) {
-                t.umbraDepth = -kInfinity;
-                continue;
-            }
-            // A point nearer than the first occluder, or behind only its own layer's, is lit.
-            t.litDepth = std::max(t.litDepth, first->depth);
-            const uint16_t id = IdOf(*first);
-            const SY_ShadowEntry* other = first;
-            while (other < end && IdOf(*other) == id)
-                ++other;
-            if (other < end) t.frontPassDepth = std::max(t.frontPassDepth, other->depth);
-            t.frontId = JoinFront(t.frontId, id == kSY_ShadowNoLayer ? kFrontMixed : id);
-            // Behind the first of a run of opaque entries that ends the list no light is left,
-            // unless the receiver owns that first entry and looks past its own layer.
-            const SY_ShadowEntry* dark = end;
-            while (dark > first && Dark(dark[-1]))
-                --dark;
-            if (dark == end) {
-                t.umbraDepth = -kInfinity;
-                continue;
-            }
-            t.umbraDepth = std::min(t.umbraDepth, dark->depth);
-            t.umbraIds |= 1u << (IdOf(*dark) & 31);
+    for (int32_t j = 0; j < height; ++j) {
+        TexelSummary* row = &cells[static_cast<size_t>(j >> 1) * cellsWide];
+        for (int32_t i = 0; i < width; ++i, ++texel) {
+            row[i >> 1].Join(SummaryOf(entries + starts_[texel], entries + starts_[texel + 1]));
         }
     }
-    // Each tile takes in its eight neighbours.
-    tiles_ = SY_ShadowBlock<Tile>("shadow map tiles", count);
-    for (int32_t b = 0; b < high; ++b) {
-        for (int32_t a = 0; a < wide; ++a) {
-            Tile sum{-kInfinity, -kInfinity, kInfinity, 0, kFrontUnset};
-            for (int32_t y = std::max(0, b - 1); y <= std::min(high - 1, b + 1); ++y) {
-                for (int32_t x = std::max(0, a - 1); x <= std::min(wide - 1, a + 1); ++x) {
-                    const Tile& t = own[static_cast<size_t>(y) * wide + x];
-                    sum.litDepth = std::max(sum.litDepth, t.litDepth);
-                    sum.frontPassDepth = std::max(sum.frontPassDepth, t.frontPassDepth);
-                    sum.umbraDepth = std::min(sum.umbraDepth, t.umbraDepth);
-                    sum.umbraIds |= t.umbraIds;
-                    sum.frontId = JoinFront(sum.frontId, t.frontId);
+    const int32_t tilesHigh = (height >> kTileShift) + 1;
+    tiles_ = SY_ShadowBlock<Tile>("shadow map tiles", static_cast<size_t>(tileStride_) * tilesHigh);
+    for (int32_t b = 0; b < tilesHigh; ++b) {
+        for (int32_t a = 0; a < tileStride_; ++a) {
+            // The tile's own cells first, so that its front layer is the one they hold.
+            TexelSummary sum;
+            auto take = [&](int32_t x, int32_t y) {
+                if (x >= 0 && x < cellsWide && y >= 0 && y < cellsHigh)
+                    sum.Join(cells[static_cast<size_t>(y) * cellsWide + x]);
+            };
+            for (int32_t y = 2 * b; y <= 2 * b + 1; ++y) {
+                for (int32_t x = 2 * a; x <= 2 * a + 1; ++x)
+                    take(x, y);
+            }
+            for (int32_t y = 2 * b - 1; y <= 2 * b + 2; ++y) {
+                for (int32_t x = 2 * a - 1; x <= 2 * a + 2; ++x) {
+                    if (y < 2 * b || y > 2 * b + 1 || x < 2 * a || x > 2 * a + 1) take(x, y);
                 }
             }
-            if (sum.frontId == kFrontUnset) sum.frontId = kFrontMixed;
-            tiles_[static_cast<size_t>(b) * wide + a] = sum;
+            tiles_[static_cast<size_t>(b) * tileStride_ + a] = {
+                std::max(sum.frontFirst, sum.othersFirst), std::max(sum.frontPass, sum.othersFirst),
+                sum.umbraDepth, sum.umbraIds, sum.front};
         }
     }
 }

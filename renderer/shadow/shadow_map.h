@@ -114,15 +114,15 @@ public:
     bool SeenByNoOtherFace(double x, double y) const;
 
 private:
-    // What every texel a lookup in a tile reads, those of the tiles around it included, gives
+    // What every texel a lookup in a tile reads, two texels around the tile included, gives
     // a receiver: all of the light or none of it, found with one read instead of a walk over
     // up to sixteen texel lists. Neither answer holds where shadow edges run.
     struct Tile {
-        float litDepth;        // a point at least this near the light is lit in every texel
-        float frontPassDepth;  // so is a point of layer frontId at least this near
-        float umbraDepth;      // a point farther than this gets no light in any texel,
-        uint32_t umbraIds;     // unless it is of a layer whose bit (id mod 32) is set
-        uint16_t frontId;      // the layer nearest the light in every occupied texel
+        float litDepth;       // a point at least this near the light is lit in every texel
+        float frontLitDepth;  // so is a point of layer frontId at least this near
+        float umbraDepth;     // a point farther than this gets no light in any texel,
+        uint32_t umbraIds;    // unless it is of a layer whose bit (id mod 32) is set
+        uint16_t frontId;     // a layer that sees past its own occluders; 0xFFFF for none
     };
     enum class Settled { kNo, kLit, kDark };
 
@@ -134,13 +134,13 @@ private:
     Settled SettledAt(int32_t i, int32_t j, double d, uint16_t receiverId) const {
         const Tile& t = tiles_[static_cast<size_t>((j - texels_.top) >> kTileShift) * tileStride_ +
                                ((i - texels_.left) >> kTileShift)];
-        if (d >= t.litDepth || (t.frontId == receiverId && d >= t.frontPassDepth))
+        if (d >= t.litDepth || (t.frontId == receiverId && d >= t.frontLitDepth))
             return Settled::kLit;
         if (d < t.umbraDepth && !((t.umbraIds >> (receiverId & 31)) & 1)) return Settled::kDark;
         return Settled::kNo;
     }
 
-    // Tiles of 4 × 4 texels: their neighbours hold the two texels the filter reaches beyond.
+    // Tiles of 4 × 4 texels.
     static constexpr int32_t kTileShift = 2;
 
     M_Matrix4 matrix_;
