@@ -138,12 +138,27 @@ private:
             if (x < b.left || x >= b.right) continue;
             if (const SY_ShadowFragment* f = *arrays_[k]->HeadAt(x, y)) {
                 next_[k] = f;
-                std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
                 covering_.push_back(k);
             }
         }
         if (covering_.empty()) return;
         uint32_t begin = written_;
+        if (covering_.size() == 1) {
+            // One layer's list is already in order, each entry what that layer lets through.
+            for (const SY_ShadowFragment* f = next_[covering_[0]]; f; f = f->next)
+                Write(*f, f->red, f->green, f->blue);
+        } else {
+            MergeLists();
+        }
+        for (uint32_t i = begin; i + 1 < written_; ++i) {
+            if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
+                entries_[i].tag |= kSY_ShadowStep;
+        }
+    }
+
+    void MergeLists() {
+        for (int32_t k : covering_)
+            std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
         for (;;) {
             // The nearest next occluder; on a tie the earlier array's goes first.
             int32_t nearest = -1;
@@ -158,28 +173,24 @@ private:
             own[0] = f.red * (1.0f / 32768);
             own[1] = f.green * (1.0f / 32768);
             own[2] = f.blue * (1.0f / 32768);
-            SY_ShadowEntry& e = entries_[written_++];
-            e.depth = f.depth;
-            e.tag = f.value16 < kSY_ShadowNoLayer ? f.value16 : kSY_ShadowNoLayer;
-            if (covering_.size() == 1) {
-                e.red = f.red;
-                e.green = f.green;
-                e.blue = f.blue;
-                continue;
-            }
             float product[3] = {1, 1, 1};
             for (int32_t k : covering_) {
                 for (int c = 0; c < 3; ++c)
                     product[c] *= passed_[size_t(k) * 3 + c];
             }
-            e.red = static_cast<uint16_t>(product[0] * 32768 + 0.5f);
-            e.green = static_cast<uint16_t>(product[1] * 32768 + 0.5f);
-            e.blue = static_cast<uint16_t>(product[2] * 32768 + 0.5f);
+            Write(f, static_cast<uint16_t>(product[0] * 32768 + 0.5f),
+                  static_cast<uint16_t>(product[1] * 32768 + 0.5f),
+                  static_cast<uint16_t>(product[2] * 32768 + 0.5f));
         }
-        for (uint32_t i = begin; i + 1 < written_; ++i) {
-            if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
-                entries_[i].tag |= kSY_ShadowStep;
-        }
+    }
+
+    void Write(const SY_ShadowFragment& f, uint16_t red, uint16_t green, uint16_t blue) {
+        SY_ShadowEntry& e = entries_[written_++];
+        e.depth = f.depth;
+        e.tag = f.value16 < kSY_ShadowNoLayer ? f.value16 : kSY_ShadowNoLayer;
+        e.red = red;
+        e.green = green;
+        e.blue = blue;
     }
 
     const SY_ShadowFragmentArrayList& arrays_;
