@@ -8,9 +8,6 @@
 namespace {
 
 constexpr float kFromFixed = 1.0f / 32768.0f;
-// A point this close to a spot or point light's eye plane, or in front of a parallel light's
-// far plane, lies outside the map.
-constexpr double kNearestDepth = 0.001;
 
 // Filter weights of the soft lookup by squared texel distance q: weight[trunc(16·q)] is
 // exp(−q), a table rather than a call per texel.
@@ -31,18 +28,14 @@ void SetEntry(const SY_ShadowEntry& e, float t[3]) {
     t[2] = e.blue * kFromFixed;
 }
 
-double Row(const M_Matrix4& m, int column, const double p[3]) {
-    return p[0] * m.mat[0][column] + p[1] * m.mat[1][column] + p[2] * m.mat[2][column] +
-           m.mat[3][column];
-}
-
 }  // namespace
 
 SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspective,
                                        const double mapRect[4], const M_LRect& texels,
                                        SY_ShadowBlock<uint32_t> starts,
                                        SY_ShadowBlock<SY_ShadowEntry> entries)
-    : matrix_(worldToMap),
+    : SY_ShadowMap(Kind::kPlanar),
+      matrix_(worldToMap),
       perspective_(perspective),
       texels_(texels),
       stride_(texels.right - texels.left),
@@ -171,23 +164,6 @@ void SY_PlanarShadowMap::BuildTiles() {
     }
 }
 
-bool SY_PlanarShadowMap::Project(const double p[3], double* x, double* y, double* d) const {
-    if (perspective_) {
-        double w = Row(matrix_, 3, p);
-        if (w < kNearestDepth) return false;
-        *x = Row(matrix_, 0, p) / w;
-        *y = Row(matrix_, 1, p) / w;
-        *d = 1.0 / w;
-        return true;
-    }
-    // The map's z grows away from the light; the depth key grows toward it.
-    *d = -Row(matrix_, 2, p);
-    if (*d > -kNearestDepth) return false;
-    *x = Row(matrix_, 0, p);
-    *y = Row(matrix_, 1, p);
-    return true;
-}
-
 namespace {
 
 // The light left at depth d behind the occluders [first, end) of one texel, for the layer
@@ -232,26 +208,16 @@ void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint1
                      receiverId, t);
 }
 
-void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t receiverId,
-                                        bool soft, float t[3]) const {
+void SY_PlanarShadowMap::WalkTexels(double x, double y, double d, uint16_t receiverId, bool soft,
+                                    float t[3]) const {
     if (!soft) {
         double i = std::floor(x), j = std::floor(y);
         if (!(i >= texels_.left && i < texels_.right && j >= texels_.top && j < texels_.bottom)) {
             SetFull(t);
             return;
         }
-        const auto ii = static_cast<int32_t>(i), jj = static_cast<int32_t>(j);
-        switch (SettledAt(ii, jj, d, receiverId)) {
-            case Settled::kLit:
-                SetFull(t);
-                return;
-            case Settled::kDark:
-                t[0] = t[1] = t[2] = 0.0f;
-                return;
-            case Settled::kNo:
-                TexelTransmission(ii, jj, d, receiverId, t);
-                return;
-        }
+        TexelTransmission(static_cast<int32_t>(i), static_cast<int32_t>(j), d, receiverId, t);
+        return;
     }
     // Far outside the texels nothing is near enough to filter (and the texel index would not
     // fit its type).
@@ -268,20 +234,6 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
     int32_t i0 = static_cast<int32_t>(fi), j0 = static_cast<int32_t>(fj);
     bool inside = i0 - 1 >= texels_.left && i0 + 2 < texels_.right && j0 - 1 >= texels_.top &&
                   j0 + 2 < texels_.bottom;
-    if (inside) {
-        // The weighed texels lie within two of (i0 + 1, j0 + 1), so its tile settles them.
-        switch (SettledAt(i0 + 1, j0 + 1, d, receiverId)) {
-            case Settled::kLit:
-                SetFull(t);
-                return;
-            case Settled::kDark:
-                // Every weighed texel gives 0, and so does their mean.
-                t[0] = t[1] = t[2] = 0.0f;
-                return;
-            case Settled::kNo:
-                break;
-        }
-    }
     double qx[4], qy[4];
     for (int k = 0; k < 4; ++k) {
         qx[k] = (k - 1 - fx) * (k - 1 - fx);
@@ -320,64 +272,12 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
         t[c] = weights > 0 ? sum[c] / weights : 0.0f;
 }
 
-bool SY_PlanarShadowMap::SeenByNoOtherFace(double x, double y) const {
-    // Within 40° of the axis a point lies 50° or more off the axes of the faces around, which
-    // span 50° to each side: tan 40° / tan 50° of the half size, a little less to be safe.
-    constexpr double kOwnShare = 0.7;
-    return std::fabs(x - centre_[0]) < kOwnShare * half_[0] &&
-           std::fabs(y - centre_[1]) < kOwnShare * half_[1];
-}
-
-float SY_PlanarShadowMap::FaceWeight(double x, double y, double inset) const {
-    double wx = 1.0 - std::fabs(x - centre_[0]) / (half_[0] - inset);
-    double wy = 1.0 - std::fabs(y - centre_[1]) / (half_[1] - inset);
-    return wx > 0 && wy > 0 ? static_cast<float>(wx * wy) : 0.0f;
-}
-
-void SY_PlanarShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
-                                float out[4]) const {
-    double x, y, d;
-    if (!Project(p, &x, &y, &d)) {
-        SetFull(out + 1);
-        return;
-    }
-    TransmissionAt(x, y, d, receiverId, soft, out + 1);
-}
-
 void SY_PlanarShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
     Lookup(p, receiverId, false, out);
 }
 
 void SY_PlanarShadowMap::SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const {
     Lookup(p, receiverId, true, out);
-}
-
-void SY_CubicShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
-                               float out[4]) const {
-    // The soft filter reaches two texels beyond the point, so its faces end two texels sooner.
-    double inset = soft ? 2.0 : 0.0;
-    float sum[3] = {0, 0, 0}, weights = 0;
-    for (int32_t f = 0; f < count_; ++f) {
-        double x, y, d;
-        if (!faces_[f]->Project(p, &x, &y, &d)) continue;
-        if (faces_[f]->SeenByNoOtherFace(x, y)) {
-            faces_[f]->TransmissionAt(x, y, d, receiverId, soft, out + 1);
-            return;
-        }
-        float w = faces_[f]->FaceWeight(x, y, inset);
-        if (w <= 0) continue;
-        float t[3];
-        faces_[f]->TransmissionAt(x, y, d, receiverId, soft, t);
-        for (int c = 0; c < 3; ++c)
-            sum[c] += w * t[c];
-        weights += w;
-    }
-    if (weights <= 0) {
-        SetFull(out + 1);
-        return;
-    }
-    for (int c = 0; c < 3; ++c)
-        out[1 + c] = sum[c] / weights;
 }
 
 void SY_CubicShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
