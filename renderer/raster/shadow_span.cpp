@@ -53,10 +53,12 @@ bool Occluder(const P& sample, const SY_ShadowShader& shader, PF_Pixel16* out) {
 }
 
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
-// the layer's summed-area table (sums of type S).
+// the layer's summed-area table (sums of type S). With alphaOfOpaque, where only alpha matters
+// and every texel has full alpha, a whole-texel box inside the texture sums to its own area
+// without a look at the table; its colour is then left black.
 template <class P, class S>
 void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& texture,
-               const SY_SpanMapping& m, float scale, P* out) {
+               const SY_SpanMapping& m, float scale, bool alphaOfOpaque, P* out) {
     using sy_sampling::kFarTexels;
     if (!sy_sampling::InFront(m, texture.perspective)) {
         *out = P{};
@@ -73,10 +75,17 @@ void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& t
     // fractional edges (under a quarter of its width) do not show.
     constexpr double kWholeTexelsFrom = 2.0;
     if (!filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom)) {
-        PF_SummedAreaTable_SampleDraft(
-            table.Width(), table.Height(), sums, static_cast<int32_t>(std::floor(cu - ru)),
-            static_cast<int32_t>(std::floor(cv - rv)), static_cast<int32_t>(std::ceil(cu + ru)),
-            static_cast<int32_t>(std::ceil(cv + rv)), out);
+        const auto x0 = static_cast<int32_t>(std::floor(cu - ru)),
+                   y0 = static_cast<int32_t>(std::floor(cv - rv)),
+                   x1 = static_cast<int32_t>(std::ceil(cu + ru)),
+                   y1 = static_cast<int32_t>(std::ceil(cv + rv));
+        if (alphaOfOpaque && x0 >= 0 && y0 >= 0 && x1 <= table.Width() && y1 <= table.Height() &&
+            x1 > x0 && y1 > y0) {
+            const float area = float(x1 - x0) * float(y1 - y0);
+            pf_tables::StoreAverage(PF_Float4{area, 0.0f, 0.0f, 0.0f}, area, out);
+            return;
+        }
+        PF_SummedAreaTable_SampleDraft(table.Width(), table.Height(), sums, x0, y0, x1, y1, out);
         return;
     }
     if (ru > 0.5 && rv > 0.5) {
@@ -102,19 +111,19 @@ const SY_SpanMapping* FirstPresent(const SY_SpanSubsampleState<P>& state) {
 
 template <class P, class S>
 void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSampleState<P>& state,
-                   float scale, P* out) {
-    SampleBox(table, sums, state.texture, state.mapping, scale, out);
+                   float scale, bool alphaOfOpaque, P* out) {
+    SampleBox(table, sums, state.texture, state.mapping, scale, alphaOfOpaque, out);
 }
 
 // The box average over the present subsamples, alpha falling with the absent ones.
 template <class P, class S>
 void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsampleState<P>& state,
-                   float scale, P* out) {
+                   float scale, bool alphaOfOpaque, P* out) {
     sy_sampling::Accumulator sum;
     for (int32_t i = state.first; i <= state.last; ++i) {
         if (!(state.mappings[i].invW > 0)) continue;
         P texel;
-        SampleBox(table, sums, state.texture, state.mappings[i], scale, &texel);
+        SampleBox(table, sums, state.texture, state.mappings[i], scale, alphaOfOpaque, &texel);
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
@@ -186,11 +195,13 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
         return;
     }
     const PF_SummedAreaTable& table = *geometry.sumTable;
+    // A layer that passes no colour shadows by its alpha alone.
+    const bool alphaOfOpaque = shader.transmission == 0 && geometry.opaqueTexture;
     auto draw = [&](const auto* sums) {
         DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
             // The box reaches the level's radius, and at least the texel's own footprint.
             float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-            SampleBlurred(table, sums, state, scale, out);
+            SampleBlurred(table, sums, state, scale, alphaOfOpaque, out);
         });
     };
     if (table.HasDoubleSums())
