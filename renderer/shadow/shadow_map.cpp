@@ -70,7 +70,7 @@ struct TexelSummary {
     float frontPass = -kInfinity;    // nearest occluder after the front layer's in those texels
     float othersFirst = -kInfinity;  // nearest first occluder of the other occupied texels
     float umbraDepth = kInfinity;
-    uint32_t umbraIds = 0;
+    uint16_t umbraIds = 0;
 
     void Join(const TexelSummary& s) {
         if (front == kNoFront) {
@@ -85,7 +85,7 @@ struct TexelSummary {
         }
         othersFirst = std::max(othersFirst, s.othersFirst);
         umbraDepth = std::min(umbraDepth, s.umbraDepth);
-        umbraIds |= s.umbraIds;
+        umbraIds = static_cast<uint16_t>(umbraIds | s.umbraIds);
     }
 };
 
@@ -116,7 +116,7 @@ TexelSummary SummaryOf(const SY_ShadowEntry* first, const SY_ShadowEntry* end) {
         s.umbraDepth = -kInfinity;
     } else {
         s.umbraDepth = dark->depth;
-        s.umbraIds = 1u << (IdOf(*dark) & 31);
+        s.umbraIds = static_cast<uint16_t>(1u << (IdOf(*dark) & 15));
     }
     return s;
 }
@@ -135,7 +135,11 @@ void SY_PlanarShadowMap::BuildTiles() {
     for (int32_t j = 0; j < height; ++j) {
         TexelSummary* row = &cells[static_cast<size_t>(j >> 1) * cellsWide];
         for (int32_t i = 0; i < width; ++i, ++texel) {
-            row[i >> 1].Join(SummaryOf(entries + starts_[texel], entries + starts_[texel + 1]));
+            // An empty texel lets all light through: no darkness anywhere in its cell.
+            if (starts_[texel] == starts_[texel + 1])
+                row[i >> 1].umbraDepth = -kInfinity;
+            else
+                row[i >> 1].Join(SummaryOf(entries + starts_[texel], entries + starts_[texel + 1]));
         }
     }
     const int32_t tilesHigh = (height >> kTileShift) + 1;

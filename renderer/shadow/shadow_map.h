@@ -194,9 +194,10 @@ private:
         float litDepth;       // a point at least this near the light is lit in every texel
         float frontLitDepth;  // so is a point of layer frontId at least this near
         float umbraDepth;     // a point farther than this gets no light in any texel,
-        uint32_t umbraIds;    // unless it is of a layer whose bit (id mod 32) is set
+        uint16_t umbraIds;    // unless it is of a layer whose bit (id mod 16) is set
         uint16_t frontId;     // a layer that sees past its own occluders; 0xFFFF for none
     };
+    static_assert(sizeof(Tile) == 16, "four tiles to a cache line");
     enum class Settled { kNo, kLit, kDark };
 
     double Row(int column, const double p[3]) const {
@@ -214,7 +215,7 @@ private:
                                ((i - texels_.left) >> kTileShift)];
         if (d >= t.litDepth || (t.frontId == receiverId && d >= t.frontLitDepth))
             return Settled::kLit;
-        if (d < t.umbraDepth && !((t.umbraIds >> (receiverId & 31)) & 1)) return Settled::kDark;
+        if (d < t.umbraDepth && !((t.umbraIds >> (receiverId & 15)) & 1)) return Settled::kDark;
         return Settled::kNo;
     }
 
