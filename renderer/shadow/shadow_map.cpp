@@ -44,6 +44,8 @@ SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspec
       tileStride_(((texels.right - texels.left) >> kTileShift) + 1),
       centre_{(mapRect[0] + mapRect[2]) * 0.5, (mapRect[1] + mapRect[3]) * 0.5},
       half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {
+    for (int k = 0; k < 4; ++k)
+        columnsXY_[k] = Pair{matrix_.mat[k][0], matrix_.mat[k][1]};
     BuildTiles();
 }
 
