@@ -153,7 +153,7 @@ void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsam
     sum.Resolve(state.count, out);
 }
 
-// Steps the state across the span; sample(level, out) gives the layer's colour at a level.
+// The two occluders let the same light through.
 bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
     return a.red == b.red && a.green == b.green && a.blue == b.blue;
 }
