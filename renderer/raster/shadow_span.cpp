@@ -169,6 +169,13 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     const int32_t levels = shader.levelCount;
     PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
     bool present[SY_ShadowShader::kMaxLevels];
+    constexpr auto kOpaque = static_cast<decltype(P::alpha)>(PF_PixelTraits<P>::kMax);
+    // What a layer that passes no colour lets through where it is opaque: its colour counts
+    // for nothing, so one grey serves the whole span.
+    PF_Pixel16 opaqueGrey{};
+    P opaque{};
+    opaque.alpha = kOpaque;
+    Occluder(opaque, shader, &opaqueGrey);
     for (int32_t i = 0; i < count; ++i, state.Step()) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) continue;
@@ -176,12 +183,9 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
         // passes no colour then lets the same grey through at every level.
         P widest;
         sample(levels - 1, &widest);
-        constexpr auto kOpaque = static_cast<decltype(widest.alpha)>(PF_PixelTraits<P>::kMax);
         if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
-            PF_Pixel16 occluder;
-            Occluder(widest, shader, &occluder);
-            array->AddShadowFragment(&occluder, shader.DepthKey(depth->w, 0), 0.0f, shader.layerId,
-                                     heads + i, thread);
+            array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
+                                     shader.layerId, heads + i, thread);
             continue;
         }
         present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
