@@ -107,6 +107,8 @@ public:
         passed_.resize(size_t(n) * 3);
         rowArrays_.reserve(size_t(n));
         covering_.reserve(size_t(n));
+        rowCovers_.resize(size_t(texels_.right - texels_.left));
+        rowOnly_.resize(size_t(texels_.right - texels_.left));
     }
 
     const M_LRect& Texels() const { return texels_; }
@@ -119,9 +121,15 @@ public:
                 const M_LRect& b = arrays_[k]->Bounds();
                 if (y >= b.top && y < b.bottom) rowArrays_.push_back(k);
             }
+            CountCovers(y);
             for (int32_t x = texels_.left; x < texels_.right; ++x) {
                 starts_[texel++] = written_;
-                MergeTexel(x, y);
+                const size_t column = size_t(x - texels_.left);
+                if (rowCovers_[column] == 0) continue;
+                if (rowCovers_[column] == 1)
+                    CopyList(*arrays_[rowOnly_[column]]->HeadAt(x, y));
+                else
+                    MergeTexel(x, y);
             }
         }
         starts_[texel] = written_;
@@ -131,6 +139,37 @@ public:
     SY_ShadowBlock<SY_ShadowEntry> TakeEntries() { return std::move(entries_); }
 
 private:
+    // How many arrays have a list at each texel of row y (up to 2), and which one where only
+    // one has: most texels lie under one caster or none.
+    void CountCovers(int32_t y) {
+        std::fill(rowCovers_.begin(), rowCovers_.end(), uint8_t{0});
+        for (int32_t k : rowArrays_) {
+            const M_LRect& b = arrays_[k]->Bounds();
+            SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
+            for (int32_t x = b.left; x < b.right; ++x) {
+                if (!heads[x - b.left]) continue;
+                const size_t column = size_t(x - texels_.left);
+                rowCovers_[column] = static_cast<uint8_t>(std::min(2, rowCovers_[column] + 1));
+                rowOnly_[column] = k;
+            }
+        }
+    }
+
+    // One layer's list is already in order, each entry what that layer lets through.
+    void CopyList(const SY_ShadowFragment* f) {
+        uint32_t begin = written_;
+        for (; f; f = f->next)
+            Write(*f, f->red, f->green, f->blue);
+        MarkSteps(begin);
+    }
+
+    void MarkSteps(uint32_t begin) {
+        for (uint32_t i = begin; i + 1 < written_; ++i) {
+            if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
+                entries_[i].tag |= kSY_ShadowStep;
+        }
+    }
+
     void MergeTexel(int32_t x, int32_t y) {
         covering_.clear();
         for (int32_t k : rowArrays_) {
@@ -138,12 +177,17 @@ private:
             if (x < b.left || x >= b.right) continue;
             if (const SY_ShadowFragment* f = *arrays_[k]->HeadAt(x, y)) {
                 next_[k] = f;
-                std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
                 covering_.push_back(k);
             }
         }
-        if (covering_.empty()) return;
         uint32_t begin = written_;
+        MergeLists();
+        MarkSteps(begin);
+    }
+
+    void MergeLists() {
+        for (int32_t k : covering_)
+            std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
         for (;;) {
             // The nearest next occluder; on a tie the earlier array's goes first.
             int32_t nearest = -1;
@@ -158,28 +202,24 @@ private:
             own[0] = f.red * (1.0f / 32768);
             own[1] = f.green * (1.0f / 32768);
             own[2] = f.blue * (1.0f / 32768);
-            SY_ShadowEntry& e = entries_[written_++];
-            e.depth = f.depth;
-            e.tag = f.value16 < kSY_ShadowNoLayer ? f.value16 : kSY_ShadowNoLayer;
-            if (covering_.size() == 1) {
-                e.red = f.red;
-                e.green = f.green;
-                e.blue = f.blue;
-                continue;
-            }
             float product[3] = {1, 1, 1};
             for (int32_t k : covering_) {
                 for (int c = 0; c < 3; ++c)
                     product[c] *= passed_[size_t(k) * 3 + c];
             }
-            e.red = static_cast<uint16_t>(product[0] * 32768 + 0.5f);
-            e.green = static_cast<uint16_t>(product[1] * 32768 + 0.5f);
-            e.blue = static_cast<uint16_t>(product[2] * 32768 + 0.5f);
+            Write(f, static_cast<uint16_t>(product[0] * 32768 + 0.5f),
+                  static_cast<uint16_t>(product[1] * 32768 + 0.5f),
+                  static_cast<uint16_t>(product[2] * 32768 + 0.5f));
         }
-        for (uint32_t i = begin; i + 1 < written_; ++i) {
-            if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
-                entries_[i].tag |= kSY_ShadowStep;
-        }
+    }
+
+    void Write(const SY_ShadowFragment& f, uint16_t red, uint16_t green, uint16_t blue) {
+        SY_ShadowEntry& e = entries_[written_++];
+        e.depth = f.depth;
+        e.tag = f.value16 < kSY_ShadowNoLayer ? f.value16 : kSY_ShadowNoLayer;
+        e.red = red;
+        e.green = green;
+        e.blue = blue;
     }
 
     const SY_ShadowFragmentArrayList& arrays_;
@@ -191,6 +231,8 @@ private:
     SY_AccountedVector<float> passed_;  // red, green, blue let through by each array so far
     SY_AccountedVector<int32_t> rowArrays_;
     SY_AccountedVector<int32_t> covering_;
+    SY_AccountedVector<uint8_t> rowCovers_;
+    SY_AccountedVector<int32_t> rowOnly_;
 };
 
 // What one face of a light needs to render its map.

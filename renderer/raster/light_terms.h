@@ -82,11 +82,7 @@ void SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiver
         float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
         if (L::LaneOn(active, i)) {
             const double point[3] = {L::Lane(p[0], i), L::Lane(p[1], i), L::Lane(p[2], i)};
-            if (soft) {
-                map.SoftLookup(point, receiverId, out);
-            } else {
-                map.HardLookup(point, receiverId, out);
-            }
+            map.Lookup(point, receiverId, soft, out);
         }
         for (int c = 0; c < 3; ++c)
             lanes[c][i] = out[1 + c];

@@ -40,7 +40,8 @@ public:
 
     // The depth key of blur level `level` for a layer point at map depth w (larger is nearer).
     float DepthKey(double w, int32_t level) const {
-        if (!soft) return static_cast<float>(w);
+        // Level 0 is the sharp one, at the layer itself.
+        if (!soft || level == 0) return static_cast<float>(w);
         return static_cast<float>(perspective ? w / (1.0 + ratio[level])
                                               : w - ratio[level] * diffusion);
     }

@@ -52,11 +52,38 @@ bool Occluder(const P& sample, const SY_ShadowShader& shader, PF_Pixel16* out) {
     return true;
 }
 
+// Box averages of a texture whose texels all have full alpha, for a layer that shadows by alpha
+// alone: a whole-texel box inside the texture sums to its own area without a look at the
+// table, so every box of one area averages alike. Colour is left black.
+template <class P>
+class OpaqueBoxes {
+public:
+    // area: a whole number of texels, at least 1.
+    const P& Average(float area) {
+        // Boxes along a span take a few areas by turns, as their edges round one way or the
+        // other: one slot per area modulo the slot count.
+        Slot& slot = slots_[static_cast<uint32_t>(area) % kSlots];
+        if (slot.area != area) {
+            slot.area = area;
+            pf_tables::StoreAverage(PF_Float4{area, 0.0f, 0.0f, 0.0f}, area, &slot.average);
+        }
+        return slot.average;
+    }
+
+private:
+    static constexpr uint32_t kSlots = 16;
+    struct Slot {
+        float area = 0.0f;  // no box has it
+        P average{};
+    };
+    Slot slots_[kSlots];
+};
+
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
-// the layer's summed-area table (sums of type S).
+// the layer's summed-area table (sums of type S), or from opaque where there is one.
 template <class P, class S>
 void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& texture,
-               const SY_SpanMapping& m, float scale, P* out) {
+               const SY_SpanMapping& m, float scale, OpaqueBoxes<P>* opaque, P* out) {
     using sy_sampling::kFarTexels;
     if (!sy_sampling::InFront(m, texture.perspective)) {
         *out = P{};
@@ -73,10 +100,16 @@ void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& t
     // fractional edges (under a quarter of its width) do not show.
     constexpr double kWholeTexelsFrom = 2.0;
     if (!filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom)) {
-        PF_SummedAreaTable_SampleDraft(
-            table.Width(), table.Height(), sums, static_cast<int32_t>(std::floor(cu - ru)),
-            static_cast<int32_t>(std::floor(cv - rv)), static_cast<int32_t>(std::ceil(cu + ru)),
-            static_cast<int32_t>(std::ceil(cv + rv)), out);
+        const auto x0 = static_cast<int32_t>(std::floor(cu - ru)),
+                   y0 = static_cast<int32_t>(std::floor(cv - rv)),
+                   x1 = static_cast<int32_t>(std::ceil(cu + ru)),
+                   y1 = static_cast<int32_t>(std::ceil(cv + rv));
+        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= table.Width() && y1 <= table.Height() &&
+            x1 > x0 && y1 > y0) {
+            *out = opaque->Average(float(x1 - x0) * float(y1 - y0));
+            return;
+        }
+        PF_SummedAreaTable_SampleDraft(table.Width(), table.Height(), sums, x0, y0, x1, y1, out);
         return;
     }
     if (ru > 0.5 && rv > 0.5) {
@@ -102,25 +135,25 @@ const SY_SpanMapping* FirstPresent(const SY_SpanSubsampleState<P>& state) {
 
 template <class P, class S>
 void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSampleState<P>& state,
-                   float scale, P* out) {
-    SampleBox(table, sums, state.texture, state.mapping, scale, out);
+                   float scale, OpaqueBoxes<P>* opaque, P* out) {
+    SampleBox(table, sums, state.texture, state.mapping, scale, opaque, out);
 }
 
 // The box average over the present subsamples, alpha falling with the absent ones.
 template <class P, class S>
 void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsampleState<P>& state,
-                   float scale, P* out) {
+                   float scale, OpaqueBoxes<P>* opaque, P* out) {
     sy_sampling::Accumulator sum;
     for (int32_t i = state.first; i <= state.last; ++i) {
         if (!(state.mappings[i].invW > 0)) continue;
         P texel;
-        SampleBox(table, sums, state.texture, state.mappings[i], scale, &texel);
+        SampleBox(table, sums, state.texture, state.mappings[i], scale, opaque, &texel);
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
 }
 
-// Steps the state across the span; sample(level, out) gives the layer's colour at a level.
+// The two occluders let the same light through.
 bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
     return a.red == b.red && a.green == b.green && a.blue == b.blue;
 }
@@ -136,6 +169,13 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     const int32_t levels = shader.levelCount;
     PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
     bool present[SY_ShadowShader::kMaxLevels];
+    constexpr auto kOpaque = static_cast<decltype(P::alpha)>(PF_PixelTraits<P>::kMax);
+    // What a layer that passes no colour lets through where it is opaque: its colour counts
+    // for nothing, so one grey serves the whole span.
+    PF_Pixel16 opaqueGrey{};
+    P opaque{};
+    opaque.alpha = kOpaque;
+    Occluder(opaque, shader, &opaqueGrey);
     for (int32_t i = 0; i < count; ++i, state.Step()) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) continue;
@@ -143,12 +183,9 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
         // passes no colour then lets the same grey through at every level.
         P widest;
         sample(levels - 1, &widest);
-        constexpr auto kOpaque = static_cast<decltype(widest.alpha)>(PF_PixelTraits<P>::kMax);
         if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
-            PF_Pixel16 occluder;
-            Occluder(widest, shader, &occluder);
-            array->AddShadowFragment(&occluder, shader.DepthKey(depth->w, 0), 0.0f, shader.layerId,
-                                     heads + i, thread);
+            array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
+                                     shader.layerId, heads + i, thread);
             continue;
         }
         present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
@@ -186,11 +223,14 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
         return;
     }
     const PF_SummedAreaTable& table = *geometry.sumTable;
+    // A layer that passes no colour shadows by its alpha alone.
+    OpaqueBoxes<P> boxes;
+    OpaqueBoxes<P>* opaque = shader.transmission == 0 && geometry.opaqueTexture ? &boxes : nullptr;
     auto draw = [&](const auto* sums) {
         DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
             // The box reaches the level's radius, and at least the texel's own footprint.
             float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-            SampleBlurred(table, sums, state, scale, out);
+            SampleBlurred(table, sums, state, scale, opaque, out);
         });
     };
     if (table.HasDoubleSums())

@@ -45,6 +45,7 @@ public:
     // Sums over the texture for the box averages of a blurred shadow caster, kept by the
     // render context; null otherwise.
     const PF_SummedAreaTable* sumTable = nullptr;
+    bool opaqueTexture = false;  // every texel has full alpha; known with the sums only
     // Per subsample: U = m0·x + m3·y + m6, V = m1·x + m4·y + m7, W = m2·x + m5·y + m8 for the
     // screen point (x, y); the texture position is (U/W, V/W) under perspective and (U, V)
     // otherwise, and a larger W is nearer. All zero for a subsample that is not valid.

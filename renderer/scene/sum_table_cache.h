@@ -13,8 +13,9 @@
 class SY_SumTableCache {
 public:
     // The table over texture, which the fetcher delivered for the layer renderIndex; made on
-    // first use. Throws 4 when memory runs out.
-    const PF_SummedAreaTable& For(int32_t renderIndex, const PF_World& texture);
+    // first use. *opaque tells whether every texel of the texture has full alpha. Throws 4
+    // when memory runs out.
+    const PF_SummedAreaTable& For(int32_t renderIndex, const PF_World& texture, bool* opaque);
     // Frees every table.
     void Clear() { entries_.clear(); }
 
@@ -27,6 +28,7 @@ private:
         int32_t width;
         int32_t height;
         std::unique_ptr<PF_SummedAreaTable> table;
+        bool opaque;
     };
     SY_AccountedVector<Entry> entries_;
 };

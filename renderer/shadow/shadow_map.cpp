@@ -1,14 +1,13 @@
 #include "renderer/shadow/shadow_map.h"
 
+#include <algorithm>
 #include <array>
 #include <cmath>
+#include <limits>
 
 namespace {
 
 constexpr float kFromFixed = 1.0f / 32768.0f;
-// A point this close to a spot or point light's eye plane, or in front of a parallel light's
-// far plane, lies outside the map.
-constexpr double kNearestDepth = 0.001;
 
 // Filter weights of the soft lookup by squared texel distance q: weight[trunc(16·q)] is
 // exp(−q), a table rather than a call per texel.
@@ -29,41 +28,146 @@ void SetEntry(const SY_ShadowEntry& e, float t[3]) {
     t[2] = e.blue * kFromFixed;
 }
 
-double Row(const M_Matrix4& m, int column, const double p[3]) {
-    return p[0] * m.mat[0][column] + p[1] * m.mat[1][column] + p[2] * m.mat[2][column] +
-           m.mat[3][column];
-}
-
 }  // namespace
 
 SY_PlanarShadowMap::SY_PlanarShadowMap(const M_Matrix4& worldToMap, bool perspective,
                                        const double mapRect[4], const M_LRect& texels,
                                        SY_ShadowBlock<uint32_t> starts,
                                        SY_ShadowBlock<SY_ShadowEntry> entries)
-    : matrix_(worldToMap),
+    : SY_ShadowMap(Kind::kPlanar),
+      matrix_(worldToMap),
       perspective_(perspective),
       texels_(texels),
       stride_(texels.right - texels.left),
       starts_(std::move(starts)),
       entries_(std::move(entries)),
+      tileStride_(((texels.right - texels.left) >> kTileShift) + 1),
       centre_{(mapRect[0] + mapRect[2]) * 0.5, (mapRect[1] + mapRect[3]) * 0.5},
-      half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {}
+      half_{(mapRect[2] - mapRect[0]) * 0.5, (mapRect[3] - mapRect[1]) * 0.5} {
+    for (int k = 0; k < 4; ++k)
+        columnsXY_[k] = Pair{matrix_.mat[k][0], matrix_.mat[k][1]};
+    BuildTiles();
+}
 
-bool SY_PlanarShadowMap::Project(const double p[3], double* x, double* y, double* d) const {
-    if (perspective_) {
-        double w = Row(matrix_, 3, p);
-        if (w < kNearestDepth) return false;
-        *x = Row(matrix_, 0, p) / w;
-        *y = Row(matrix_, 1, p) / w;
-        *d = 1.0 / w;
-        return true;
+namespace {
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+// A summary that singles out no layer; it matches no receiver.
+constexpr uint16_t kNoFront = 0xFFFF;
+
+uint16_t IdOf(const SY_ShadowEntry& e) {
+    return e.tag & kSY_ShadowIdMask;
+}
+
+bool Dark(const SY_ShadowEntry& e) {
+    return e.red == 0 && e.green == 0 && e.blue == 0;
+}
+
+// What a group of texels gives a receiver, as it is gathered: one layer (front) is singled
+// out, and the texels whose first occluder is of that layer are kept apart from the others,
+// since a receiver of that layer sees past its own occluders.
+struct TexelSummary {
+    uint16_t front = kNoFront;
+    float frontFirst = -kInfinity;   // nearest first occluder of the front layer's texels
+    float frontPass = -kInfinity;    // nearest occluder after the front layer's in those texels
+    float othersFirst = -kInfinity;  // nearest first occluder of the other occupied texels
+    float umbraDepth = kInfinity;
+    uint16_t umbraIds = 0;
+
+    void Join(const TexelSummary& s) {
+        if (front == kNoFront) {
+            front = s.front;
+            frontFirst = s.frontFirst;
+            frontPass = s.frontPass;
+        } else if (s.front == front) {
+            frontFirst = std::max(frontFirst, s.frontFirst);
+            frontPass = std::max(frontPass, s.frontPass);
+        } else {
+            othersFirst = std::max(othersFirst, s.frontFirst);
+        }
+        othersFirst = std::max(othersFirst, s.othersFirst);
+        umbraDepth = std::min(umbraDepth, s.umbraDepth);
+        umbraIds = static_cast<uint16_t>(umbraIds | s.umbraIds);
     }
-    // The map's z grows away from the light; the depth key grows toward it.
-    *d = -Row(matrix_, 2, p);
-    if (*d > -kNearestDepth) return false;
-    *x = Row(matrix_, 0, p);
-    *y = Row(matrix_, 1, p);
-    return true;
+};
+
+TexelSummary SummaryOf(const SY_ShadowEntry* first, const SY_ShadowEntry* end) {
+    TexelSummary s;
+    if (first == end) {
+        s.umbraDepth = -kInfinity;
+        return s;
+    }
+    // A point nearer than the first occluder, or behind only its own layer's, is lit.
+    const uint16_t id = IdOf(*first);
+    if (id == kSY_ShadowNoLayer) {
+        s.othersFirst = first->depth;
+    } else {
+        s.front = id;
+        s.frontFirst = first->depth;
+        const SY_ShadowEntry* other = first;
+        while (other < end && IdOf(*other) == id)
+            ++other;
+        if (other < end) s.frontPass = other->depth;
+    }
+    // Behind the first of a run of opaque entries that ends the list no light is left, unless
+    // the receiver owns that first entry and looks past its own layer.
+    const SY_ShadowEntry* dark = end;
+    while (dark > first && Dark(dark[-1]))
+        --dark;
+    if (dark == end) {
+        s.umbraDepth = -kInfinity;
+    } else {
+        s.umbraDepth = dark->depth;
+        s.umbraIds = static_cast<uint16_t>(1u << (IdOf(*dark) & 15));
+    }
+    return s;
+}
+
+}  // namespace
+
+void SY_PlanarShadowMap::BuildTiles() {
+    // Cells of 2 × 2 texels, so that a tile's reach, two texels to each side, is whole cells.
+    const int32_t width = stride_, height = texels_.bottom - texels_.top;
+    const int32_t cellsWide = (width >> 1) + 1, cellsHigh = (height >> 1) + 1;
+    SY_ShadowBlock<TexelSummary> cells("shadow map tiles",
+                                       static_cast<size_t>(cellsWide) * cellsHigh);
+    std::fill_n(cells.Data(), static_cast<size_t>(cellsWide) * cellsHigh, TexelSummary{});
+    const SY_ShadowEntry* entries = entries_.Data();
+    size_t texel = 0;
+    for (int32_t j = 0; j < height; ++j) {
+        TexelSummary* row = &cells[static_cast<size_t>(j >> 1) * cellsWide];
+        for (int32_t i = 0; i < width; ++i, ++texel) {
+            // An empty texel lets all light through: no darkness anywhere in its cell.
+            if (starts_[texel] == starts_[texel + 1])
+                row[i >> 1].umbraDepth = -kInfinity;
+            else
+                row[i >> 1].Join(SummaryOf(entries + starts_[texel], entries + starts_[texel + 1]));
+        }
+    }
+    const int32_t tilesHigh = (height >> kTileShift) + 1;
+    tiles_ = SY_ShadowBlock<Tile>("shadow map tiles", static_cast<size_t>(tileStride_) * tilesHigh);
+    for (int32_t b = 0; b < tilesHigh; ++b) {
+        for (int32_t a = 0; a < tileStride_; ++a) {
+            // The tile's own cells first, so that its front layer is the one they hold.
+            TexelSummary sum;
+            auto take = [&](int32_t x, int32_t y) {
+                if (x >= 0 && x < cellsWide && y >= 0 && y < cellsHigh)
+                    sum.Join(cells[static_cast<size_t>(y) * cellsWide + x]);
+            };
+            for (int32_t y = 2 * b; y <= 2 * b + 1; ++y) {
+                for (int32_t x = 2 * a; x <= 2 * a + 1; ++x)
+                    take(x, y);
+            }
+            for (int32_t y = 2 * b - 1; y <= 2 * b + 2; ++y) {
+                for (int32_t x = 2 * a - 1; x <= 2 * a + 2; ++x) {
+                    if (y < 2 * b || y > 2 * b + 1 || x < 2 * a || x > 2 * a + 1) take(x, y);
+                }
+            }
+            tiles_[static_cast<size_t>(b) * tileStride_ + a] = {
+                std::max(sum.frontFirst, sum.othersFirst), std::max(sum.frontPass, sum.othersFirst),
+                sum.umbraDepth, sum.umbraIds, sum.front};
+        }
+    }
 }
 
 namespace {
@@ -110,8 +214,8 @@ void SY_PlanarShadowMap::TexelTransmission(int32_t i, int32_t j, double d, uint1
                      receiverId, t);
 }
 
-void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t receiverId,
-                                        bool soft, float t[3]) const {
+void SY_PlanarShadowMap::WalkTexels(double x, double y, double d, uint16_t receiverId, bool soft,
+                                    float t[3]) const {
     if (!soft) {
         double i = std::floor(x), j = std::floor(y);
         if (!(i >= texels_.left && i < texels_.right && j >= texels_.top && j < texels_.bottom)) {
@@ -174,64 +278,12 @@ void SY_PlanarShadowMap::TransmissionAt(double x, double y, double d, uint16_t r
         t[c] = weights > 0 ? sum[c] / weights : 0.0f;
 }
 
-bool SY_PlanarShadowMap::SeenByNoOtherFace(double x, double y) const {
-    // Within 40° of the axis a point lies 50° or more off the axes of the faces around, which
-    // span 50° to each side: tan 40° / tan 50° of the half size, a little less to be safe.
-    constexpr double kOwnShare = 0.7;
-    return std::fabs(x - centre_[0]) < kOwnShare * half_[0] &&
-           std::fabs(y - centre_[1]) < kOwnShare * half_[1];
-}
-
-float SY_PlanarShadowMap::FaceWeight(double x, double y, double inset) const {
-    double wx = 1.0 - std::fabs(x - centre_[0]) / (half_[0] - inset);
-    double wy = 1.0 - std::fabs(y - centre_[1]) / (half_[1] - inset);
-    return wx > 0 && wy > 0 ? static_cast<float>(wx * wy) : 0.0f;
-}
-
-void SY_PlanarShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
-                                float out[4]) const {
-    double x, y, d;
-    if (!Project(p, &x, &y, &d)) {
-        SetFull(out + 1);
-        return;
-    }
-    TransmissionAt(x, y, d, receiverId, soft, out + 1);
-}
-
 void SY_PlanarShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {
     Lookup(p, receiverId, false, out);
 }
 
 void SY_PlanarShadowMap::SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const {
     Lookup(p, receiverId, true, out);
-}
-
-void SY_CubicShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
-                               float out[4]) const {
-    // The soft filter reaches two texels beyond the point, so its faces end two texels sooner.
-    double inset = soft ? 2.0 : 0.0;
-    float sum[3] = {0, 0, 0}, weights = 0;
-    for (int32_t f = 0; f < count_; ++f) {
-        double x, y, d;
-        if (!faces_[f]->Project(p, &x, &y, &d)) continue;
-        if (faces_[f]->SeenByNoOtherFace(x, y)) {
-            faces_[f]->TransmissionAt(x, y, d, receiverId, soft, out + 1);
-            return;
-        }
-        float w = faces_[f]->FaceWeight(x, y, inset);
-        if (w <= 0) continue;
-        float t[3];
-        faces_[f]->TransmissionAt(x, y, d, receiverId, soft, t);
-        for (int c = 0; c < 3; ++c)
-            sum[c] += w * t[c];
-        weights += w;
-    }
-    if (weights <= 0) {
-        SetFull(out + 1);
-        return;
-    }
-    for (int c = 0; c < 3; ++c)
-        out[1 + c] = sum[c] / weights;
 }
 
 void SY_CubicShadowMap::HardLookup(const double p[3], uint16_t receiverId, float out[4]) const {

@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "raster_test_support.h"
+#include "renderer/shadow/shadow_map.h"
 
 namespace {
 
@@ -255,6 +256,57 @@ TEST(Shadows, OutOfMemoryReleasesEverything) {
         },
         true);
     EXPECT_GT(failures, 10);
+}
+
+// A 12 × 12 texel map seen straight along z from a parallel light (texel (i, j) under x, y in
+// [i, i + 1) × [j, j + 1); depth −z), every texel holding `list`, or all empty but texel
+// (6, 6), which holds an opaque entry. Hard and soft lookups at (x, y, z) by a receiver.
+struct MapCase {
+    const char* what;
+    std::vector<SY_ShadowEntry> list;
+    double x, z;
+    uint16_t receiver;
+    float hard, soft;
+};
+
+TEST(Shadows, PlanarMapLookupsSeeTheLightLeftBehindOtherLayers) {
+    constexpr uint16_t kOwn = 3, kOther = 5;
+    const SY_ShadowEntry own{-10, kOwn | kSY_ShadowStep, 0, 0, 0}, far{-20, kOther, 0, 0, 0},
+        half{-10, kOther, 16384, 16384, 16384},
+        halfFront{-5, kOther | kSY_ShadowStep, 16384, 16384, 16384};
+    // On the centre of texel (7, 6) the filter weighs it by 1 and its four edge neighbours by
+    // exp(−1), one of them the dark texel (6, 6).
+    const float e = std::exp(-1.0f), edge = (1 + 3 * e) / (1 + 4 * e);
+    const MapCase cases[] = {
+        {"in front of another layer", {far}, 3.5, 15, kOwn, 1, 1},
+        {"behind another layer", {far}, 3.5, 25, kOwn, 0, 0},
+        {"behind only its own layer", {own, far}, 3.5, 15, kOwn, 1, 1},
+        {"another receiver there", {own, far}, 3.5, 15, 7, 0, 0},
+        {"behind half a layer", {half}, 3.5, 15, kOwn, 0.5f, 0.5f},
+        // Its own opaque entry starts the dark run, yet it sees the half light in front of it.
+        {"behind its own layer under another", {halfFront, own, far}, 3.5, 15, kOwn, 0.5f, 0.5f},
+        {"beside one dark texel", {}, 7.5, 25, kOwn, 1, edge},
+    };
+    for (const MapCase& c : cases) {
+        SY_ShadowBlock<uint32_t> starts("starts", 145);
+        SY_ShadowBlock<SY_ShadowEntry> entries("entries", 144 * 3);
+        uint32_t written = 0;
+        for (int32_t t = 0; t < 144; ++t) {
+            starts[t] = written;
+            for (const SY_ShadowEntry& entry : c.list)
+                entries[written++] = entry;
+            if (c.list.empty() && t == 6 * 12 + 6) entries[written++] = far;
+        }
+        starts[144] = written;
+        const double rect[4] = {0, 0, 12, 12}, p[3] = {c.x, 6.5, c.z};
+        SY_PlanarShadowMap map(renderer_test::Identity(), false, rect, {0, 0, 12, 12},
+                               std::move(starts), std::move(entries));
+        float hard[4], soft[4];
+        map.HardLookup(p, c.receiver, hard);
+        map.SoftLookup(p, c.receiver, soft);
+        EXPECT_FLOAT_EQ(hard[1], c.hard) << c.what;
+        EXPECT_NEAR(soft[1], c.soft, 1e-6) << c.what;
+    }
 }
 
 }  // namespace
