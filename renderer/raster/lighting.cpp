@@ -13,6 +13,10 @@ struct PixelLighting {
     using Single = typename L::Single;
     using Mask = typename L::Mask;
 
+    // Every lane array is written before it is read: Light() sets the points and the normal,
+    // Run() the terms. Left unset here, as clearing them cost a string store on every pixel.
+    explicit PixelLighting(const SY_LayerShader& layerShader) : shader(layerShader) {}
+
     const SY_LayerShader& shader;
     Real p[3];  // surface points; read only when the shader needs them
     Real n[3];
@@ -220,7 +224,7 @@ struct PixelLighting {
 template <class L>
 void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
            SY_Lighting* const out[L::kCount], bool shadowsOnly = false) {
-    PixelLighting<L> lighting{shader, {}, {}, {}, {}};
+    PixelLighting<L> lighting(shader);
     for (int k = 0; k < 3; ++k) {
         // Without the need the span routine does not work out the points.
         lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);
