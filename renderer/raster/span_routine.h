@@ -103,11 +103,25 @@ struct SpanSetup {
     SY_Coverage<P> coverage0;
     float offset0;  // moves the depth key from the pixel centre to its top-left corner
     bool filtered;
-    bool colorOnly;  // shadows only: the texel's colour is replaced by the channel maximum
+    bool interpolated;  // filtered, and every pixel's footprint is within half a texel
+    bool colorOnly;     // shadows only: the texel's colour is replaced by the channel maximum
     bool shaded;
     bool needsPoint;
     bool pairLighting;
 };
+
+// The span's sampler, chosen once per span: no per-pixel footprint where none can leave the
+// interpolation's range.
+template <class P, class State>
+[[gnu::always_inline]] inline void Sample(const SpanSetup<P>& setup, State& state, P* out) {
+    if constexpr (requires { SY_SampleInterpolated(state, out); }) {
+        if (setup.interpolated) return SY_SampleInterpolated(state, out);
+    }
+    if (setup.filtered)
+        SY_SampleFiltered(state, out);
+    else
+        SY_SampleNearest(state, out);
+}
 
 template <bool kDepth, class P, class State>
 [[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
@@ -125,10 +139,7 @@ template <bool kDepth, class P, class State>
         out->texel = P{};
         return;
     }
-    if (setup.filtered)
-        SY_SampleFiltered(state, &out->texel);
-    else
-        SY_SampleNearest(state, &out->texel);
+    Sample(setup, state, &out->texel);
     if (setup.colorOnly) {
         constexpr C kMax = static_cast<C>(Traits::kMax);
         out->texel.red = out->texel.green = out->texel.blue = kMax;
@@ -170,6 +181,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     setup.coverage0 = LayerCoverage<P>(shader.material.opacity);
     setup.offset0 = -0.5f * (first.dwdx + first.dwdy) + shader.depthOffset;
     setup.filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
+    setup.interpolated = setup.filtered && SY_SpanInterpolates(state, count);
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
