@@ -33,7 +33,7 @@ inline PF_BoxAxis PF_MakeBoxAxis(float a, float b, int32_t size) {
 }
 
 // The same for a box given in 16.16 fixed point: integer steps throughout, short to compute.
-inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
+[[gnu::always_inline]] inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
     constexpr float kUnit = 1.0f / 65536.0f;
     int64_t limit = int64_t(size) << 16;
     lo = std::min(limit, std::max(int64_t(0), lo));
