@@ -107,7 +107,6 @@ struct SpanSetup {
     bool colorOnly;     // shadows only: the texel's colour is replaced by the channel maximum
     bool shaded;
     bool needsPoint;
-    bool pairLighting;
 };
 
 // The span's sampler, chosen once per span: no per-pixel footprint where none can leave the
@@ -164,15 +163,41 @@ template <class State>
     }
 }
 
+// Lights n pixels (two or four, in pairs) as widely as the processor allows.
+template <class P>
+void LightPixels(const SY_LayerShader& shader, SY_LightingLanes lanes, const double normal[3],
+                 Pixel<P>* pixels, int n) {
+    SY_Lighting light[4];
+    if (n == 4 && lanes == SY_LightingLanes::kFour) {
+        const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
+                                         pixels[3].point};
+        SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
+        shader.LightFourPixels(points, normal, outs);
+    } else {
+        for (int k = 0; k < n; k += 2) {
+            if (lanes != SY_LightingLanes::kOne) {
+                shader.LightTwoPixels(pixels[k].point, pixels[k + 1].point, normal, &light[k],
+                                      &light[k + 1]);
+            } else {
+                shader.LightOnePixel(pixels[k].point, normal, &light[k]);
+                shader.LightOnePixel(pixels[k + 1].point, normal, &light[k + 1]);
+            }
+        }
+    }
+    for (int k = 0; k < n; ++k)
+        ApplyLighting(light[k], &pixels[k].texel);
+}
+
 }  // namespace sy_span
 
 // Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
-// matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs so
-// that lighting can work on two at once; a pair the matte hides wholly is only stepped over.
-// The delivery receives (x, pixel, coverage, depth, thread) for every pixel the matte shows;
-// the depth is worked out only for deliveries whose kUsesDepth is true.
+// matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs, and
+// two pairs at a time, so that lighting can work on several at once; a pair the matte hides
+// wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
+// every pixel the matte shows, in order; the depth is worked out only for deliveries whose
+// kUsesDepth is true.
 template <class P, class State, class Delivery>
-void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
+void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& state,
                  SY_SpanRayState& ray, const P* matte, int32_t x, int32_t count, Delivery& delivery,
                  int32_t thread) {
     using namespace sy_span;
@@ -185,36 +210,29 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
-    setup.pairLighting = pairLighting;
 
-    Pixel<P> pixels[2];
+    Pixel<P> pixels[4];
+    int32_t at[4];  // the column of each pixel taken
     int32_t i = 0;
-    for (; i + 1 < count; i += 2) {
-        if (matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0) {
-            Advance(setup.needsPoint, state, ray);
-            Advance(setup.needsPoint, state, ray);
-            continue;
-        }
-        for (int k = 0; k < 2; ++k) {
-            Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
-                                        &pixels[k]);
-            Advance(setup.needsPoint, state, ray);
-        }
-        if (setup.shaded) {
-            SY_Lighting light[2];
-            if (setup.pairLighting) {
-                shader.LightTwoPixels(pixels[0].point, pixels[1].point, ray.normal, &light[0],
-                                      &light[1]);
-            } else {
-                shader.LightOnePixel(pixels[0].point, ray.normal, &light[0]);
-                shader.LightOnePixel(pixels[1].point, ray.normal, &light[1]);
+    while (i + 1 < count) {
+        int n = 0;
+        for (int pair = 0; pair < 2 && i + 1 < count; ++pair, i += 2) {
+            if (matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0) {
+                Advance(setup.needsPoint, state, ray);
+                Advance(setup.needsPoint, state, ray);
+                continue;
             }
-            ApplyLighting(light[0], &pixels[0].texel);
-            ApplyLighting(light[1], &pixels[1].texel);
+            for (int k = 0; k < 2; ++k, ++n) {
+                at[n] = i + k;
+                Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
+                                            &pixels[n]);
+                Advance(setup.needsPoint, state, ray);
+            }
         }
-        for (int k = 0; k < 2; ++k) {
+        if (setup.shaded && n > 0) LightPixels(shader, lanes, ray.normal, pixels, n);
+        for (int k = 0; k < n; ++k) {
             if (!pixels[k].skipped)
-                delivery.Deliver(x + i + k, pixels[k].texel, pixels[k].coverage, pixels[k].depth,
+                delivery.Deliver(x + at[k], pixels[k].texel, pixels[k].coverage, pixels[k].depth,
                                  thread);
         }
     }
