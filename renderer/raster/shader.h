@@ -77,7 +77,7 @@ public:
     // the eye lies on the surface.
     void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
     // Lights two points of the layer at once in vector registers, bit for bit as two calls of
-    // LightOnePixel. Span routines pair pixels through it when U_G_CPU_DataP()->hasVectorUnits.
+    // LightOnePixel. Span routines use it where SY_WidestLightingLanes() gives kTwo or more.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2) const;
     // Four points at once, bit for bit as four calls of LightOnePixel; only where
