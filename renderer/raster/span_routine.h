@@ -163,29 +163,37 @@ template <class State>
     }
 }
 
-// Lights n pixels (two or four, in pairs) as widely as the processor allows.
-template <class P>
-void LightPixels(const SY_LayerShader& shader, SY_LightingLanes lanes, const double normal[3],
-                 Pixel<P>* pixels, int n) {
-    SY_Lighting light[4];
-    if (n == 4 && lanes == SY_LightingLanes::kFour) {
-        const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
-                                         pixels[3].point};
-        SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
-        shader.LightFourPixels(points, normal, outs);
-    } else {
-        for (int k = 0; k < n; k += 2) {
-            if (lanes != SY_LightingLanes::kOne) {
-                shader.LightTwoPixels(pixels[k].point, pixels[k + 1].point, normal, &light[k],
-                                      &light[k + 1]);
-            } else {
-                shader.LightOnePixel(pixels[k].point, normal, &light[k]);
-                shader.LightOnePixel(pixels[k + 1].point, normal, &light[k + 1]);
-            }
+// Lights the pairs taken of kPairs pairs as widely as the processor allows: four pixels at
+// once where both of two pairs are taken. Kept out of line: the lighting outweighs a call, and
+// the span loop stays small.
+template <int kPairs, class P>
+[[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
+                                  const double normal[3], const bool (&taken)[kPairs],
+                                  Pixel<P>* pixels) {
+    SY_Lighting light[2 * kPairs];
+    if constexpr (kPairs == 2) {
+        if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
+            const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
+                                             pixels[3].point};
+            SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
+            shader.LightFourPixels(points, normal, outs);
+            for (int k = 0; k < 4; ++k)
+                ApplyLighting(light[k], &pixels[k].texel);
+            return;
         }
     }
-    for (int k = 0; k < n; ++k)
-        ApplyLighting(light[k], &pixels[k].texel);
+    for (int pair = 0; pair < kPairs; ++pair) {
+        if (!taken[pair]) continue;
+        Pixel<P>* two = pixels + 2 * pair;
+        if (lanes != SY_LightingLanes::kOne) {
+            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1]);
+        } else {
+            shader.LightOnePixel(two[0].point, normal, &light[0]);
+            shader.LightOnePixel(two[1].point, normal, &light[1]);
+        }
+        ApplyLighting(light[0], &two[0].texel);
+        ApplyLighting(light[1], &two[1].texel);
+    }
 }
 
 }  // namespace sy_span
@@ -212,30 +220,36 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
     setup.needsPoint = shader.NeedsSurfacePoint();
 
     Pixel<P> pixels[4];
-    int32_t at[4];  // the column of each pixel taken
     int32_t i = 0;
-    while (i + 1 < count) {
-        int n = 0;
-        for (int pair = 0; pair < 2 && i + 1 < count; ++pair, i += 2) {
-            if (matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0) {
-                Advance(setup.needsPoint, state, ray);
-                Advance(setup.needsPoint, state, ray);
-                continue;
+    // Takes kPairs pairs at a time: two only where they are lit four at once, as the wider
+    // step costs unlit spans time.
+    auto drawPairs = [&]<int kPairs>() {
+        while (i + 1 < count) {
+            const int32_t from = i;
+            bool taken[kPairs] = {};
+            for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
+                taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
+                for (int k = 0; k < 2; ++k) {
+                    if (taken[pair]) {
+                        Fetch<Delivery::kUsesDepth>(setup, state, ray,
+                                                    matte ? matte + i + k : nullptr,
+                                                    &pixels[2 * pair + k]);
+                    }
+                    Advance(setup.needsPoint, state, ray);
+                }
             }
-            for (int k = 0; k < 2; ++k, ++n) {
-                at[n] = i + k;
-                Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
-                                            &pixels[n]);
-                Advance(setup.needsPoint, state, ray);
+            if (setup.shaded) LightPairs(shader, lanes, ray.normal, taken, pixels);
+            for (int k = 0; k < 2 * kPairs; ++k) {
+                if (taken[k / 2] && !pixels[k].skipped)
+                    delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
+                                     pixels[k].depth, thread);
             }
         }
-        if (setup.shaded && n > 0) LightPixels(shader, lanes, ray.normal, pixels, n);
-        for (int k = 0; k < n; ++k) {
-            if (!pixels[k].skipped)
-                delivery.Deliver(x + at[k], pixels[k].texel, pixels[k].coverage, pixels[k].depth,
-                                 thread);
-        }
-    }
+    };
+    if (setup.shaded && lanes == SY_LightingLanes::kFour)
+        drawPairs.template operator()<2>();
+    else
+        drawPairs.template operator()<1>();
     if (i < count) {
         Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
         if (pixels[0].skipped) return;
