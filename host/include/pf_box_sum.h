@@ -33,7 +33,7 @@ inline PF_BoxAxis PF_MakeBoxAxis(float a, float b, int32_t size) {
 }
 
 // The same for a box given in 16.16 fixed point: integer steps throughout, short to compute.
-inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
+[[gnu::always_inline]] inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
     constexpr float kUnit = 1.0f / 65536.0f;
     int64_t limit = int64_t(size) << 16;
     lo = std::min(limit, std::max(int64_t(0), lo));
@@ -50,8 +50,10 @@ inline PF_BoxAxis PF_MakeBoxAxisFixed(int64_t lo, int64_t hi, int32_t size) {
 // conversion to float is a single instruction.
 template <bool kBelow2To31>
 struct PF_BoxCellsUint {
+    using Stored = PF_Uint4;
     using Cell = PF_Uint4;
     using Acc = PF_Float4;
+    static Cell Load(const Stored* p) { return *p; }
     static Cell Sub(Cell a, Cell b) { return a - b; }
     static Acc Widen(Cell r) {
         if constexpr (kBelow2To31) {
@@ -71,20 +73,25 @@ struct PF_AreaSum64 {
     uint64_t alpha, red, green, blue;
 };
 
-// Four doubles with the arithmetic the box sum needs.
+// Four doubles with the arithmetic the box sum needs, two lanes to a register: the same
+// correctly rounded operations, two channels at a time.
 struct PF_Double4 {
-    double v[4];
+    __m128d alphaRed, greenBlue;
     PF_Double4 operator+(const PF_Double4& o) const {
-        return {{v[0] + o.v[0], v[1] + o.v[1], v[2] + o.v[2], v[3] + o.v[3]}};
+        return {_mm_add_pd(alphaRed, o.alphaRed), _mm_add_pd(greenBlue, o.greenBlue)};
     }
-    PF_Double4 operator*(float w) const { return {{v[0] * w, v[1] * w, v[2] * w, v[3] * w}}; }
+    PF_Double4 operator*(float w) const {
+        __m128d d = _mm_set1_pd(w);
+        return {_mm_mul_pd(alphaRed, d), _mm_mul_pd(greenBlue, d)};
+    }
 };
 
-// Table cells with named channels: float sums accumulate in float, double and 64-bit integer
-// sums in double.
+// Table cells with named channels: float sums accumulate in float, double sums in double.
 template <class Pixel>
 struct PF_BoxCellsPixel {
+    using Stored = Pixel;
     using Cell = Pixel;
+    static Cell Load(const Stored* p) { return *p; }
     using Value = decltype(Pixel::alpha);
     static constexpr bool kFloat = std::is_same_v<Value, float>;
     using Acc = std::conditional_t<kFloat, PF_Float4, PF_Double4>;
@@ -95,15 +102,44 @@ struct PF_BoxCellsPixel {
         if constexpr (kFloat) {
             return PF_Float4{r.alpha, r.red, r.green, r.blue};
         } else {
-            return {{double(r.alpha), double(r.red), double(r.green), double(r.blue)}};
+            return {_mm_setr_pd(double(r.alpha), double(r.red)),
+                    _mm_setr_pd(double(r.green), double(r.blue))};
         }
     }
     static PF_Float4 ToFloat4(const Acc& acc) {
         if constexpr (kFloat) {
             return acc;
         } else {
-            return PF_Float4{float(acc.v[0]), float(acc.v[1]), float(acc.v[2]), float(acc.v[3])};
+            return _mm_movelh_ps(_mm_cvtpd_ps(acc.alphaRed), _mm_cvtpd_ps(acc.greenBlue));
         }
+    }
+};
+
+// Table cells of 64-bit sums, modulo 2^64, two channels to a register. A box's sum lies below
+// 2^52 (at most 201 × 201 texels of 65535²), where setting the bits of the double 2^52 over it
+// and taking 2^52 away converts it exactly: the value a conversion one channel at a time gives.
+struct PF_BoxCellsUint64 {
+    using Stored = PF_AreaSum64;
+    struct Cell {
+        __m128i alphaRed, greenBlue;
+    };
+    using Acc = PF_Double4;
+    static Cell Load(const Stored* p) {
+        return {_mm_loadu_si128(reinterpret_cast<const __m128i*>(&p->alpha)),
+                _mm_loadu_si128(reinterpret_cast<const __m128i*>(&p->green))};
+    }
+    static Cell Sub(const Cell& a, const Cell& b) {
+        return {_mm_sub_epi64(a.alphaRed, b.alphaRed), _mm_sub_epi64(a.greenBlue, b.greenBlue)};
+    }
+    static Acc Widen(const Cell& r) {
+        const __m128d two52 = _mm_set1_pd(4503599627370496.0);
+        auto exact = [two52](__m128i v) {
+            return _mm_sub_pd(_mm_castsi128_pd(_mm_or_si128(v, _mm_castpd_si128(two52))), two52);
+        };
+        return {exact(r.alphaRed), exact(r.greenBlue)};
+    }
+    static PF_Float4 ToFloat4(const Acc& acc) {
+        return PF_BoxCellsPixel<PF_PixelDouble>::ToFloat4(acc);
     }
 };
 
@@ -111,22 +147,23 @@ struct PF_BoxCellsPixel {
 // of the texels [0, x) × [0, y). Every difference is taken against the box's first row and
 // column, so it sums texels inside the box only: small, and exact for integer cells.
 template <class Cells>
-inline PF_Float4 PF_BoxSum(const typename Cells::Cell* table, ptrdiff_t stride,
+inline PF_Float4 PF_BoxSum(const typename Cells::Stored* table, ptrdiff_t stride,
                            const PF_BoxAxis& ax, const PF_BoxAxis& ay) {
     using Cell = typename Cells::Cell;
+    using Stored = typename Cells::Stored;
     // Weights of the box's corners (x1, x2, x3 and y1, y2, y3) from those of its ranges.
     const float cx[3] = {ax.weight[0] - ax.weight[1], ax.weight[1] - ax.weight[2], ax.weight[2]};
     const float cy[3] = {ay.weight[0] - ay.weight[1], ay.weight[1] - ay.weight[2], ay.weight[2]};
-    const Cell* top = table + ay.edge[0] * stride;
-    const Cell t0 = top[ax.edge[0]], t1 = top[ax.edge[1]], t2 = top[ax.edge[2]],
-               t3 = top[ax.edge[3]];
+    const Stored* top = table + ay.edge[0] * stride;
+    const Cell t0 = Cells::Load(top + ax.edge[0]), t1 = Cells::Load(top + ax.edge[1]),
+               t2 = Cells::Load(top + ax.edge[2]), t3 = Cells::Load(top + ax.edge[3]);
     typename Cells::Acc rows[3];
     for (int l = 1; l < 4; ++l) {
-        const Cell* row = table + ay.edge[l] * stride;
+        const Stored* row = table + ay.edge[l] * stride;
         // Sums over [x0, xk) × [y0, yl).
-        Cell left = Cells::Sub(row[ax.edge[0]], t0);
+        Cell left = Cells::Sub(Cells::Load(row + ax.edge[0]), t0);
         auto box = [&](int32_t k, const Cell& t) {
-            return Cells::Widen(Cells::Sub(Cells::Sub(row[ax.edge[k]], t), left));
+            return Cells::Widen(Cells::Sub(Cells::Sub(Cells::Load(row + ax.edge[k]), t), left));
         };
         rows[l - 1] = (box(1, t1) * cx[0] + box(2, t2) * cx[1]) + box(3, t3) * cx[2];
     }

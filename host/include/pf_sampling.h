@@ -190,7 +190,7 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
         using Cells = PF_BoxCellsPixel<PF_PixelDouble>;
         sum = PF_BoxSum<Cells>(table.Cells<PF_PixelDouble>(), table.Stride(), ax, ay);
     } else if constexpr (Traits::kBitDepth == 16) {
-        using Cells = PF_BoxCellsPixel<PF_AreaSum64>;
+        using Cells = PF_BoxCellsUint64;
         sum = PF_BoxSum<Cells>(table.Cells<PF_AreaSum64>(), table.Stride(), ax, ay);
     } else {
         // Sums of alpha × colour (at most 65025 a texel) fit 31 bits in boxes of up to 33025

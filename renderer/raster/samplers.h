@@ -57,25 +57,64 @@ inline bool InFront(const SY_SpanMapping& m, bool perspective) {
     return !perspective || m.w + m.low > 0;
 }
 
+// A radius rounds to at most 32768 (half a texel) in fixed point below this many texels.
+inline constexpr double kSubpixelBelow = 32768.5 / 65536.0;
+
+// The pixel library's interpolation (bilinear or bicubic) at the fixed-point position (x, y).
+template <class P>
+[[gnu::always_inline]] inline void Interpolate(SY_SpanTexture& texture, int32_t x, int32_t y,
+                                               P* out) {
+    if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
+        PF_SubpixelBicubic(x, y, texture.sampling, out);
+    else
+        PF_SubpixelBilinear(x, y, texture.sampling, out);
+}
+
 // The pixel library's filter at (u, v) with the half-sizes (ru, rv): interpolation while the
 // footprint stays within half a texel, the box average beyond.
 template <class P>
 [[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, double u, double v, double ru,
                                           double rv, P* out) {
-    // A radius rounds to at most 32768 (half a texel) in fixed point below this many texels.
-    constexpr double kSubpixelBelow = 32768.5 / 65536.0;
     int32_t x = ToFixed(u), y = ToFixed(v);
-    PF_SampPB& pb = texture.sampling;
     if (ru < kSubpixelBelow && rv < kSubpixelBelow) {
-        if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
-            PF_SubpixelBicubic(x, y, pb, out);
-        else
-            PF_SubpixelBilinear(x, y, pb, out);
+        Interpolate(texture, x, y, out);
     } else {
+        PF_SampPB& pb = texture.sampling;
         pb.xRadius = RadiusToFixed(ru);
         pb.yRadius = RadiusToFixed(rv);
         PF_AreaSample(x, y, pb, out);
     }
+}
+
+// Whether the footprint stays within half a texel at each of the count pixels from m on, so
+// that every one of them interpolates. Without perspective the footprint is the same at every
+// pixel. Under perspective its derivatives are (dU·W − U·dW) / W²: numerators linear and W
+// positive along the span, so their largest size is bounded by the ends' numerators over the
+// smaller end's W². The bound is kept a hundredth of a texel inside the limit, far beyond the
+// rounding of the per-pixel footprint, and the ends must lie within the texture's reach so
+// that no term grows large enough to round by that much.
+inline bool InterpolatesThroughout(const SY_SpanMapping& m, bool perspective, int32_t count) {
+    if (!perspective) {
+        Footprint f = FootprintOf(m, false);
+        return f.ru < kSubpixelBelow && f.rv < kSubpixelBelow;
+    }
+    constexpr double kBelow = 0.49;
+    const double last = count - 1;
+    const double w[2] = {m.w, m.w + last * m.dwdx};
+    const double u[2] = {m.u, m.u + last * m.dudx};
+    const double v[2] = {m.v, m.v + last * m.dvdx};
+    double largest[4] = {0, 0, 0, 0};  // |dU/dx|, |dU/dy|, |dV/dx|, |dV/dy| numerators
+    for (int e = 0; e < 2; ++e) {
+        if (!(w[e] + m.low > 0)) return false;
+        if (!(std::fabs(u[e]) < kFarTexels * w[e] && std::fabs(v[e]) < kFarTexels * w[e]))
+            return false;
+        const double numerators[4] = {m.dudx * w[e] - u[e] * m.dwdx, m.dudy * w[e] - u[e] * m.dwdy,
+                                      m.dvdx * w[e] - v[e] * m.dwdx, m.dvdy * w[e] - v[e] * m.dwdy};
+        for (int k = 0; k < 4; ++k)
+            largest[k] = std::max(largest[k], std::fabs(numerators[k]));
+    }
+    const double limit = 2.0 * kBelow * std::min(w[0], w[1]) * std::min(w[0], w[1]);
+    return std::max({largest[0], largest[1], largest[2], largest[3]}) < limit;
 }
 
 // The integer texel under (u, v), or false outside the texture.
@@ -147,6 +186,30 @@ inline void SY_SampleFiltered(SY_SpanSampleState<P>& state, P* out) {
     }
     sy_sampling::Footprint f = sy_sampling::FootprintOf(m, state.texture.perspective);
     sy_sampling::Filter(state.texture, f.u, f.v, f.ru, f.rv, out);
+}
+
+// Interpolated texel, one sample, for spans where InterpolatesThroughout holds: the same texel
+// SY_SampleFiltered gives there, without working out the footprint.
+template <class P>
+inline void SY_SampleInterpolated(SY_SpanSampleState<P>& state, P* out) {
+    const SY_SpanMapping& m = state.mapping;
+    if (!sy_sampling::InFront(m, state.texture.perspective)) {
+        *out = P{};
+        return;
+    }
+    sy_sampling::Interpolate(state.texture, sy_sampling::ToFixed(m.u * m.invW),
+                             sy_sampling::ToFixed(m.v * m.invW), out);
+}
+
+// Whether SY_SampleInterpolated serves the count pixels from the state's position on. The
+// subsample state always works out footprints.
+template <class P>
+inline bool SY_SpanInterpolates(const SY_SpanSampleState<P>& state, int32_t count) {
+    return sy_sampling::InterpolatesThroughout(state.mapping, state.texture.perspective, count);
+}
+template <class P>
+inline bool SY_SpanInterpolates(const SY_SpanSubsampleState<P>&, int32_t) {
+    return false;
 }
 
 // Nearest texel averaged over the present subsamples.

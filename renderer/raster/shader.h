@@ -78,9 +78,13 @@ public:
     // the eye lies on the surface.
     void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
     // Lights two points of the layer at once in vector registers, bit for bit as two calls of
-    // LightOnePixel. Span routines pair pixels through it when U_G_CPU_DataP()->hasVectorUnits.
+    // LightOnePixel. Span routines use it where SY_WidestLightingLanes() gives kTwo or more.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2) const;
+    // Four points at once, bit for bit as four calls of LightOnePixel; only where
+    // SY_WidestLightingLanes() gives kFour.
+    void LightFourPixels(const double* const p[4], const double n[3],
+                         SY_Lighting* const out[4]) const;
     // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
     // for layers drawn from an image, which are not lit.
     void ShadowOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
@@ -100,6 +104,11 @@ public:
     uint8_t shaded = 0;            // 0: pixels pass unlit
     uint8_t needsPoint = 0;        // the lighting reads the surface point
 };
+
+// How many pixels the lighting takes at once on this processor: two with SSE4.1, four with
+// AVX2.
+enum class SY_LightingLanes { kOne, kTwo, kFour };
+SY_LightingLanes SY_WidestLightingLanes();
 
 // The shader of a renderable drawn into the frame: its material, its lights, and which work
 // its pixels need. A layer lit by no light, or one that takes no light and catches no shadow,

@@ -7,7 +7,6 @@
 #include "renderer/raster/span_routine.h"
 #include "renderer/raster/span_start.h"
 #include "renderer/scene/screen_geometry.h"
-#include "u_cpu.h"
 #include "u_report.h"
 
 namespace {
@@ -27,9 +26,9 @@ template <class P, class State>
 void Deliver(const SY_LayerShader& shader, State& state, SY_SpanRayState& ray, const P* matte,
              int32_t x, int32_t count, int32_t y, const PF_LinearBlendingTables* tables,
              const SY_RenderTarget& target, int32_t thread) {
-    bool pairLighting = U_G_CPU_DataP()->hasVectorUnits != 0;
+    static const SY_LightingLanes lanes = SY_WidestLightingLanes();
     auto draw = [&](auto delivery) {
-        SY_DrawSpan(shader, pairLighting, state, ray, matte, x, count, delivery, thread);
+        SY_DrawSpan(shader, lanes, state, ray, matte, x, count, delivery, thread);
     };
     target.Visit(
         [&](PF_World* world) {

@@ -104,11 +104,24 @@ struct SpanSetup {
     SY_Coverage<P> coverage0;
     float depthOffset;
     bool filtered;
-    bool colorOnly;  // shadows only: the texel's colour is replaced by the channel maximum
+    bool interpolated;  // filtered, and every pixel's footprint is within half a texel
+    bool colorOnly;     // shadows only: the texel's colour is replaced by the channel maximum
     bool shaded;
     bool needsPoint;
-    bool pairLighting;
 };
+
+// The span's sampler, chosen once per span: no per-pixel footprint where none can leave the
+// interpolation's range.
+template <class P, class State>
+[[gnu::always_inline]] inline void Sample(const SpanSetup<P>& setup, State& state, P* out) {
+    if constexpr (requires { SY_SampleInterpolated(state, out); }) {
+        if (setup.interpolated) return SY_SampleInterpolated(state, out);
+    }
+    if (setup.filtered)
+        SY_SampleFiltered(state, out);
+    else
+        SY_SampleNearest(state, out);
+}
 
 template <bool kDepth, class P, class State>
 [[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
@@ -126,10 +139,7 @@ template <bool kDepth, class P, class State>
         out->texel = P{};
         return;
     }
-    if (setup.filtered)
-        SY_SampleFiltered(state, &out->texel);
-    else
-        SY_SampleNearest(state, &out->texel);
+    Sample(setup, state, &out->texel);
     if (setup.colorOnly) {
         constexpr C kMax = static_cast<C>(Traits::kMax);
         out->texel.red = out->texel.green = out->texel.blue = kMax;
@@ -152,15 +162,49 @@ template <class State>
     }
 }
 
+// Lights the pairs taken of kPairs pairs as widely as the processor allows: four pixels at
+// once where both of two pairs are taken. Kept out of line: the lighting outweighs a call, and
+// the span loop stays small.
+template <int kPairs, class P>
+[[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
+                                  const double normal[3], const bool (&taken)[kPairs],
+                                  Pixel<P>* pixels) {
+    SY_Lighting light[2 * kPairs];
+    if constexpr (kPairs == 2) {
+        if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
+            const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
+                                             pixels[3].point};
+            SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
+            shader.LightFourPixels(points, normal, outs);
+            for (int k = 0; k < 4; ++k)
+                ApplyLighting(light[k], &pixels[k].texel);
+            return;
+        }
+    }
+    for (int pair = 0; pair < kPairs; ++pair) {
+        if (!taken[pair]) continue;
+        Pixel<P>* two = pixels + 2 * pair;
+        if (lanes != SY_LightingLanes::kOne) {
+            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1]);
+        } else {
+            shader.LightOnePixel(two[0].point, normal, &light[0]);
+            shader.LightOnePixel(two[1].point, normal, &light[1]);
+        }
+        ApplyLighting(light[0], &two[0].texel);
+        ApplyLighting(light[1], &two[1].texel);
+    }
+}
+
 }  // namespace sy_span
 
 // Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
-// matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs so
-// that lighting can work on two at once; a pair the matte hides wholly is only stepped over.
-// The delivery receives (x, pixel, coverage, depth, thread) for every pixel the matte shows;
-// the depth is worked out only for deliveries whose kUsesDepth is true.
+// matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs, and
+// two pairs at a time, so that lighting can work on several at once; a pair the matte hides
+// wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
+// every pixel the matte shows, in order; the depth is worked out only for deliveries whose
+// kUsesDepth is true.
 template <class P, class State, class Delivery>
-void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
+void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& state,
                  SY_SpanRayState& ray, const P* matte, int32_t x, int32_t count, Delivery& delivery,
                  int32_t thread) {
     using namespace sy_span;
@@ -168,42 +212,42 @@ void SY_DrawSpan(const SY_LayerShader& shader, bool pairLighting, State& state,
     setup.coverage0 = LayerCoverage<P>(shader.material.opacity);
     setup.depthOffset = shader.depthOffset;
     setup.filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
+    setup.interpolated = setup.filtered && SY_SpanInterpolates(state, count);
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
-    setup.pairLighting = pairLighting;
 
-    Pixel<P> pixels[2];
+    Pixel<P> pixels[4];
     int32_t i = 0;
-    for (; i + 1 < count; i += 2) {
-        if (matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0) {
-            Advance(setup.needsPoint, state, ray);
-            Advance(setup.needsPoint, state, ray);
-            continue;
-        }
-        for (int k = 0; k < 2; ++k) {
-            Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
-                                        &pixels[k]);
-            Advance(setup.needsPoint, state, ray);
-        }
-        if (setup.shaded) {
-            SY_Lighting light[2];
-            if (setup.pairLighting) {
-                shader.LightTwoPixels(pixels[0].point, pixels[1].point, ray.normal, &light[0],
-                                      &light[1]);
-            } else {
-                shader.LightOnePixel(pixels[0].point, ray.normal, &light[0]);
-                shader.LightOnePixel(pixels[1].point, ray.normal, &light[1]);
+    // Takes kPairs pairs at a time: two only where they are lit four at once, as the wider
+    // step costs unlit spans time.
+    auto drawPairs = [&]<int kPairs>() {
+        while (i + 1 < count) {
+            const int32_t from = i;
+            bool taken[kPairs] = {};
+            for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
+                taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
+                for (int k = 0; k < 2; ++k) {
+                    if (taken[pair]) {
+                        Fetch<Delivery::kUsesDepth>(setup, state, ray,
+                                                    matte ? matte + i + k : nullptr,
+                                                    &pixels[2 * pair + k]);
+                    }
+                    Advance(setup.needsPoint, state, ray);
+                }
             }
-            ApplyLighting(light[0], &pixels[0].texel);
-            ApplyLighting(light[1], &pixels[1].texel);
+            if (setup.shaded) LightPairs(shader, lanes, ray.normal, taken, pixels);
+            for (int k = 0; k < 2 * kPairs; ++k) {
+                if (taken[k / 2] && !pixels[k].skipped)
+                    delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
+                                     pixels[k].depth, thread);
+            }
         }
-        for (int k = 0; k < 2; ++k) {
-            if (!pixels[k].skipped)
-                delivery.Deliver(x + i + k, pixels[k].texel, pixels[k].coverage, pixels[k].depth,
-                                 thread);
-        }
-    }
+    };
+    if (setup.shaded && lanes == SY_LightingLanes::kFour)
+        drawPairs.template operator()<2>();
+    else
+        drawPairs.template operator()<1>();
     if (i < count) {
         Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
         if (pixels[0].skipped) return;

@@ -92,6 +92,20 @@ SY_Lighting LightAt(const SY_LayerShader& shader, double x, double y, const doub
     return alone[0];
 }
 
+// Where the processor has four lanes: the point (x, 0, 0) and three others that light
+// differently, lit at once, light bit for bit as each alone.
+void ExpectFourLikeOne(const SY_LayerShader& shader, double x) {
+    if (SY_WidestLightingLanes() != SY_LightingLanes::kFour) return;
+    const double p[4][3] = {{x, 0, 0}, {x + 150, -40, 0}, {x - 70, 90, 0}, {x + 20, 300, 0}};
+    const double* const points[4] = {p[0], p[1], p[2], p[3]};
+    SY_Lighting alone[4], four[4];
+    SY_Lighting* const outs[4] = {&four[0], &four[1], &four[2], &four[3]};
+    for (int i = 0; i < 4; ++i)
+        shader.LightOnePixel(p[i], kFront, &alone[i]);
+    shader.LightFourPixels(points, kFront, outs);
+    EXPECT_EQ(std::memcmp(alone, four, sizeof alone), 0) << "four at " << x;
+}
+
 // One light over the layer point (x, 0, 0) with diffuse 1: the diffuse term is the light's
 // colour times `lit`, which a reader gets from N·L, the cone and the falloff.
 TEST(Lighting, OneLightAtAKnownPlace) {
@@ -133,6 +147,7 @@ TEST(Lighting, OneLightAtAKnownPlace) {
         shader->material.diffuse = 1;
         shader->material.lightTransmission = c.transmission;
         SY_Lighting out = LightAt(*shader, c.x, 0);
+        ExpectFourLikeOne(*shader, c.x);
         for (int k = 0; k < 3; ++k) {
             EXPECT_NEAR(out.diffuse[k], c.lit * c.light.color[1 + k], 1e-6) << c.what;
             EXPECT_EQ(out.specular[k], 0) << c.what;
@@ -160,6 +175,7 @@ TEST(Lighting, HighlightsByMetalAndAtGrazingLight) {
         shader->material.metal = metal;
         shader->specularTable = &tables.ForShininess(shininess);
         SY_Lighting out = LightAt(*shader, 0, 0);
+        ExpectFourLikeOne(*shader, 0);
         const double texel[3] = {1, 0, 0}, shown[3] = {red, green, blue};
         for (int k = 0; k < 3; ++k)
             EXPECT_NEAR(texel[k] * out.diffuse[k] + out.specular[k], shown[k], 1e-6) << metal << x;

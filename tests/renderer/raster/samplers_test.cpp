@@ -91,6 +91,30 @@ TYPED_TEST(Samplers, FootprintReachingTheEyePlaneIsTransparent) {
     EXPECT_FALSE(IsClear(Sample<P>(*texture, Filter::kBilinear, m, 2.0, 0.5, true)));
 }
 
+// W = 1 − x/100 grows the footprint's U half-size 0.35/W² from 0.35 texel at x = 0 past half
+// a texel near x = 16. Spans short of that interpolate throughout, each pixel as filtered.
+TYPED_TEST(Samplers, SpansThatInterpolateThroughoutGiveTheFilteredTexels) {
+    using P = TypeParam;
+    auto texture = raster_test::PatternTexture<P>(32, 8);
+    M_Matrix3 m{};
+    m.mat[0][0] = m.mat[1][1] = 0.7;
+    m.mat[0][2] = -0.01;
+    m.mat[2][2] = 1;
+    const int32_t cases[][3] = {{0, 10, 1}, {5, 8, 1}, {0, 30, 0}, {20, 10, 0}};
+    for (const auto& [x, count, interpolates] : cases) {
+        SY_SpanSampleState<P> state;
+        StartTexture(*texture, Filter::kBilinear, true, &state);
+        state.mapping.Start(m, x + 0.5, 3.5, true, 1.0f);
+        EXPECT_EQ(SY_SpanInterpolates(state, count), interpolates != 0) << x;
+        for (int32_t i = 0; i < count && interpolates; ++i, state.Step()) {
+            P got, filtered;
+            SY_SampleInterpolated(state, &got);
+            SY_SampleFiltered(state, &filtered);
+            EXPECT_TRUE(Equal(got, filtered)) << x + i;
+        }
+    }
+}
+
 // Two subsamples, the second absent: alpha is halved, the colour stays. With both absent the
 // sample is transparent.
 TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
