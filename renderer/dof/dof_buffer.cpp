@@ -90,35 +90,31 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
         PF_SummedAreaTable_SampleAA(width, height, areaTable->DoubleSums(), x0, y0, x1, y1, out);
         return;
     }
-    const ShapeKernel* kernel =
-        kernels ? kernels->ForShare(std::min(1.0f, radius / model.maxRadius)) : nullptr;
+    const ShapeKernel* kernel = KernelFor(radius);
     if (!kernel) return drawn();
     SampleKernel(*kernel, ix, iy, out);
 }
 
 namespace {
 
-// Adds the kernel's runs around (x, y) over the row sums of a width × height world to sum
-// (alpha and red, green and blue) and returns the weight of the pixels read. kClipped: the
-// kernel reaches beyond the world, whose rows and ends are then kept within it.
-template <bool kClipped, class Table>
-double AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y, int32_t width,
-                 int32_t height, __m128d sum[2]) {
+// Adds the kernel's runs around (x, y) over the row sums of a width × height world, whose rows
+// and ends are kept within it, to sum (alpha and red, green and blue) and returns the weight of
+// the pixels read.
+template <class Table>
+double AddClippedKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
+                        int32_t width, int32_t height, __m128d sum[2]) {
     double weight = 0;
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
-        if (kClipped && (yy < 0 || yy >= height)) continue;
+        if (yy < 0 || yy >= height) continue;
         const double* sums = &table.Row(yy)[0].alpha;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
         for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
-            int32_t x0 = x + s->x, x1 = x0 + s->length;
-            if constexpr (kClipped) {
-                x0 = std::clamp(x0, 0, width);
-                x1 = std::clamp(x1, 0, width);
-                weight += static_cast<double>(s->weight) * (x1 - x0);
-            }
+            const int32_t x0 = std::clamp(x + s->x, 0, width);
+            const int32_t x1 = std::clamp(x + s->x + s->length, 0, width);
+            weight += static_cast<double>(s->weight) * (x1 - x0);
             const double* a = sums + 4 * ptrdiff_t(x0);
             const double* b = sums + 4 * ptrdiff_t(x1);
             const __m128d w = _mm_set1_pd(s->weight);
@@ -131,23 +127,35 @@ double AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32
     return weight;
 }
 
-}  // namespace
-
-template <class P>
-void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
-    __m128d sum[2] = {_mm_setzero_pd(), _mm_setzero_pd()};
-    const int32_t* e = kernel.Extent();
-    double n = kernel.Normalization();
-    if (x + e[0] >= 0 && x + e[2] < width && y + e[1] >= 0 && y + e[3] < height) {
-        AddKernel<false>(kernel, *rowTable, x, y, width, height, sum);
-    } else {
-        const double weight = AddKernel<true>(kernel, *rowTable, x, y, width, height, sum);
-        if (!(weight > 0)) {
-            *out = P{};
-            return;
+// Adds the kernel's runs around each of the kPixels neighbours (x + p, y), the kernel lying
+// within the world for every one, to sum[p]. Each pixel takes its terms in the order
+// AddClippedKernel takes them, so its sum is the same to the bit; the pixels are interleaved
+// because one pixel's additions wait on each other, while the neighbours' run alongside.
+template <int32_t kPixels, class Table>
+void AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
+               __m128d sum[][2]) {
+    const ShapeKernel::Segment* segments = kernel.Segments();
+    const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+    for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
+        const double* sums = &table.Row(y + row->y)[x].alpha;
+        const ShapeKernel::Segment* s = segments + row->firstSegment;
+        for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
+            const double* a = sums + 4 * ptrdiff_t(s->x);
+            const double* b = a + 4 * ptrdiff_t(s->length);
+            const __m128d w = _mm_set1_pd(s->weight);
+            for (int32_t p = 0; p < kPixels; ++p, a += 4, b += 4) {
+                sum[p][0] = _mm_add_pd(sum[p][0],
+                                       _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b), _mm_loadu_pd(a)), w));
+                sum[p][1] = _mm_add_pd(
+                    sum[p][1], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b + 2), _mm_loadu_pd(a + 2)), w));
+            }
         }
-        if (averagesWithin) n = 1 / weight;
     }
+}
+
+// Stores the kernel sum scaled by n (one over the weight read) as a pixel.
+template <class P>
+void StoreSum(const __m128d sum[2], double n, P* out) {
     double v[4];
     _mm_storeu_pd(v, sum[0]);
     _mm_storeu_pd(v + 2, sum[1]);
@@ -155,6 +163,58 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_
         PF_Float4{static_cast<float>(std::min(v[0] * n, 1.0)), static_cast<float>(v[1] * n),
                   static_cast<float>(v[2] * n), static_cast<float>(v[3] * n)},
         1.0f, out);
+}
+
+// Whether a kernel of extent e around (x, y) lies within a width × height world.
+bool Within(const int32_t* e, int32_t x, int32_t y, int32_t width, int32_t height) {
+    return x + e[0] >= 0 && x + e[2] < width && y + e[1] >= 0 && y + e[3] < height;
+}
+
+}  // namespace
+
+template <class P>
+void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
+    __m128d sum[1][2] = {{_mm_setzero_pd(), _mm_setzero_pd()}};
+    double n = kernel.Normalization();
+    if (Within(kernel.Extent(), x, y, width, height)) {
+        AddKernel<1>(kernel, *rowTable, x, y, sum);
+    } else {
+        const double weight = AddClippedKernel(kernel, *rowTable, x, y, width, height, sum[0]);
+        if (!(weight > 0)) {
+            *out = P{};
+            return;
+        }
+        if (averagesWithin) n = 1 / weight;
+    }
+    StoreSum(sum[0], n, out);
+}
+
+template <class P>
+void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count,
+                                  const float* radius, P* out) const {
+    auto at = [&](int32_t k) { return x + static_cast<float>(first + k); };
+    if (rowTable && count == kSpanPixels) {
+        // Sample finds the pixel it reads from by truncation, as here.
+        const ShapeKernel* kernel = KernelFor(radius[0]);
+        const auto ix = static_cast<int32_t>(at(0) - static_cast<float>(originX));
+        const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
+        bool shared = kernel && Within(kernel->Extent(), ix, iy, width - kSpanPixels + 1, height);
+        for (int32_t k = 1; shared && k < count; ++k) {
+            shared = KernelFor(radius[k]) == kernel &&
+                     static_cast<int32_t>(at(k) - static_cast<float>(originX)) == ix + k;
+        }
+        if (shared) {
+            __m128d sum[kSpanPixels][2];
+            for (auto& s : sum)
+                s[0] = s[1] = _mm_setzero_pd();
+            AddKernel<kSpanPixels>(*kernel, *rowTable, ix, iy, sum);
+            for (int32_t k = 0; k < count; ++k)
+                StoreSum(sum[k], kernel->Normalization(), out + k);
+            return;
+        }
+    }
+    for (int32_t k = 0; k < count; ++k)
+        Sample(at(k), y, radius[k], out + k);
 }
 
 template class SY_DOFBufferX<PF_Pixel8>;
