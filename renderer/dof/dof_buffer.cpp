@@ -92,76 +92,104 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
     }
     const ShapeKernel* kernel = KernelFor(radius);
     if (!kernel) return drawn();
-    SampleKernel(*kernel, ix, iy, out);
+    SampleKernel(*kernel, ix, iy, 1, out);
 }
 
 namespace {
 
-// Adds the kernel's runs around (x, y) over the row sums of a width × height world, whose rows
-// and ends are kept within it, to sum (alpha and red, green and blue) and returns the weight of
-// the pixels read.
-template <class Table>
-double AddClippedKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
-                        int32_t width, int32_t height, __m128d sum[2]) {
-    double weight = 0;
+// One pixel's alpha, red, green and blue sums. Processors with wide registers add them in one
+// instruction, others in two; each channel's arithmetic is the same either way (no fused
+// multiply-add: the wide path asks for the wide registers only).
+typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
+
+// Adds weight × (b − a) for the prefix sums a and b of one row to sum.
+[[gnu::always_inline]] inline void AddRun(const double* a, const double* b, double weight,
+                                          Sums4* sum) {
+    Sums4 from, to;
+    __builtin_memcpy(&from, a, sizeof from);
+    __builtin_memcpy(&to, b, sizeof to);
+    *sum += (to - from) * Sums4{weight, weight, weight, weight};
+}
+
+// Adds one kernel row's runs s to last around each of the kPixels neighbours from x on to
+// their sums, sums being the row's prefix sums. kClipped: the runs may reach beyond the row of
+// width pixels, whose ends are then kept within it, and each pixel's weight adds the weight of
+// the pixels it read.
+template <bool kClipped, int32_t kPixels>
+[[gnu::always_inline]] inline void AddRow(const ShapeKernel::Segment* s,
+                                          const ShapeKernel::Segment* last, const double* sums,
+                                          int32_t x, int32_t width, Sums4* sum, double* weight) {
+    // Sums kept apart from the table's memory stay in registers.
+    Sums4 kept[kPixels];
+    for (int32_t p = 0; p < kPixels; ++p)
+        kept[p] = sum[p];
+    for (; s != last; ++s) {
+        for (int32_t p = 0; p < kPixels; ++p) {
+            int32_t x0 = x + p + s->x, x1 = x0 + s->length;
+            if constexpr (kClipped) {
+                x0 = std::clamp(x0, 0, width);
+                x1 = std::clamp(x1, 0, width);
+                weight[p] += static_cast<double>(s->weight) * (x1 - x0);
+            }
+            AddRun(sums + 4 * ptrdiff_t(x0), sums + 4 * ptrdiff_t(x1), s->weight, kept + p);
+        }
+    }
+    for (int32_t p = 0; p < kPixels; ++p)
+        sum[p] = kept[p];
+}
+
+// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
+// width × height world to sum[p]; kClipped as for AddRow, and rows beyond the world are left
+// out. Every pixel takes its terms in the same order, row by row and run by run, whatever its
+// neighbours, so that its sum is the same to the bit. The neighbours go through each kernel row
+// together, so that the row's sums are read once from memory for all of them, and four at a
+// time, because one pixel's additions wait on each other while the others' run alongside.
+template <bool kClipped, class Table>
+[[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const Table& table,
+                                             int32_t x, int32_t y, int32_t count, int32_t width,
+                                             int32_t height, Sums4* sum, double* weight) {
+    constexpr int32_t kTogether = 4;
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
-        if (yy < 0 || yy >= height) continue;
+        if (kClipped && (yy < 0 || yy >= height)) continue;
         const double* sums = &table.Row(yy)[0].alpha;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
-        for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
-            const int32_t x0 = std::clamp(x + s->x, 0, width);
-            const int32_t x1 = std::clamp(x + s->x + s->length, 0, width);
-            weight += static_cast<double>(s->weight) * (x1 - x0);
-            const double* a = sums + 4 * ptrdiff_t(x0);
-            const double* b = sums + 4 * ptrdiff_t(x1);
-            const __m128d w = _mm_set1_pd(s->weight);
-            sum[0] =
-                _mm_add_pd(sum[0], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b), _mm_loadu_pd(a)), w));
-            sum[1] = _mm_add_pd(
-                sum[1], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b + 2), _mm_loadu_pd(a + 2)), w));
-        }
+        const ShapeKernel::Segment* last = s + row->segmentCount;
+        int32_t p = 0;
+        for (; p + kTogether <= count; p += kTogether)
+            AddRow<kClipped, kTogether>(s, last, sums, x + p, width, sum + p, weight + p);
+        for (; p < count; ++p)
+            AddRow<kClipped, 1>(s, last, sums, x + p, width, sum + p, weight + p);
     }
-    return weight;
 }
 
-// Adds the kernel's runs around each of the kPixels neighbours (x + p, y), the kernel lying
-// within the world for every one, to sum[p]. Each pixel takes its terms in the order
-// AddClippedKernel takes them, so its sum is the same to the bit; the pixels are interleaved
-// because one pixel's additions wait on each other, while the neighbours' run alongside.
-template <int32_t kPixels, class Table>
-void AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
-               __m128d sum[][2]) {
-    const ShapeKernel::Segment* segments = kernel.Segments();
-    const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
-    for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
-        const double* sums = &table.Row(y + row->y)[x].alpha;
-        const ShapeKernel::Segment* s = segments + row->firstSegment;
-        for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
-            const double* a = sums + 4 * ptrdiff_t(s->x);
-            const double* b = a + 4 * ptrdiff_t(s->length);
-            const __m128d w = _mm_set1_pd(s->weight);
-            for (int32_t p = 0; p < kPixels; ++p, a += 4, b += 4) {
-                sum[p][0] = _mm_add_pd(sum[p][0],
-                                       _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b), _mm_loadu_pd(a)), w));
-                sum[p][1] = _mm_add_pd(
-                    sum[p][1], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b + 2), _mm_loadu_pd(a + 2)), w));
-            }
-        }
+// AddKernel through the wide registers, for processors that have them.
+template <bool kClipped, class Table>
+[[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const Table& table, int32_t x,
+                                          int32_t y, int32_t count, int32_t width, int32_t height,
+                                          Sums4* sum, double* weight) {
+    AddKernel<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
+}
+
+template <bool kClipped, class Table>
+void AddKernelOnAny(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
+                    int32_t count, int32_t width, int32_t height, Sums4* sum, double* weight) {
+    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    if (wide) {
+        AddKernelWide<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
+    } else {
+        AddKernel<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
     }
 }
 
 // Stores the kernel sum scaled by n (one over the weight read) as a pixel.
 template <class P>
-void StoreSum(const __m128d sum[2], double n, P* out) {
-    double v[4];
-    _mm_storeu_pd(v, sum[0]);
-    _mm_storeu_pd(v + 2, sum[1]);
+void StoreSum(const Sums4& sum, double n, P* out) {
     pf_tables::StoreAverage(
-        PF_Float4{static_cast<float>(std::min(v[0] * n, 1.0)), static_cast<float>(v[1] * n),
-                  static_cast<float>(v[2] * n), static_cast<float>(v[3] * n)},
+        PF_Float4{static_cast<float>(std::min(sum[0] * n, 1.0)), static_cast<float>(sum[1] * n),
+                  static_cast<float>(sum[2] * n), static_cast<float>(sum[3] * n)},
         1.0f, out);
 }
 
@@ -173,48 +201,55 @@ bool Within(const int32_t* e, int32_t x, int32_t y, int32_t width, int32_t heigh
 }  // namespace
 
 template <class P>
-void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
-    __m128d sum[1][2] = {{_mm_setzero_pd(), _mm_setzero_pd()}};
-    double n = kernel.Normalization();
-    if (Within(kernel.Extent(), x, y, width, height)) {
-        AddKernel<1>(kernel, *rowTable, x, y, sum);
-    } else {
-        const double weight = AddClippedKernel(kernel, *rowTable, x, y, width, height, sum[0]);
-        if (!(weight > 0)) {
-            *out = P{};
-            return;
-        }
-        if (averagesWithin) n = 1 / weight;
+void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count,
+                                    P* out) const {
+    Sums4 sum[kSpanPixels] = {};
+    const double n = kernel.Normalization();
+    const int32_t* e = kernel.Extent();
+    if (Within(e, x, y, width - count + 1, height)) {
+        AddKernelOnAny<false>(kernel, *rowTable, x, y, count, width, height, sum, nullptr);
+        for (int32_t k = 0; k < count; ++k)
+            StoreSum(sum[k], n, out + k);
+        return;
     }
-    StoreSum(sum[0], n, out);
+    double weight[kSpanPixels] = {};
+    AddKernelOnAny<true>(kernel, *rowTable, x, y, count, width, height, sum, weight);
+    for (int32_t k = 0; k < count; ++k) {
+        // A pixel whose kernel lies within read the same terms as above.
+        if (Within(e, x + k, y, width, height)) {
+            StoreSum(sum[k], n, out + k);
+        } else if (!(weight[k] > 0)) {
+            out[k] = P{};
+        } else {
+            StoreSum(sum[k], averagesWithin ? 1 / weight[k] : n, out + k);
+        }
+    }
 }
 
 template <class P>
 void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count,
                                   const float* radius, P* out) const {
+    // Sample finds the pixel it reads from by truncation, as here.
     auto at = [&](int32_t k) { return x + static_cast<float>(first + k); };
-    if (rowTable && count == kSpanPixels) {
-        // Sample finds the pixel it reads from by truncation, as here.
-        const ShapeKernel* kernel = KernelFor(radius[0]);
-        const auto ix = static_cast<int32_t>(at(0) - static_cast<float>(originX));
-        const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
-        bool shared = kernel && Within(kernel->Extent(), ix, iy, width - kSpanPixels + 1, height);
-        for (int32_t k = 1; shared && k < count; ++k) {
-            shared = KernelFor(radius[k]) == kernel &&
-                     static_cast<int32_t>(at(k) - static_cast<float>(originX)) == ix + k;
+    auto column = [&](int32_t k) {
+        return static_cast<int32_t>(at(k) - static_cast<float>(originX));
+    };
+    const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
+    for (int32_t k = 0; k < count;) {
+        const ShapeKernel* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
+        if (!kernel) {
+            Sample(at(k), y, radius[k], out + k);
+            ++k;
+            continue;
         }
-        if (shared) {
-            __m128d sum[kSpanPixels][2];
-            for (auto& s : sum)
-                s[0] = s[1] = _mm_setzero_pd();
-            AddKernel<kSpanPixels>(*kernel, *rowTable, ix, iy, sum);
-            for (int32_t k = 0; k < count; ++k)
-                StoreSum(sum[k], kernel->Normalization(), out + k);
-            return;
-        }
+        // The neighbours that read through the same kernel.
+        const int32_t ix = column(k);
+        int32_t n = 1;
+        while (k + n < count && KernelFor(radius[k + n]) == kernel && column(k + n) == ix + n)
+            ++n;
+        SampleKernel(*kernel, ix, iy, n, out + k);
+        k += n;
     }
-    for (int32_t k = 0; k < count; ++k)
-        Sample(at(k), y, radius[k], out + k);
 }
 
 template class SY_DOFBufferX<PF_Pixel8>;

@@ -75,8 +75,9 @@ public:
 
     // As Sample for the count points x + first + k (k below count, at most kSpanPixels) of the
     // row at y, pixel k blurred over radius[k] into out[k], with the same results. Neighbours
-    // that share an iris kernel are read together, so that their sums add up side by side.
-    static constexpr int32_t kSpanPixels = 4;
+    // that share an iris kernel are read together, row by row of the kernel, which keeps the
+    // rows' sums in cache and lets the neighbours' sums add up side by side.
+    static constexpr int32_t kSpanPixels = 64;
     void SampleSpan(float x, float y, int32_t first, int32_t count, const float* radius,
                     P* out) const;
 
@@ -84,7 +85,8 @@ private:
     const ShapeKernel* KernelFor(float radius) const {
         return kernels ? kernels->ForShare(std::min(1.0f, radius / model.maxRadius)) : nullptr;
     }
-    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const;
+    // The count neighbours from (x, y) on (in the world's pixels), blurred through kernel.
+    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count, P* out) const;
 
     PF_WorldX<P> world;
     std::unique_ptr<PF_SummedAreaTable> areaTable;
