@@ -111,11 +111,14 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
     *sum += (to - from) * Sums4{weight, weight, weight, weight};
 }
 
+// How far the kernels around a group of pixels reach: within the world; beyond its top or
+// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
+// it. Beyond the world each pixel sums the weight of the pixels it read.
+enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
+
 // Adds one kernel row's runs s to last around each of the kPixels neighbours from x on to
-// their sums, sums being the row's prefix sums. kClipped: the runs may reach beyond the row of
-// width pixels, whose ends are then kept within it, and each pixel's weight adds the weight of
-// the pixels it read.
-template <bool kClipped, int32_t kPixels>
+// their sums, sums being the row's prefix sums of width pixels.
+template <Reach kReach, int32_t kPixels>
 [[gnu::always_inline]] inline void AddRow(const ShapeKernel::Segment* s,
                                           const ShapeKernel::Segment* last, const double* sums,
                                           int32_t x, int32_t width, Sums4* sum, double* weight) {
@@ -124,14 +127,22 @@ template <bool kClipped, int32_t kPixels>
     for (int32_t p = 0; p < kPixels; ++p)
         kept[p] = sum[p];
     for (; s != last; ++s) {
-        for (int32_t p = 0; p < kPixels; ++p) {
-            int32_t x0 = x + p + s->x, x1 = x0 + s->length;
-            if constexpr (kClipped) {
-                x0 = std::clamp(x0, 0, width);
-                x1 = std::clamp(x1, 0, width);
+        if constexpr (kReach == Reach::kBeyondEnds) {
+            for (int32_t p = 0; p < kPixels; ++p) {
+                const int32_t x0 = std::clamp(x + p + s->x, 0, width);
+                const int32_t x1 = std::clamp(x + p + s->x + s->length, 0, width);
                 weight[p] += static_cast<double>(s->weight) * (x1 - x0);
+                AddRun(sums + 4 * ptrdiff_t(x0), sums + 4 * ptrdiff_t(x1), s->weight, kept + p);
             }
-            AddRun(sums + 4 * ptrdiff_t(x0), sums + 4 * ptrdiff_t(x1), s->weight, kept + p);
+        } else {
+            // The neighbours' runs lie side by side: fixed steps from the first one's ends.
+            const double* a = sums + 4 * (ptrdiff_t(x) + s->x);
+            const double* b = a + 4 * ptrdiff_t(s->length);
+            for (int32_t p = 0; p < kPixels; ++p) {
+                if constexpr (kReach == Reach::kBeyondRows)
+                    weight[p] += static_cast<double>(s->weight) * s->length;
+                AddRun(a + 4 * p, b + 4 * p, s->weight, kept + p);
+            }
         }
     }
     for (int32_t p = 0; p < kPixels; ++p)
@@ -139,48 +150,49 @@ template <bool kClipped, int32_t kPixels>
 }
 
 // Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
-// width × height world to sum[p]; kClipped as for AddRow, and rows beyond the world are left
-// out. Every pixel takes its terms in the same order, row by row and run by run, whatever its
-// neighbours, so that its sum is the same to the bit. The neighbours go through each kernel row
-// together, so that the row's sums are read once from memory for all of them, and four at a
-// time, because one pixel's additions wait on each other while the others' run alongside.
-template <bool kClipped, class Table>
+// width × height world to sum[p], as far as kReach says. Every pixel takes its terms in the
+// same order, row by row and run by run, whatever its neighbours and its reach, so that its sum
+// is the same to the bit. The neighbours go through each kernel row together, so that the
+// row's sums are read once from memory for all of them, and four at a time, because one
+// pixel's additions wait on each other while the others' run alongside.
+template <Reach kReach, int32_t kTogether, class Table>
 [[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const Table& table,
                                              int32_t x, int32_t y, int32_t count, int32_t width,
                                              int32_t height, Sums4* sum, double* weight) {
-    constexpr int32_t kTogether = 4;
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
-        if (kClipped && (yy < 0 || yy >= height)) continue;
+        if (kReach != Reach::kWithin && (yy < 0 || yy >= height)) continue;
         const double* sums = &table.Row(yy)[0].alpha;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
         const ShapeKernel::Segment* last = s + row->segmentCount;
         int32_t p = 0;
         for (; p + kTogether <= count; p += kTogether)
-            AddRow<kClipped, kTogether>(s, last, sums, x + p, width, sum + p, weight + p);
+            AddRow<kReach, kTogether>(s, last, sums, x + p, width, sum + p, weight + p);
         for (; p < count; ++p)
-            AddRow<kClipped, 1>(s, last, sums, x + p, width, sum + p, weight + p);
+            AddRow<kReach, 1>(s, last, sums, x + p, width, sum + p, weight + p);
     }
 }
 
 // AddKernel through the wide registers, for processors that have them.
-template <bool kClipped, class Table>
+template <Reach kReach, class Table>
 [[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const Table& table, int32_t x,
                                           int32_t y, int32_t count, int32_t width, int32_t height,
                                           Sums4* sum, double* weight) {
-    AddKernel<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
+    // Sixteen wide registers hold eight pixels' sums and what they add.
+    AddKernel<kReach, 8>(kernel, table, x, y, count, width, height, sum, weight);
 }
 
-template <bool kClipped, class Table>
+template <Reach kReach, class Table>
 void AddKernelOnAny(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
                     int32_t count, int32_t width, int32_t height, Sums4* sum, double* weight) {
     static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    if (count <= 0) return;
     if (wide) {
-        AddKernelWide<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
+        AddKernelWide<kReach>(kernel, table, x, y, count, width, height, sum, weight);
     } else {
-        AddKernel<kClipped>(kernel, table, x, y, count, width, height, sum, weight);
+        AddKernel<kReach, 4>(kernel, table, x, y, count, width, height, sum, weight);
     }
 }
 
@@ -193,30 +205,33 @@ void StoreSum(const Sums4& sum, double n, P* out) {
         1.0f, out);
 }
 
-// Whether a kernel of extent e around (x, y) lies within a width × height world.
-bool Within(const int32_t* e, int32_t x, int32_t y, int32_t width, int32_t height) {
-    return x + e[0] >= 0 && x + e[2] < width && y + e[1] >= 0 && y + e[3] < height;
-}
-
 }  // namespace
 
 template <class P>
 void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count,
                                     P* out) const {
-    Sums4 sum[kSpanPixels] = {};
-    const double n = kernel.Normalization();
+    // Pixels k below left reach beyond the world's left end, from right on beyond its right;
+    // those between, beyond its rows or not, for all of them alike.
     const int32_t* e = kernel.Extent();
-    if (Within(e, x, y, width - count + 1, height)) {
-        AddKernelOnAny<false>(kernel, *rowTable, x, y, count, width, height, sum, nullptr);
-        for (int32_t k = 0; k < count; ++k)
-            StoreSum(sum[k], n, out + k);
-        return;
-    }
+    const int32_t left = std::clamp(-e[0] - x, 0, count);
+    const int32_t right = std::clamp(width - e[2] - x, left, count);
+    const bool rowsWithin = y + e[1] >= 0 && y + e[3] < height;
+    Sums4 sum[kSpanPixels] = {};
     double weight[kSpanPixels] = {};
-    AddKernelOnAny<true>(kernel, *rowTable, x, y, count, width, height, sum, weight);
+    const Table& table = *rowTable;
+    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x, y, left, width, height, sum, weight);
+    if (rowsWithin) {
+        AddKernelOnAny<Reach::kWithin>(kernel, table, x + left, y, right - left, width, height,
+                                       sum + left, nullptr);
+    } else {
+        AddKernelOnAny<Reach::kBeyondRows>(kernel, table, x + left, y, right - left, width, height,
+                                           sum + left, weight + left);
+    }
+    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x + right, y, count - right, width, height,
+                                       sum + right, weight + right);
+    const double n = kernel.Normalization();
     for (int32_t k = 0; k < count; ++k) {
-        // A pixel whose kernel lies within read the same terms as above.
-        if (Within(e, x + k, y, width, height)) {
+        if (rowsWithin && k >= left && k < right) {
             StoreSum(sum[k], n, out + k);
         } else if (!(weight[k] > 0)) {
             out[k] = P{};

@@ -90,6 +90,7 @@ private:
 
     PF_WorldX<P> world;
     std::unique_ptr<PF_SummedAreaTable> areaTable;
-    std::unique_ptr<PF_HorizontalSumTable<P>> rowTable;
+    using Table = PF_HorizontalSumTable<P>;
+    std::unique_ptr<Table> rowTable;
     std::shared_ptr<const ShapeKernelArray> kernels;
 };
