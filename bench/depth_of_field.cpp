@@ -2,7 +2,8 @@
 // focus, the others blurred by the camera's depth of field up to a largest circle of confusion
 // (radius 5 to 40 pixels) on the farthest. Reports the time per frame and per covered pixel,
 // on one thread, for the sharp frame and for the blurred one through the fast rectangle (a box
-// over summed areas) and through a hexagonal iris (kernels over row sums); and, when OpenCV is
+// over summed areas) and through a hexagonal and a half-rounded octagonal iris (kernels over
+// row sums); and, when OpenCV is
 // there, filter2D with a disc of radius 40 over one flat frame of the same size, as a floor.
 #include <benchmark/benchmark.h>
 
@@ -45,7 +46,8 @@ M_Matrix4 CardPlacement(int32_t k) {
 struct Scene : bench::CardScene<PF_Pixel8> {
     Scene() : bench::CardScene<PF_Pixel8>(kCards, kTextureSize, true, 11, &CardPlacement) {}
 
-    // irisShape 0: no depth of field; 1: the fast rectangle; 6: a hexagon.
+    // irisShape 0: no depth of field; 1: the fast rectangle; 6: a hexagon; 8: an octagon
+    // with roundness one half.
     void Focus(int32_t irisShape, double largestRadius) {
         scene.dof.enabled = irisShape != 0;
         scene.dof.zoom = kDistance;
@@ -53,6 +55,7 @@ struct Scene : bench::CardScene<PF_Pixel8> {
         scene.dof.aperture = kApertureFor40 * largestRadius / 40;
         scene.dof.blurLevel = 1;
         scene.dof.irisShape = irisShape;
+        scene.dof.irisRoundness = irisShape == 8 ? 0.5 : 0;
     }
 
     void Render(PF_World* destination) {
@@ -71,7 +74,8 @@ void ReportPerCoveredPixel(benchmark::State& state) {
                                                 benchmark::Counter::kInvert);
 }
 
-// Arguments: iris shape (0 sharp, 1 box, 6 hexagon), largest blur radius in pixels.
+// Arguments: iris shape (0 sharp, 1 box, 6 hexagon, 8 rounded octagon), largest blur radius
+// in pixels.
 void BM_Frame(benchmark::State& state) {
     Scene scene;
     scene.Focus(static_cast<int32_t>(state.range(0)), static_cast<double>(state.range(1)));
@@ -86,7 +90,7 @@ void BM_Frame(benchmark::State& state) {
 
 void Frames(benchmark::internal::Benchmark* b) {
     b->ArgNames({"iris", "radius"})->Args({0, 0});
-    for (int64_t iris : {1, 6}) {
+    for (int64_t iris : {1, 6, 8}) {
         for (int64_t radius : {5, 10, 20, 40})
             b->Args({iris, radius});
     }

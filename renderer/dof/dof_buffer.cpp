@@ -90,71 +90,181 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
         PF_SummedAreaTable_SampleAA(width, height, areaTable->DoubleSums(), x0, y0, x1, y1, out);
         return;
     }
-    const ShapeKernel* kernel =
-        kernels ? kernels->ForShare(std::min(1.0f, radius / model.maxRadius)) : nullptr;
+    const ShapeKernel* kernel = KernelFor(radius);
     if (!kernel) return drawn();
-    SampleKernel(*kernel, ix, iy, out);
+    SampleKernel(*kernel, ix, iy, 1, out);
 }
 
 namespace {
 
-// Adds the kernel's runs around (x, y) over the row sums of a width × height world to sum
-// (alpha and red, green and blue) and returns the weight of the pixels read. kClipped: the
-// kernel reaches beyond the world, whose rows and ends are then kept within it.
-template <bool kClipped, class Table>
-double AddKernel(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y, int32_t width,
-                 int32_t height, __m128d sum[2]) {
-    double weight = 0;
+// One pixel's alpha, red, green and blue sums. Processors with wide registers add them in one
+// instruction, others in two; each channel's arithmetic is the same either way (no fused
+// multiply-add: the wide path asks for the wide registers only).
+typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
+
+// Adds weight × (b − a) for the prefix sums a and b of one row to sum.
+[[gnu::always_inline]] inline void AddRun(const double* a, const double* b, double weight,
+                                          Sums4* sum) {
+    Sums4 from, to;
+    __builtin_memcpy(&from, a, sizeof from);
+    __builtin_memcpy(&to, b, sizeof to);
+    *sum += (to - from) * Sums4{weight, weight, weight, weight};
+}
+
+// How far the kernels around a group of pixels reach: within the world; beyond its top or
+// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
+// it. Beyond the world each pixel sums the weight of the pixels it read.
+enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
+
+// Adds one kernel row's runs s to last around each of the kPixels neighbours from x on to
+// their sums, sums being the row's prefix sums of width pixels.
+template <Reach kReach, int32_t kPixels>
+[[gnu::always_inline]] inline void AddRow(const ShapeKernel::Segment* s,
+                                          const ShapeKernel::Segment* last, const double* sums,
+                                          int32_t x, int32_t width, Sums4* sum, double* weight) {
+    // Sums kept apart from the table's memory stay in registers.
+    Sums4 kept[kPixels];
+    for (int32_t p = 0; p < kPixels; ++p)
+        kept[p] = sum[p];
+    for (; s != last; ++s) {
+        if constexpr (kReach == Reach::kBeyondEnds) {
+            for (int32_t p = 0; p < kPixels; ++p) {
+                const int32_t x0 = std::clamp(x + p + s->x, 0, width);
+                const int32_t x1 = std::clamp(x + p + s->x + s->length, 0, width);
+                weight[p] += static_cast<double>(s->weight) * (x1 - x0);
+                AddRun(sums + 4 * ptrdiff_t(x0), sums + 4 * ptrdiff_t(x1), s->weight, kept + p);
+            }
+        } else {
+            // The neighbours' runs lie side by side: fixed steps from the first one's ends.
+            const double* a = sums + 4 * (ptrdiff_t(x) + s->x);
+            const double* b = a + 4 * ptrdiff_t(s->length);
+            for (int32_t p = 0; p < kPixels; ++p) {
+                if constexpr (kReach == Reach::kBeyondRows)
+                    weight[p] += static_cast<double>(s->weight) * s->length;
+                AddRun(a + 4 * p, b + 4 * p, s->weight, kept + p);
+            }
+        }
+    }
+    for (int32_t p = 0; p < kPixels; ++p)
+        sum[p] = kept[p];
+}
+
+// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
+// width × height world to sum[p], as far as kReach says. Every pixel takes its terms in the
+// same order, row by row and run by run, whatever its neighbours and its reach, so that its sum
+// is the same to the bit. The neighbours go through each kernel row together, so that the
+// row's sums are read once from memory for all of them, and four at a time, because one
+// pixel's additions wait on each other while the others' run alongside.
+template <Reach kReach, int32_t kTogether, class Table>
+[[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const Table& table,
+                                             int32_t x, int32_t y, int32_t count, int32_t width,
+                                             int32_t height, Sums4* sum, double* weight) {
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
-        if (kClipped && (yy < 0 || yy >= height)) continue;
+        if (kReach != Reach::kWithin && (yy < 0 || yy >= height)) continue;
         const double* sums = &table.Row(yy)[0].alpha;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
-        for (const ShapeKernel::Segment* last = s + row->segmentCount; s != last; ++s) {
-            int32_t x0 = x + s->x, x1 = x0 + s->length;
-            if constexpr (kClipped) {
-                x0 = std::clamp(x0, 0, width);
-                x1 = std::clamp(x1, 0, width);
-                weight += static_cast<double>(s->weight) * (x1 - x0);
-            }
-            const double* a = sums + 4 * ptrdiff_t(x0);
-            const double* b = sums + 4 * ptrdiff_t(x1);
-            const __m128d w = _mm_set1_pd(s->weight);
-            sum[0] =
-                _mm_add_pd(sum[0], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b), _mm_loadu_pd(a)), w));
-            sum[1] = _mm_add_pd(
-                sum[1], _mm_mul_pd(_mm_sub_pd(_mm_loadu_pd(b + 2), _mm_loadu_pd(a + 2)), w));
-        }
+        const ShapeKernel::Segment* last = s + row->segmentCount;
+        int32_t p = 0;
+        for (; p + kTogether <= count; p += kTogether)
+            AddRow<kReach, kTogether>(s, last, sums, x + p, width, sum + p, weight + p);
+        for (; p < count; ++p)
+            AddRow<kReach, 1>(s, last, sums, x + p, width, sum + p, weight + p);
     }
-    return weight;
+}
+
+// AddKernel through the wide registers, for processors that have them.
+template <Reach kReach, class Table>
+[[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const Table& table, int32_t x,
+                                          int32_t y, int32_t count, int32_t width, int32_t height,
+                                          Sums4* sum, double* weight) {
+    // Sixteen wide registers hold eight pixels' sums and what they add.
+    AddKernel<kReach, 8>(kernel, table, x, y, count, width, height, sum, weight);
+}
+
+template <Reach kReach, class Table>
+void AddKernelOnAny(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
+                    int32_t count, int32_t width, int32_t height, Sums4* sum, double* weight) {
+    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    if (count <= 0) return;
+    if (wide) {
+        AddKernelWide<kReach>(kernel, table, x, y, count, width, height, sum, weight);
+    } else {
+        AddKernel<kReach, 4>(kernel, table, x, y, count, width, height, sum, weight);
+    }
+}
+
+// Stores the kernel sum scaled by n (one over the weight read) as a pixel.
+template <class P>
+void StoreSum(const Sums4& sum, double n, P* out) {
+    pf_tables::StoreAverage(
+        PF_Float4{static_cast<float>(std::min(sum[0] * n, 1.0)), static_cast<float>(sum[1] * n),
+                  static_cast<float>(sum[2] * n), static_cast<float>(sum[3] * n)},
+        1.0f, out);
 }
 
 }  // namespace
 
 template <class P>
-void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const {
-    __m128d sum[2] = {_mm_setzero_pd(), _mm_setzero_pd()};
+void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count,
+                                    P* out) const {
+    // Pixels k below left reach beyond the world's left end, from right on beyond its right;
+    // those between, beyond its rows or not, for all of them alike.
     const int32_t* e = kernel.Extent();
-    double n = kernel.Normalization();
-    if (x + e[0] >= 0 && x + e[2] < width && y + e[1] >= 0 && y + e[3] < height) {
-        AddKernel<false>(kernel, *rowTable, x, y, width, height, sum);
+    const int32_t left = std::clamp(-e[0] - x, 0, count);
+    const int32_t right = std::clamp(width - e[2] - x, left, count);
+    const bool rowsWithin = y + e[1] >= 0 && y + e[3] < height;
+    Sums4 sum[kSpanPixels] = {};
+    double weight[kSpanPixels] = {};
+    const Table& table = *rowTable;
+    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x, y, left, width, height, sum, weight);
+    if (rowsWithin) {
+        AddKernelOnAny<Reach::kWithin>(kernel, table, x + left, y, right - left, width, height,
+                                       sum + left, nullptr);
     } else {
-        const double weight = AddKernel<true>(kernel, *rowTable, x, y, width, height, sum);
-        if (!(weight > 0)) {
-            *out = P{};
-            return;
-        }
-        if (averagesWithin) n = 1 / weight;
+        AddKernelOnAny<Reach::kBeyondRows>(kernel, table, x + left, y, right - left, width, height,
+                                           sum + left, weight + left);
     }
-    double v[4];
-    _mm_storeu_pd(v, sum[0]);
-    _mm_storeu_pd(v + 2, sum[1]);
-    pf_tables::StoreAverage(
-        PF_Float4{static_cast<float>(std::min(v[0] * n, 1.0)), static_cast<float>(v[1] * n),
-                  static_cast<float>(v[2] * n), static_cast<float>(v[3] * n)},
-        1.0f, out);
+    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x + right, y, count - right, width, height,
+                                       sum + right, weight + right);
+    const double n = kernel.Normalization();
+    for (int32_t k = 0; k < count; ++k) {
+        if (rowsWithin && k >= left && k < right) {
+            StoreSum(sum[k], n, out + k);
+        } else if (!(weight[k] > 0)) {
+            out[k] = P{};
+        } else {
+            StoreSum(sum[k], averagesWithin ? 1 / weight[k] : n, out + k);
+        }
+    }
+}
+
+template <class P>
+void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count,
+                                  const float* radius, P* out) const {
+    // Sample finds the pixel it reads from by truncation, as here.
+    auto at = [&](int32_t k) { return x + static_cast<float>(first + k); };
+    auto column = [&](int32_t k) {
+        return static_cast<int32_t>(at(k) - static_cast<float>(originX));
+    };
+    const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
+    for (int32_t k = 0; k < count;) {
+        const ShapeKernel* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
+        if (!kernel) {
+            Sample(at(k), y, radius[k], out + k);
+            ++k;
+            continue;
+        }
+        // The neighbours that read through the same kernel.
+        const int32_t ix = column(k);
+        int32_t n = 1;
+        while (k + n < count && KernelFor(radius[k + n]) == kernel && column(k + n) == ix + n)
+            ++n;
+        SampleKernel(*kernel, ix, iy, n, out + k);
+        k += n;
+    }
 }
 
 template class SY_DOFBufferX<PF_Pixel8>;

@@ -2,6 +2,7 @@
 // output pixel averaging the layer over the blur its depth calls for.
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
 #include <memory>
 
@@ -72,11 +73,24 @@ public:
     // output pixels. A radius too small to show gives the drawn pixel itself.
     void Sample(float x, float y, float radius, P* out) const;
 
+    // As Sample for the count points x + first + k (k below count, at most kSpanPixels) of the
+    // row at y, pixel k blurred over radius[k] into out[k], with the same results. Neighbours
+    // that share an iris kernel are read together, row by row of the kernel, which keeps the
+    // rows' sums in cache and lets the neighbours' sums add up side by side.
+    static constexpr int32_t kSpanPixels = 64;
+    void SampleSpan(float x, float y, int32_t first, int32_t count, const float* radius,
+                    P* out) const;
+
 private:
-    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, P* out) const;
+    const ShapeKernel* KernelFor(float radius) const {
+        return kernels ? kernels->ForShare(std::min(1.0f, radius / model.maxRadius)) : nullptr;
+    }
+    // The count neighbours from (x, y) on (in the world's pixels), blurred through kernel.
+    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count, P* out) const;
 
     PF_WorldX<P> world;
     std::unique_ptr<PF_SummedAreaTable> areaTable;
-    std::unique_ptr<PF_HorizontalSumTable<P>> rowTable;
+    using Table = PF_HorizontalSumTable<P>;
+    std::unique_ptr<Table> rowTable;
     std::shared_ptr<const ShapeKernelArray> kernels;
 };

@@ -53,17 +53,40 @@ struct ImagePixels {
 };
 
 // The pixels of a depth-of-field buffer along the span, each blurred by the radius that the
-// plane's depth at the pixel calls for.
+// plane's depth at the pixel calls for. They are sampled up to kAhead neighbours at a time,
+// which the buffer reads faster than one by one: as far as the span goes on drawing.
 template <class P>
 struct BlurredPixels {
     static constexpr bool kBlurred = true;
+    static constexpr int32_t kAhead = SY_DOFBufferX<P>::kSpanPixels;
     const SY_DOFBufferX<P>* buffer;
     float x;  // centre of the span's first pixel
     float y;
+    const ImageSpan* span;
+    const P* matte;             // the matte's row from the span's first pixel on, or null
+    mutable int32_t first = 0;  // pixels [first, first + sampledCount) are sampled
+    mutable int32_t sampledCount = 0;
+    mutable P sampled[kAhead] = {};
+
     P At(int32_t i, double w) const {
-        P pixel;
-        buffer->Sample(x + static_cast<float>(i), y, buffer->RadiusAtW(w), &pixel);
-        return pixel;
+        if (i < first || i >= first + sampledCount) {
+            // The pixels from i on that the span draws, with W as it computes it: those the
+            // matte shows and the plane lies in front of.
+            const SY_SpanMapping& m = span->depth;
+            float radius[kAhead];
+            int32_t count = 0;
+            for (; count < kAhead && i + count < span->count; ++count) {
+                const int32_t j = i + count;
+                const double wj = count ? m.w + j * static_cast<double>(m.dwdx) : w;
+                if (count && ((matte && matte[j].alpha == 0) || (span->perspective && wj <= 0)))
+                    break;
+                radius[count] = buffer->RadiusAtW(wj);
+            }
+            buffer->SampleSpan(x, y, i, count, radius, sampled);
+            first = i;
+            sampledCount = count;
+        }
+        return sampled[i - first];
     }
 };
 
@@ -191,8 +214,8 @@ void SY_RenderLayerSpanFromDOFBuffer_SwitchDepth(const SY_SpanBlend& blend,
                 return;
             }
             BlurredPixels<P> source{static_cast<const SY_DOFBufferX<P>*>(&buffer),
-                                    static_cast<float>(span.x) + 0.5f,
-                                    static_cast<float>(y) + 0.5f};
+                                    static_cast<float>(span.x) + 0.5f, static_cast<float>(y) + 0.5f,
+                                    &span, matte ? matte->PixelAt<P>(span.x, y) : nullptr};
             DrawAtDepth<P>(blend, layer, matte, span, source, y, tables, target, thread);
         },
         U_BitDepthVerification(
