@@ -3,6 +3,7 @@
 #include "renderer/raster/light_terms.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
+#include "renderer/shadow/shadow_map.h"
 
 namespace {
 
@@ -21,7 +22,7 @@ std::unique_ptr<SY_LayerShader> SY_MakeLayerShader(SY_RenderContext* context,
                                                    const SY_TRLayer& renderable) {
     const SY_Material& material = renderable.material;
     auto shader = std::make_unique<SY_LayerShader>();
-    shader->layerId = static_cast<uint16_t>(material.renderIndex);
+    shader->layerId = SY_ShadowLayerId(material.renderIndex);
     shader->material = material;
     std::copy(context->cameraPosition, context->cameraPosition + 3, shader->eye);
     shader->depthOffset = SY_DepthOffset(material);
