@@ -155,12 +155,11 @@ private:
         }
     }
 
-    // One layer's list is already in order, each entry what that layer lets through.
+    // One layer's list is already in order, each entry what that layer lets through; its
+    // entries all carry the layer's id, so none of them is a step.
     void CopyList(const SY_ShadowFragment* f) {
-        uint32_t begin = written_;
         for (; f; f = f->next)
             Write(*f, f->red, f->green, f->blue);
-        MarkSteps(begin);
     }
 
     void MarkSteps(uint32_t begin) {
