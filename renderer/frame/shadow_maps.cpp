@@ -155,12 +155,11 @@ private:
         }
     }
 
-    // One layer's list is already in order, each entry what that layer lets through.
+    // One layer's list is already in order, each entry what that layer lets through; its
+    // entries all carry the layer's id, so none of them is a step.
     void CopyList(const SY_ShadowFragment* f) {
-        uint32_t begin = written_;
         for (; f; f = f->next)
             Write(*f, f->red, f->green, f->blue);
-        MarkSteps(begin);
     }
 
     void MarkSteps(uint32_t begin) {
@@ -188,6 +187,10 @@ private:
     void MergeLists() {
         for (int32_t k : covering_)
             std::fill_n(&passed_[size_t(k) * 3], 3, 1.0f);
+        // Until a second layer is passed, every other factor of the product is exactly 1, so
+        // the product is the occluder's own transmission, bit for bit.
+        int32_t first = -1;
+        bool alone = true;
         for (;;) {
             // The nearest next occluder; on a tie the earlier array's goes first.
             int32_t nearest = -1;
@@ -202,6 +205,12 @@ private:
             own[0] = f.red * (1.0f / 32768);
             own[1] = f.green * (1.0f / 32768);
             own[2] = f.blue * (1.0f / 32768);
+            if (first < 0) first = nearest;
+            alone = alone && nearest == first;
+            if (alone) {
+                Write(f, f.red, f.green, f.blue);
+                continue;
+            }
             float product[3] = {1, 1, 1};
             for (int32_t k : covering_) {
                 for (int c = 0; c < 3; ++c)
