@@ -128,25 +128,33 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
     *sum += at * Sums4{weight, weight, weight, weight};
 }
 
-// Adds the ends of an iris around each of the kPixels neighbours from x on to their sums, for
-// a kernel within the world: row and column prefix sums from rows and columns, both at
-// (x, y) and stride doubles a row.
-template <int32_t kPixels>
+// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their
+// sums, the kernel within the world's ends: row and column prefix sums from rows and columns,
+// both at (x, 0) and stride doubles a row. kClipRows leaves out the rows beyond the height.
+template <bool kClipRows, int32_t kPixels>
 [[gnu::always_inline]] inline void AddEnds(const ShapeIris& iris, const double* rows,
-                                           const double* columns, ptrdiff_t stride, Sums4* sum) {
+                                           const double* columns, ptrdiff_t stride, int32_t y,
+                                           int32_t height, Sums4* sum) {
     Sums4 kept[kPixels];
     for (int32_t p = 0; p < kPixels; ++p)
         kept[p] = sum[p];
     const ShapeEdge* e = iris.edges;
     const ShapeEdge* single = e + iris.singleCount;
     for (; e != single; ++e) {
-        const double* a = rows + stride * e->y + 4 * ptrdiff_t(e->x);
+        const int32_t yy = y + e->y;
+        if (kClipRows && (yy < 0 || yy >= height)) continue;
+        const double* a = rows + stride * yy + 4 * ptrdiff_t(e->x);
         for (int32_t p = 0; p < kPixels; ++p)
             AddEnd(a + 4 * p, e->weight, kept + p);
     }
     for (const ShapeEdge* last = iris.edges + iris.edgeCount; e != last; ++e) {
-        const double* a = columns + stride * e->y + 4 * ptrdiff_t(e->x);
-        const double* b = a + stride * e->rows;
+        int32_t y0 = y + e->y, y1 = y0 + e->rows;
+        if constexpr (kClipRows) {
+            y0 = std::max(y0, 0), y1 = std::min(y1, height);
+            if (y0 >= y1) continue;
+        }
+        const double* a = columns + stride * y0 + 4 * ptrdiff_t(e->x);
+        const double* b = columns + stride * y1 + 4 * ptrdiff_t(e->x);
         for (int32_t p = 0; p < kPixels; ++p)
             AddRun(a + 4 * p, b + 4 * p, e->weight, kept + p);
     }
@@ -198,25 +206,41 @@ template <Reach kReach, int32_t kPixels>
 // only its place decides, picks the order. Near the world's edges the terms go row by row and
 // run by run: the neighbours go through each kernel row together, so that the row's sums are
 // read once from memory for all of them, and four at a time, because one pixel's additions
-// wait on each other while the others' run alongside. Within the world, given sums down the
-// columns, the kernel's ends are read instead, each column of ends once for all its rows.
+// wait on each other while the others' run alongside. Within the world's ends, given sums
+// down the columns, the kernel's ends are read instead, each column of ends once for all its
+// rows.
 template <Reach kReach, int32_t kTogether, class Table>
 [[gnu::always_inline]] inline void AddKernel(const ShapeIris& iris, const Table& table,
                                              const double* columns, int32_t x, int32_t y,
                                              int32_t count, int32_t width, int32_t height,
                                              Sums4* sum, double* weight) {
-    if (kReach == Reach::kWithin && columns) {
+    const ShapeKernel& kernel = *iris.kernel;
+    if (kReach != Reach::kBeyondEnds && columns) {
+        constexpr bool kClipRows = kReach == Reach::kBeyondRows;
+        if constexpr (kClipRows) {
+            // Every pixel reads the same rows: one weight for all, summed as run by run.
+            double read = 0;
+            const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+            for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
+                if (y + row->y < 0 || y + row->y >= height) continue;
+                const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
+                for (int32_t k = 0; k < row->segmentCount; ++k, ++s)
+                    read += static_cast<double>(s->weight) * s->length;
+            }
+            for (int32_t p = 0; p < count; ++p)
+                weight[p] += read;
+        }
         const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
-        const double* rows = &table.Row(y)[x].alpha;
-        columns += stride * y + 4 * ptrdiff_t(x);
+        const double* rows = &table.Row(0)[x].alpha;
+        columns += 4 * ptrdiff_t(x);
         int32_t p = 0;
         for (; p + kTogether <= count; p += kTogether)
-            AddEnds<kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, sum + p);
+            AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
+                                          sum + p);
         for (; p < count; ++p)
-            AddEnds<1>(iris, rows + 4 * p, columns + 4 * p, stride, sum + p);
+            AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
         return;
     }
-    const ShapeKernel& kernel = *iris.kernel;
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
