@@ -19,7 +19,8 @@ class SY_DOFBufferX;
 
 // Use: New; draw the layer into Target(); PrepareTables; Sample from any number of threads;
 // destroy. Iris shapes below 3 blur with a box over a summed-area table; the others walk the
-// iris kernels over per-row sums, with highlights boosted.
+// iris kernels over per-row sums (at 8 and 16 bits also over sums down the columns), with
+// highlights boosted.
 class SY_DOFBuffer : public PF_PixelContainer<SY_DOFBufferX<PF_Pixel8>, SY_DOFBufferX<PF_Pixel16>,
                                               SY_DOFBufferX<PF_PixelFloat>> {
 public:
