@@ -66,6 +66,16 @@ void SY_DOFBufferX<P>::PrepareTables() {
             rowTable = std::make_unique<PF_HorizontalSumTable<P>>(
                 world, 0, 0, 0.0, highlightGain, highlightThreshold, highlightSaturation,
                 irisAspect, irisRotation, false, nullptr, false);
+            if constexpr (PF_PixelTraits<P>::kIsFloat) return;
+            const size_t stride = 4 * (size_t(width) + 1);
+            columnSums.assign(stride * (size_t(height) + 1), 0.0);
+            for (int32_t y = 0; y < height; ++y) {
+                const double* row = &rowTable->Row(y)[0].alpha;
+                const double* above = columnSums.data() + stride * size_t(y);
+                double* below = columnSums.data() + stride * (size_t(y) + 1);
+                for (size_t i = 0; i < stride; ++i)
+                    below[i] = above[i] + row[i];
+            }
         }
     });
 }
@@ -90,7 +100,7 @@ void SY_DOFBufferX<P>::Sample(float x, float y, float radius, P* out) const {
         PF_SummedAreaTable_SampleAA(width, height, areaTable->DoubleSums(), x0, y0, x1, y1, out);
         return;
     }
-    const ShapeKernel* kernel = KernelFor(radius);
+    const ShapeIris* kernel = KernelFor(radius);
     if (!kernel) return drawn();
     SampleKernel(*kernel, ix, iy, 1, out);
 }
@@ -109,6 +119,47 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
     __builtin_memcpy(&from, a, sizeof from);
     __builtin_memcpy(&to, b, sizeof to);
     *sum += (to - from) * Sums4{weight, weight, weight, weight};
+}
+
+// Adds weight × a for the prefix sum a of one row to sum.
+[[gnu::always_inline]] inline void AddEnd(const double* a, double weight, Sums4* sum) {
+    Sums4 at;
+    __builtin_memcpy(&at, a, sizeof at);
+    *sum += at * Sums4{weight, weight, weight, weight};
+}
+
+// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their
+// sums, the kernel within the world's ends: row and column prefix sums from rows and columns,
+// both at (x, 0) and stride doubles a row. kClipRows leaves out the rows beyond the height.
+template <bool kClipRows, int32_t kPixels>
+[[gnu::always_inline]] inline void AddEnds(const ShapeIris& iris, const double* rows,
+                                           const double* columns, ptrdiff_t stride, int32_t y,
+                                           int32_t height, Sums4* sum) {
+    Sums4 kept[kPixels];
+    for (int32_t p = 0; p < kPixels; ++p)
+        kept[p] = sum[p];
+    const ShapeEdge* e = iris.edges;
+    const ShapeEdge* single = e + iris.singleCount;
+    for (; e != single; ++e) {
+        const int32_t yy = y + e->y;
+        if (kClipRows && (yy < 0 || yy >= height)) continue;
+        const double* a = rows + stride * yy + 4 * ptrdiff_t(e->x);
+        for (int32_t p = 0; p < kPixels; ++p)
+            AddEnd(a + 4 * p, e->weight, kept + p);
+    }
+    for (const ShapeEdge* last = iris.edges + iris.edgeCount; e != last; ++e) {
+        int32_t y0 = y + e->y, y1 = y0 + e->rows;
+        if constexpr (kClipRows) {
+            y0 = std::max(y0, 0), y1 = std::min(y1, height);
+            if (y0 >= y1) continue;
+        }
+        const double* a = columns + stride * y0 + 4 * ptrdiff_t(e->x);
+        const double* b = columns + stride * y1 + 4 * ptrdiff_t(e->x);
+        for (int32_t p = 0; p < kPixels; ++p)
+            AddRun(a + 4 * p, b + 4 * p, e->weight, kept + p);
+    }
+    for (int32_t p = 0; p < kPixels; ++p)
+        sum[p] = kept[p];
 }
 
 // How far the kernels around a group of pixels reach: within the world; beyond its top or
@@ -151,14 +202,45 @@ template <Reach kReach, int32_t kPixels>
 
 // Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
 // width × height world to sum[p], as far as kReach says. Every pixel takes its terms in the
-// same order, row by row and run by run, whatever its neighbours and its reach, so that its sum
-// is the same to the bit. The neighbours go through each kernel row together, so that the
-// row's sums are read once from memory for all of them, and four at a time, because one
-// pixel's additions wait on each other while the others' run alongside.
+// same order whatever its neighbours, so that its sum is the same to the bit; its reach, which
+// only its place decides, picks the order. Near the world's edges the terms go row by row and
+// run by run: the neighbours go through each kernel row together, so that the row's sums are
+// read once from memory for all of them, and four at a time, because one pixel's additions
+// wait on each other while the others' run alongside. Within the world's ends, given sums
+// down the columns, the kernel's ends are read instead, each column of ends once for all its
+// rows.
 template <Reach kReach, int32_t kTogether, class Table>
-[[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const Table& table,
-                                             int32_t x, int32_t y, int32_t count, int32_t width,
-                                             int32_t height, Sums4* sum, double* weight) {
+[[gnu::always_inline]] inline void AddKernel(const ShapeIris& iris, const Table& table,
+                                             const double* columns, int32_t x, int32_t y,
+                                             int32_t count, int32_t width, int32_t height,
+                                             Sums4* sum, double* weight) {
+    const ShapeKernel& kernel = *iris.kernel;
+    if (kReach != Reach::kBeyondEnds && columns) {
+        constexpr bool kClipRows = kReach == Reach::kBeyondRows;
+        if constexpr (kClipRows) {
+            // Every pixel reads the same rows: one weight for all, summed as run by run.
+            double read = 0;
+            const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+            for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
+                if (y + row->y < 0 || y + row->y >= height) continue;
+                const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
+                for (int32_t k = 0; k < row->segmentCount; ++k, ++s)
+                    read += static_cast<double>(s->weight) * s->length;
+            }
+            for (int32_t p = 0; p < count; ++p)
+                weight[p] += read;
+        }
+        const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
+        const double* rows = &table.Row(0)[x].alpha;
+        columns += 4 * ptrdiff_t(x);
+        int32_t p = 0;
+        for (; p + kTogether <= count; p += kTogether)
+            AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
+                                          sum + p);
+        for (; p < count; ++p)
+            AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
+        return;
+    }
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
@@ -177,22 +259,24 @@ template <Reach kReach, int32_t kTogether, class Table>
 
 // AddKernel through the wide registers, for processors that have them.
 template <Reach kReach, class Table>
-[[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const Table& table, int32_t x,
-                                          int32_t y, int32_t count, int32_t width, int32_t height,
-                                          Sums4* sum, double* weight) {
+[[gnu::target("avx")]] void AddKernelWide(const ShapeIris& iris, const Table& table,
+                                          const double* columns, int32_t x, int32_t y,
+                                          int32_t count, int32_t width, int32_t height, Sums4* sum,
+                                          double* weight) {
     // Sixteen wide registers hold eight pixels' sums and what they add.
-    AddKernel<kReach, 8>(kernel, table, x, y, count, width, height, sum, weight);
+    AddKernel<kReach, 8>(iris, table, columns, x, y, count, width, height, sum, weight);
 }
 
 template <Reach kReach, class Table>
-void AddKernelOnAny(const ShapeKernel& kernel, const Table& table, int32_t x, int32_t y,
-                    int32_t count, int32_t width, int32_t height, Sums4* sum, double* weight) {
+void AddKernelOnAny(const ShapeIris& iris, const Table& table, const double* columns, int32_t x,
+                    int32_t y, int32_t count, int32_t width, int32_t height, Sums4* sum,
+                    double* weight) {
     static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
     if (wide) {
-        AddKernelWide<kReach>(kernel, table, x, y, count, width, height, sum, weight);
+        AddKernelWide<kReach>(iris, table, columns, x, y, count, width, height, sum, weight);
     } else {
-        AddKernel<kReach, 4>(kernel, table, x, y, count, width, height, sum, weight);
+        AddKernel<kReach, 4>(iris, table, columns, x, y, count, width, height, sum, weight);
     }
 }
 
@@ -208,8 +292,9 @@ void StoreSum(const Sums4& sum, double n, P* out) {
 }  // namespace
 
 template <class P>
-void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count,
+void SY_DOFBufferX<P>::SampleKernel(const ShapeIris& iris, int32_t x, int32_t y, int32_t count,
                                     P* out) const {
+    const ShapeKernel& kernel = *iris.kernel;
     // Pixels k below left reach beyond the world's left end, from right on beyond its right;
     // those between, beyond its rows or not, for all of them alike.
     const int32_t* e = kernel.Extent();
@@ -219,16 +304,18 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeKernel& kernel, int32_t x, int32_
     Sums4 sum[kSpanPixels] = {};
     double weight[kSpanPixels] = {};
     const Table& table = *rowTable;
-    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x, y, left, width, height, sum, weight);
+    const double* columns = columnSums.empty() ? nullptr : columnSums.data();
+    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x, y, left, width, height, sum,
+                                       weight);
     if (rowsWithin) {
-        AddKernelOnAny<Reach::kWithin>(kernel, table, x + left, y, right - left, width, height,
-                                       sum + left, nullptr);
+        AddKernelOnAny<Reach::kWithin>(iris, table, columns, x + left, y, right - left, width,
+                                       height, sum + left, nullptr);
     } else {
-        AddKernelOnAny<Reach::kBeyondRows>(kernel, table, x + left, y, right - left, width, height,
-                                           sum + left, weight + left);
+        AddKernelOnAny<Reach::kBeyondRows>(iris, table, columns, x + left, y, right - left, width,
+                                           height, sum + left, weight + left);
     }
-    AddKernelOnAny<Reach::kBeyondEnds>(kernel, table, x + right, y, count - right, width, height,
-                                       sum + right, weight + right);
+    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x + right, y, count - right, width,
+                                       height, sum + right, weight + right);
     const double n = kernel.Normalization();
     for (int32_t k = 0; k < count; ++k) {
         if (rowsWithin && k >= left && k < right) {
@@ -251,7 +338,7 @@ void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count
     };
     const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
     for (int32_t k = 0; k < count;) {
-        const ShapeKernel* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
+        const ShapeIris* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
         if (!kernel) {
             Sample(at(k), y, radius[k], out + k);
             ++k;

@@ -19,7 +19,8 @@ class SY_DOFBufferX;
 
 // Use: New; draw the layer into Target(); PrepareTables; Sample from any number of threads;
 // destroy. Iris shapes below 3 blur with a box over a summed-area table; the others walk the
-// iris kernels over per-row sums, with highlights boosted.
+// iris kernels over per-row sums (at 8 and 16 bits also over sums down the columns), with
+// highlights boosted.
 class SY_DOFBuffer : public PF_PixelContainer<SY_DOFBufferX<PF_Pixel8>, SY_DOFBufferX<PF_Pixel16>,
                                               SY_DOFBufferX<PF_PixelFloat>> {
 public:
@@ -82,15 +83,21 @@ public:
                     P* out) const;
 
 private:
-    const ShapeKernel* KernelFor(float radius) const {
+    const ShapeIris* KernelFor(float radius) const {
         return kernels ? kernels->ForShare(std::min(1.0f, radius / model.maxRadius)) : nullptr;
     }
     // The count neighbours from (x, y) on (in the world's pixels), blurred through kernel.
-    void SampleKernel(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t count, P* out) const;
+    void SampleKernel(const ShapeIris& iris, int32_t x, int32_t y, int32_t count, P* out) const;
 
     PF_WorldX<P> world;
     std::unique_ptr<PF_SummedAreaTable> areaTable;
     using Table = PF_HorizontalSumTable<P>;
     std::unique_ptr<Table> rowTable;
+    // Sums of rowTable down its columns: row y, laid out as rowTable's, sums its rows [0, y).
+    // Empty only for float layers: reading a kernel by its ends takes differences of sums far
+    // larger than the kernel's, which leaves traces of rounding where the layer is clear, and
+    // float colour, divided by such an alpha, would show them; 8- and 16-bit levels round them
+    // away.
+    SY_AccountedVector<double> columnSums;
     std::shared_ptr<const ShapeKernelArray> kernels;
 };

@@ -3,9 +3,69 @@
 #include <algorithm>
 #include <cmath>
 #include <new>
+#include <utility>
+#include <vector>
 
 #include "renderer/scene/dof_model.h"
 #include "u_memory.h"
+
+namespace {
+
+// What finding a kernel's ends works in, kept from kernel to kernel.
+struct EdgeScratch {
+    std::vector<ShapeEdge> found;
+    std::vector<size_t> above, here;               // indices in found of the ends reaching a row
+    std::vector<std::pair<int32_t, double>> ends;  // one row's, left to right
+};
+
+// Appends the kernel's ends to edges, ends that continue the row above at the same column and
+// weight joined to it, the ends over one row first, and says how many there are of those.
+int32_t AppendEdges(const ShapeKernel& kernel, EdgeScratch* scratch,
+                    SY_AccountedVector<ShapeEdge>* edges) {
+    auto& [found, above, here, ends] = *scratch;
+    found.clear();
+    above.clear();
+    for (int32_t r = 0; r < kernel.RowCount(); ++r) {
+        const ShapeKernel::Row& row = kernel.Rows()[r];
+        here.clear();
+        auto add = [&](int32_t x, double weight) {
+            auto joined = std::find_if(above.begin(), above.end(), [&](size_t i) {
+                const ShapeEdge& e = found[i];
+                return e.x == x && e.weight == weight && e.y + e.rows == row.y;
+            });
+            if (joined != above.end()) {
+                ++found[*joined].rows;
+                here.push_back(*joined);
+                above.erase(joined);  // one end of this row per end above
+            } else {
+                found.push_back({x, row.y, 1, weight});
+                here.push_back(found.size() - 1);
+            }
+        };
+        // Runs that meet (a rim pixel beside the inside) share one end, weighing the step.
+        ends.clear();
+        const ShapeKernel::Segment* s = kernel.Segments() + row.firstSegment;
+        for (int32_t k = 0; k < row.segmentCount; ++k, ++s) {
+            const double weight = s->weight;
+            if (!ends.empty() && ends.back().first == s->x) {
+                ends.back().second -= weight;
+            } else {
+                ends.emplace_back(s->x, -weight);
+            }
+            ends.emplace_back(s->x + s->length, weight);
+        }
+        for (const auto& [x, weight] : ends) {
+            if (weight != 0) add(x, weight);
+        }
+        std::swap(above, here);
+    }
+    auto columns = std::stable_partition(found.begin(), found.end(),
+                                         [](const ShapeEdge& e) { return e.rows == 1; });
+    edges->insert(edges->end(), found.begin(), found.end());
+    return static_cast<int32_t>(columns - found.begin());
+}
+
+}  // namespace
 
 std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc& dof) {
     if (dof.irisShape < 3) return nullptr;
@@ -15,14 +75,24 @@ std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc
             std::allocate_shared<ShapeKernelArray>(SY_AccountedAllocator<ShapeKernelArray>());
         array->count = static_cast<int32_t>(8 * maxRadius);
         array->step = array->count ? 1.0f / static_cast<float>(array->count) : 0.0f;
-        array->kernelList.reserve(static_cast<size_t>(array->count) + 1);
+        array->irisList.reserve(static_cast<size_t>(array->count) + 1);
+        std::vector<size_t> firstEdge;
+        EdgeScratch scratch;
         for (int32_t i = 0; i <= array->count; ++i) {
             double t = array->count ? static_cast<double>(i) / array->count : 0.0;
-            array->kernelList.push_back(std::allocate_shared<const ShapeKernel>(
+            ShapeIris iris;
+            iris.kernel = std::allocate_shared<const ShapeKernel>(
                 SY_AccountedAllocator<ShapeKernel>(), static_cast<int32_t>(dof.irisShape),
                 dof.irisRoundness, t * maxRadius, dof.irisAspect, SY_DOFXScale(dof),
-                dof.irisRotation, dof.diffractionFringe));
+                dof.irisRotation, dof.diffractionFringe);
+            firstEdge.push_back(array->edgeList.size());
+            iris.singleCount = AppendEdges(*iris.kernel, &scratch, &array->edgeList);
+            iris.edgeCount = static_cast<int32_t>(array->edgeList.size() - firstEdge.back());
+            array->irisList.push_back(std::move(iris));
         }
+        // The list has stopped growing: its ends stay where they are.
+        for (size_t i = 0; i < firstEdge.size(); ++i)
+            array->irisList[i].edges = array->edgeList.data() + firstEdge[i];
         return array;
     } catch (const std::bad_alloc&) {
         throw kU_ErrOutOfMemory;  // a kernel's rows could not be had

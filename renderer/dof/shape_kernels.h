@@ -10,20 +10,40 @@
 #include "renderer/scene/accounted_allocator.h"
 #include "renderer/scene/scene_desc.h"
 
+// One end of the kernel's runs over the rows y to y + rows − 1 alike: the run sum of a row is
+// its prefix sum at the end less that at the start, so weight is the run's weight at an end
+// and its negative at a start. Ends that stay at one column over rows (the iris' upright sides,
+// the middle of a polygon) are read once for all those rows from sums down the columns.
+struct ShapeEdge {
+    int32_t x;
+    int32_t y;
+    int32_t rows;
+    double weight;
+};
+
+// A kernel and its ends: the ends over single rows first, then the columns.
+struct ShapeIris {
+    std::shared_ptr<const ShapeKernel> kernel;
+    const ShapeEdge* edges = nullptr;
+    int32_t singleCount = 0;  // edges[0, singleCount) span one row each
+    int32_t edgeCount = 0;
+};
+
 // Kernel i has the radius maxRadius × i / count: one per eighth of a pixel from 0 to the
 // largest radius the blur level allows.
 struct ShapeKernelArray {
     int32_t stepsPerPixel = 8;
     int32_t count = 0;  // the array holds count + 1 kernels
-    SY_AccountedVector<std::shared_ptr<const ShapeKernel>> kernelList;
-    float step = 0;  // 1 / count, or 0 when count is 0
+    SY_AccountedVector<ShapeIris> irisList;
+    SY_AccountedVector<ShapeEdge> edgeList;  // every kernel's ends, irisList's point into it
+    float step = 0;                          // 1 / count, or 0 when count is 0
 
     // The kernel for a radius that is the share s (0..1) of the largest; null below one step,
     // where the blur is too small to show.
-    const ShapeKernel* ForShare(float s) const {
+    const ShapeIris* ForShare(float s) const {
         if (count == 0 || s < step) return nullptr;
         auto index = static_cast<int32_t>(std::max(s, step) * static_cast<float>(count));
-        return kernelList[static_cast<size_t>(std::min(index, count))].get();
+        return &irisList[static_cast<size_t>(std::min(index, count))];
     }
 };
 
