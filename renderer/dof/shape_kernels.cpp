@@ -22,7 +22,11 @@ struct EdgeScratch {
 // weight joined to it, the ends over one row first, and says how many there are of those.
 int32_t AppendEdges(const ShapeKernel& kernel, EdgeScratch* scratch,
                     SY_AccountedVector<ShapeEdge>* edges) {
-    auto& [found, above, here, ends] = *scratch;
+    // Plain references, not structured bindings, so that the lambdas below may capture them.
+    std::vector<ShapeEdge>& found = scratch->found;
+    std::vector<size_t>& above = scratch->above;
+    std::vector<size_t>& here = scratch->here;
+    std::vector<std::pair<int32_t, double>>& ends = scratch->ends;
     found.clear();
     above.clear();
     for (int32_t r = 0; r < kernel.RowCount(); ++r) {
