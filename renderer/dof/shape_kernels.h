@@ -42,7 +42,7 @@ struct ShapeKernelArray {
     // where the blur is too small to show.
     const ShapeIris* ForShare(float s) const {
         if (count == 0 || s < step) return nullptr;
-        auto index = static_cast<int32_t>(std::max(s, step) * static_cast<float>(count));
+        auto index = static_cast<int32_t>(s * static_cast<float>(count));
         return &irisList[static_cast<size_t>(std::min(index, count))];
     }
 };
