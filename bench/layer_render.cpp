@@ -9,14 +9,13 @@
 #include <benchmark/benchmark.h>
 
 #include <algorithm>
-#include <atomic>
 #include <cmath>
 #include <memory>
-#include <thread>
 #include <vector>
 
 #include "card_scene.h"
 #include "renderer/frame/frame_driver.h"
+#include "suites/iterate_suite.h"
 
 #ifdef OSTREL_HAVE_OPENCV
 #include <opencv2/core.hpp>
@@ -35,33 +34,13 @@ using bench::kWidth;
 // depth).
 constexpr int32_t kCards = 20, kTextureSize = 512;
 
-// Items spread over every hardware thread, each thread with a stable index.
-struct AllThreads {
-    static int32_t Count() {
-        return static_cast<int32_t>(std::max(1u, std::thread::hardware_concurrency()));
-    }
-    static int32_t GetThreadCount(int32_t* count) {
-        *count = Count();
-        return 0;
-    }
-    static int32_t Iterate(int32_t count, void* closure, PF_IterateCallback callback) {
-        std::atomic<int32_t> next{0};
-        std::vector<std::thread> threads;
-        for (int32_t t = 0; t < Count(); ++t) {
-            threads.emplace_back([&, t] {
-                for (int32_t i; (i = next.fetch_add(1)) < count;)
-                    callback(closure, t, i);
-            });
-        }
-        for (auto& thread : threads)
-            thread.join();
-        return 0;
-    }
-    static const QNGP_IterateSuite1* Suite() {
-        static const QNGP_IterateSuite1 suite{&GetThreadCount, &Iterate};
-        return &suite;
-    }
-};
+// The threaded runs spread rows with the stand-in host's own iterator, whose pool lives across
+// calls as a host's does.
+int32_t AllThreads() {
+    int32_t count = 1;
+    ostrel::IterateSuite()->GetThreadCount(&count);
+    return count;
+}
 
 // Card k: its centre shows at a point of a 5 × 4 grid over the frame, nearer cards first. The
 // cards are tilted by at most ±26 in depth at their corners; 60 apart they never cross, so the
@@ -109,7 +88,7 @@ struct Scene : bench::CardScene<P> {
 
     void Render(PF_World* destination, bool threaded) {
         SY_RenderFrame(scene, &this->fetcher, &this->progress,
-                       threaded ? AllThreads::Suite() : nullptr, threaded, destination, nullptr);
+                       threaded ? ostrel::IterateSuite() : nullptr, threaded, destination, nullptr);
     }
 };
 
@@ -192,7 +171,7 @@ template <class P>
 void BM_OpenCV(benchmark::State& state) {
     bool threaded = state.range(1) != 0;
     int previousThreads = cv::getNumThreads();
-    cv::setNumThreads(threaded ? AllThreads::Count() : 1);
+    cv::setNumThreads(threaded ? AllThreads() : 1);
     Scene<P> scene(true);
     cv::Mat frame(kHeight, kWidth, CvType<P>(), cv::Scalar::all(0));
     M_Matrix4 worldToScreen = WorldToScreen();
