@@ -133,22 +133,36 @@ void SyncFolder(const std::filesystem::path& folder) {
 
 }  // namespace
 
+PF_World PreparedImage::View() const {
+    const auto rowBytes = static_cast<int32_t>(pixels.size() / static_cast<size_t>(height));
+    return PF_World(width, height, rowBytes, bitDepth, const_cast<uint8_t*>(pixels.data()));
+}
+
 PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path) {
-    Pixels pixels = Convert(world, WriterFor(path.string())->format_name());
-    return {path, world.width, world.height, pixels.type.basetype, std::move(pixels.bytes)};
+    PreparedImage image{path,           WriterFor(path.string())->format_name(),
+                        world.width,    world.height,
+                        world.bitDepth, {}};
+    const size_t rowBytes =
+        static_cast<size_t>(world.width) *
+        PF_DispatchBitDepth(world.bitDepth, []<class P>() { return sizeof(P); });
+    image.pixels.resize(rowBytes * static_cast<size_t>(world.height));
+    for (int32_t y = 0; y < world.height; ++y)
+        std::memcpy(image.pixels.data() + rowBytes * static_cast<size_t>(y), world.Row<char>(y),
+                    rowBytes);
+    return image;
 }
 
 void WritePrepared(const PreparedImage& image) {
     std::string name = image.path.string();
     auto out = WriterFor(name);
-    std::string format = out->format_name();
+    const std::string& format = image.format;
     // Encoded in memory and written by us: image writers may report success from a write the
     // disk refused, and only a whole file is ever renamed into place.
     if (!out->supports("ioproxy"))
         throw HostError(name + ": cannot write images of this kind (" + format +
                         " files cannot be checked before they are kept)");
-    OIIO::TypeDesc type(static_cast<OIIO::TypeDesc::BASETYPE>(image.channelType));
-    OIIO::ImageSpec layout(image.width, image.height, 4, type);
+    Pixels pixels = Convert(image.View(), format);
+    OIIO::ImageSpec layout(image.width, image.height, 4, pixels.type);
     if (format != "openexr") layout.attribute("oiio:UnassociatedAlpha", 1);
     // Frames are written by the hundred: the fastest deflate level without row filters costs
     // some size and saves most of the time a frame spends in the PNG writer.
@@ -159,7 +173,7 @@ void WritePrepared(const PreparedImage& image) {
     std::vector<unsigned char> encoded;
     OIIO::Filesystem::IOVecOutput memory(encoded);
     bool written = out->set_ioproxy(&memory) && out->open(name, layout) &&
-                   out->write_image(type, image.bytes.data());
+                   out->write_image(pixels.type, pixels.bytes.data());
     written = out->close() && written && !out->has_error();
     if (!written) {
         std::string problem = out->geterror();

@@ -10,16 +10,20 @@
 
 namespace ostrel {
 
-// A frame converted for its file, which any thread may then write.
+// A frame copied as the renderer left it, with the kind of file it goes to: any thread may then
+// convert and write it, so that the copy is all the renderer waits for.
 struct PreparedImage {
     std::filesystem::path path;
+    std::string format;  // the writer's name for the file's kind
     int32_t width = 0;
     int32_t height = 0;
-    int channelType = 0;         // the file's channel type, as OpenImageIO names it
-    std::vector<uint8_t> bytes;  // interleaved red, green, blue, alpha
+    int16_t bitDepth = 0;
+    std::vector<uint8_t> pixels;  // the world's pixels, rows packed
+
+    PF_World View() const;
 };
 
-// Converts the world for the file at path (see WriteWorld). Throws HostError naming the file
+// Copies the world for the file at path (see WriteWorld). Throws HostError naming the file
 // when no writer handles its kind.
 PreparedImage PrepareImage(const PF_World& world, const std::filesystem::path& path);
 
