@@ -66,16 +66,28 @@ void SY_DOFBufferX<P>::PrepareTables() {
             rowTable = std::make_unique<PF_HorizontalSumTable<P>>(
                 world, 0, 0, 0.0, highlightGain, highlightThreshold, highlightSaturation,
                 irisAspect, irisRotation, false, nullptr, false);
+            rows = &rowTable->Row(0)[0].alpha;
+            rowStride = 4 * (ptrdiff_t(width) + 1);
             if constexpr (PF_PixelTraits<P>::kIsFloat) return;
-            const size_t stride = 4 * (size_t(width) + 1);
+            const size_t pad = 4 * size_t(kernels ? kernels->reach : 0);
+            const size_t row = 4 * (size_t(width) + 1), stride = row + 2 * pad;
+            paddedRows.assign(stride * size_t(height), 0.0);
             columnSums.assign(stride * (size_t(height) + 1), 0.0);
             for (int32_t y = 0; y < height; ++y) {
-                const double* row = &rowTable->Row(y)[0].alpha;
+                const double* sums = &rowTable->Row(y)[0].alpha;
+                double* padded = paddedRows.data() + stride * size_t(y);
+                std::copy(sums, sums + row, padded + pad);
+                for (size_t i = pad + row; i < stride; i += 4)
+                    std::copy(sums + row - 4, sums + row, padded + i);
                 const double* above = columnSums.data() + stride * size_t(y);
                 double* below = columnSums.data() + stride * (size_t(y) + 1);
                 for (size_t i = 0; i < stride; ++i)
-                    below[i] = above[i] + row[i];
+                    below[i] = above[i] + padded[i];
             }
+            rowTable.reset();
+            rows = paddedRows.data() + pad;
+            columns = columnSums.data() + pad;
+            rowStride = ptrdiff_t(stride);
         }
     });
 }
@@ -129,8 +141,8 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
 }
 
 // Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their
-// sums, the kernel within the world's ends: row and column prefix sums from rows and columns,
-// both at (x, 0) and stride doubles a row. kClipRows leaves out the rows beyond the height.
+// sums: row and column prefix sums from rows and columns, both at (x, 0) and stride doubles a
+// row, wide enough for every end. kClipRows leaves out the rows beyond the height.
 template <bool kClipRows, int32_t kPixels>
 [[gnu::always_inline]] inline void AddEnds(const ShapeIris& iris, const double* rows,
                                            const double* columns, ptrdiff_t stride, int32_t y,
@@ -160,6 +172,48 @@ template <bool kClipRows, int32_t kPixels>
     }
     for (int32_t p = 0; p < kPixels; ++p)
         sum[p] = kept[p];
+}
+
+// Adds the iris' ends around each of the count neighbours (x + p, y) to sum[p], kTogether at a
+// time: one pixel's additions wait on each other while the others' run alongside, and each
+// end's sums are read once from memory for all of them. Every pixel takes its terms in the
+// same order whatever its neighbours, so that its sum is the same to the bit.
+template <bool kClipRows, int32_t kTogether>
+[[gnu::always_inline]] inline void AddKernelEnds(const ShapeIris& iris, const double* rows,
+                                                 const double* columns, ptrdiff_t stride, int32_t x,
+                                                 int32_t y, int32_t count, int32_t height,
+                                                 Sums4* sum) {
+    rows += 4 * ptrdiff_t(x);
+    columns += 4 * ptrdiff_t(x);
+    int32_t p = 0;
+    for (; p + kTogether <= count; p += kTogether)
+        AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
+                                      sum + p);
+    for (; p < count; ++p)
+        AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
+}
+
+// AddKernelEnds through the wide registers, for processors that have them.
+template <bool kClipRows>
+[[gnu::target("avx")]] void AddKernelEndsWide(const ShapeIris& iris, const double* rows,
+                                              const double* columns, ptrdiff_t stride, int32_t x,
+                                              int32_t y, int32_t count, int32_t height,
+                                              Sums4* sum) {
+    // Sixteen wide registers hold eight pixels' sums and what they add.
+    AddKernelEnds<kClipRows, 8>(iris, rows, columns, stride, x, y, count, height, sum);
+}
+
+template <bool kClipRows>
+void AddKernelEndsOnAny(const ShapeIris& iris, const double* rows, const double* columns,
+                        ptrdiff_t stride, int32_t x, int32_t y, int32_t count, int32_t height,
+                        Sums4* sum) {
+    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    if (count <= 0) return;
+    if (wide) {
+        AddKernelEndsWide<kClipRows>(iris, rows, columns, stride, x, y, count, height, sum);
+    } else {
+        AddKernelEnds<kClipRows, 4>(iris, rows, columns, stride, x, y, count, height, sum);
+    }
 }
 
 // How far the kernels around a group of pixels reach: within the world; beyond its top or
@@ -200,53 +254,22 @@ template <Reach kReach, int32_t kPixels>
         sum[p] = kept[p];
 }
 
-// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
-// width × height world to sum[p], as far as kReach says. Every pixel takes its terms in the
-// same order whatever its neighbours, so that its sum is the same to the bit; its reach, which
-// only its place decides, picks the order. Near the world's edges the terms go row by row and
-// run by run: the neighbours go through each kernel row together, so that the row's sums are
-// read once from memory for all of them, and four at a time, because one pixel's additions
-// wait on each other while the others' run alongside. Within the world's ends, given sums
-// down the columns, the kernel's ends are read instead, each column of ends once for all its
-// rows.
-template <Reach kReach, int32_t kTogether, class Table>
-[[gnu::always_inline]] inline void AddKernel(const ShapeIris& iris, const Table& table,
-                                             const double* columns, int32_t x, int32_t y,
-                                             int32_t count, int32_t width, int32_t height,
-                                             Sums4* sum, double* weight) {
-    const ShapeKernel& kernel = *iris.kernel;
-    if (kReach != Reach::kBeyondEnds && columns) {
-        constexpr bool kClipRows = kReach == Reach::kBeyondRows;
-        if constexpr (kClipRows) {
-            // Every pixel reads the same rows: one weight for all, summed as run by run.
-            double read = 0;
-            const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
-            for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
-                if (y + row->y < 0 || y + row->y >= height) continue;
-                const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
-                for (int32_t k = 0; k < row->segmentCount; ++k, ++s)
-                    read += static_cast<double>(s->weight) * s->length;
-            }
-            for (int32_t p = 0; p < count; ++p)
-                weight[p] += read;
-        }
-        const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
-        const double* rows = &table.Row(0)[x].alpha;
-        columns += 4 * ptrdiff_t(x);
-        int32_t p = 0;
-        for (; p + kTogether <= count; p += kTogether)
-            AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
-                                          sum + p);
-        for (; p < count; ++p)
-            AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
-        return;
-    }
+// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row prefix
+// sums of a width × height world, rows stride doubles apart, to sum[p], as far as kReach says.
+// The terms go row by row and run by run, the neighbours through each kernel row together,
+// kTogether at a time, as for the ends. Each pixel's reach, which only its place decides,
+// picks the order of its terms.
+template <Reach kReach, int32_t kTogether>
+[[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const double* rows,
+                                             ptrdiff_t stride, int32_t x, int32_t y, int32_t count,
+                                             int32_t width, int32_t height, Sums4* sum,
+                                             double* weight) {
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
         if (kReach != Reach::kWithin && (yy < 0 || yy >= height)) continue;
-        const double* sums = &table.Row(yy)[0].alpha;
+        const double* sums = rows + stride * yy;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
         const ShapeKernel::Segment* last = s + row->segmentCount;
         int32_t p = 0;
@@ -258,26 +281,42 @@ template <Reach kReach, int32_t kTogether, class Table>
 }
 
 // AddKernel through the wide registers, for processors that have them.
-template <Reach kReach, class Table>
-[[gnu::target("avx")]] void AddKernelWide(const ShapeIris& iris, const Table& table,
-                                          const double* columns, int32_t x, int32_t y,
-                                          int32_t count, int32_t width, int32_t height, Sums4* sum,
+template <Reach kReach>
+[[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const double* rows,
+                                          ptrdiff_t stride, int32_t x, int32_t y, int32_t count,
+                                          int32_t width, int32_t height, Sums4* sum,
                                           double* weight) {
-    // Sixteen wide registers hold eight pixels' sums and what they add.
-    AddKernel<kReach, 8>(iris, table, columns, x, y, count, width, height, sum, weight);
+    AddKernel<kReach, 8>(kernel, rows, stride, x, y, count, width, height, sum, weight);
 }
 
-template <Reach kReach, class Table>
-void AddKernelOnAny(const ShapeIris& iris, const Table& table, const double* columns, int32_t x,
+template <Reach kReach>
+void AddKernelOnAny(const ShapeKernel& kernel, const double* rows, ptrdiff_t stride, int32_t x,
                     int32_t y, int32_t count, int32_t width, int32_t height, Sums4* sum,
                     double* weight) {
     static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
     if (wide) {
-        AddKernelWide<kReach>(iris, table, columns, x, y, count, width, height, sum, weight);
+        AddKernelWide<kReach>(kernel, rows, stride, x, y, count, width, height, sum, weight);
     } else {
-        AddKernel<kReach, 4>(iris, table, columns, x, y, count, width, height, sum, weight);
+        AddKernel<kReach, 4>(kernel, rows, stride, x, y, count, width, height, sum, weight);
     }
+}
+
+// The weight of the pixels of a width × height world that the kernel around (x, y) reads, added
+// up as the row-by-row reading adds it.
+double WeightRead(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t width, int32_t height) {
+    double weight = 0;
+    const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+    for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
+        if (y + row->y < 0 || y + row->y >= height) continue;
+        const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
+        for (int32_t k = 0; k < row->segmentCount; ++k, ++s) {
+            const int32_t x0 = std::clamp(x + s->x, 0, width);
+            const int32_t x1 = std::clamp(x + s->x + s->length, 0, width);
+            weight += static_cast<double>(s->weight) * (x1 - x0);
+        }
+    }
+    return weight;
 }
 
 // Stores the kernel sum scaled by n (one over the weight read) as a pixel.
@@ -303,27 +342,50 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeIris& iris, int32_t x, int32_t y,
     const bool rowsWithin = y + e[1] >= 0 && y + e[3] < height;
     Sums4 sum[kSpanPixels] = {};
     double weight[kSpanPixels] = {};
-    const Table& table = *rowTable;
-    const double* columns = columnSums.empty() ? nullptr : columnSums.data();
-    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x, y, left, width, height, sum,
-                                       weight);
-    if (rowsWithin) {
-        AddKernelOnAny<Reach::kWithin>(iris, table, columns, x + left, y, right - left, width,
-                                       height, sum + left, nullptr);
+    if (columns) {
+        // The widened rows hold every end of a pixel within the world's ends; the pixels
+        // beyond them go row by row.
+        const int32_t first = std::clamp(-x, 0, count), last = std::clamp(width - x, first, count);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x, y, first, width, height, sum,
+                                           weight);
+        if (rowsWithin) {
+            AddKernelEndsOnAny<false>(iris, rows, columns, rowStride, x + first, y, last - first,
+                                      height, sum + first);
+        } else {
+            AddKernelEndsOnAny<true>(iris, rows, columns, rowStride, x + first, y, last - first,
+                                     height, sum + first);
+        }
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x + last, y, count - last,
+                                           width, height, sum + last, weight + last);
+        if (averagesWithin) {
+            for (int32_t k = first; k < last; ++k) {
+                if (!rowsWithin || k < left || k >= right)
+                    weight[k] = WeightRead(kernel, x + k, y, width, height);
+            }
+        }
     } else {
-        AddKernelOnAny<Reach::kBeyondRows>(iris, table, columns, x + left, y, right - left, width,
-                                           height, sum + left, weight + left);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x, y, left, width, height, sum,
+                                           weight);
+        if (rowsWithin) {
+            AddKernelOnAny<Reach::kWithin>(kernel, rows, rowStride, x + left, y, right - left,
+                                           width, height, sum + left, nullptr);
+        } else {
+            AddKernelOnAny<Reach::kBeyondRows>(kernel, rows, rowStride, x + left, y, right - left,
+                                               width, height, sum + left, weight + left);
+        }
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x + right, y, count - right,
+                                           width, height, sum + right, weight + right);
     }
-    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x + right, y, count - right, width,
-                                       height, sum + right, weight + right);
+    // A kernel that reads nothing sums to zero, which stores clear; only an average within the
+    // world needs the weight read.
     const double n = kernel.Normalization();
     for (int32_t k = 0; k < count; ++k) {
-        if (rowsWithin && k >= left && k < right) {
+        if (!averagesWithin || (rowsWithin && k >= left && k < right)) {
             StoreSum(sum[k], n, out + k);
         } else if (!(weight[k] > 0)) {
             out[k] = P{};
         } else {
-            StoreSum(sum[k], averagesWithin ? 1 / weight[k] : n, out + k);
+            StoreSum(sum[k], 1 / weight[k], out + k);
         }
     }
 }
@@ -338,7 +400,7 @@ void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count
     };
     const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
     for (int32_t k = 0; k < count;) {
-        const ShapeIris* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
+        const ShapeIris* kernel = rows ? KernelFor(radius[k]) : nullptr;
         if (!kernel) {
             Sample(at(k), y, radius[k], out + k);
             ++k;

@@ -92,6 +92,8 @@ std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc
             firstEdge.push_back(array->edgeList.size());
             iris.singleCount = AppendEdges(*iris.kernel, &scratch, &array->edgeList);
             iris.edgeCount = static_cast<int32_t>(array->edgeList.size() - firstEdge.back());
+            const int32_t* e = iris.kernel->Extent();
+            array->reach = std::max({array->reach, -e[0], e[2] + 1});
             array->irisList.push_back(std::move(iris));
         }
         // The list has stopped growing: its ends stay where they are.
