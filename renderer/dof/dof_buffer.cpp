@@ -66,28 +66,16 @@ void SY_DOFBufferX<P>::PrepareTables() {
             rowTable = std::make_unique<PF_HorizontalSumTable<P>>(
                 world, 0, 0, 0.0, highlightGain, highlightThreshold, highlightSaturation,
                 irisAspect, irisRotation, false, nullptr, false);
-            rows = &rowTable->Row(0)[0].alpha;
-            rowStride = 4 * (ptrdiff_t(width) + 1);
             if constexpr (PF_PixelTraits<P>::kIsFloat) return;
-            const size_t pad = 4 * size_t(kernels ? kernels->reach : 0);
-            const size_t row = 4 * (size_t(width) + 1), stride = row + 2 * pad;
-            paddedRows.assign(stride * size_t(height), 0.0);
+            const size_t stride = 4 * (size_t(width) + 1);
             columnSums.assign(stride * (size_t(height) + 1), 0.0);
             for (int32_t y = 0; y < height; ++y) {
-                const double* sums = &rowTable->Row(y)[0].alpha;
-                double* padded = paddedRows.data() + stride * size_t(y);
-                std::copy(sums, sums + row, padded + pad);
-                for (size_t i = pad + row; i < stride; i += 4)
-                    std::copy(sums + row - 4, sums + row, padded + i);
+                const double* row = &rowTable->Row(y)[0].alpha;
                 const double* above = columnSums.data() + stride * size_t(y);
                 double* below = columnSums.data() + stride * (size_t(y) + 1);
                 for (size_t i = 0; i < stride; ++i)
-                    below[i] = above[i] + padded[i];
+                    below[i] = above[i] + row[i];
             }
-            rowTable.reset();
-            rows = paddedRows.data() + pad;
-            columns = columnSums.data() + pad;
-            rowStride = ptrdiff_t(stride);
         }
     });
 }
@@ -140,13 +128,25 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
     *sum += at * Sums4{weight, weight, weight, weight};
 }
 
-// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their
-// sums: row and column prefix sums from rows and columns, both at (x, 0) and stride doubles a
-// row, wide enough for every end. kClipRows leaves out the rows beyond the height.
-template <bool kClipRows, int32_t kPixels>
+// How far the kernels around a group of pixels reach: within the world; beyond its top or
+// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
+// it. Beyond the world each pixel sums the weight of the pixels it read.
+enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
+
+// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their sums,
+// as far as kReach says: row and column prefix sums from rows and columns, stride doubles a
+// row, of a width × height world. An end beyond the world's ends reads the end's sums there.
+template <Reach kReach, int32_t kPixels>
 [[gnu::always_inline]] inline void AddEnds(const ShapeIris& iris, const double* rows,
-                                           const double* columns, ptrdiff_t stride, int32_t y,
-                                           int32_t height, Sums4* sum) {
+                                           const double* columns, ptrdiff_t stride, int32_t x,
+                                           int32_t y, int32_t width, int32_t height, Sums4* sum) {
+    constexpr bool kClipRows = kReach != Reach::kWithin;
+    // Where pixel p finds its end at column offset dx in a row.
+    auto at = [&](int32_t dx, int32_t p) {
+        const ptrdiff_t column = ptrdiff_t(x) + dx + p;
+        return 4 *
+               (kReach == Reach::kBeyondEnds ? std::clamp<ptrdiff_t>(column, 0, width) : column);
+    };
     Sums4 kept[kPixels];
     for (int32_t p = 0; p < kPixels; ++p)
         kept[p] = sum[p];
@@ -155,9 +155,9 @@ template <bool kClipRows, int32_t kPixels>
     for (; e != single; ++e) {
         const int32_t yy = y + e->y;
         if (kClipRows && (yy < 0 || yy >= height)) continue;
-        const double* a = rows + stride * yy + 4 * ptrdiff_t(e->x);
+        const double* row = rows + stride * yy;
         for (int32_t p = 0; p < kPixels; ++p)
-            AddEnd(a + 4 * p, e->weight, kept + p);
+            AddEnd(row + at(e->x, p), e->weight, kept + p);
     }
     for (const ShapeEdge* last = iris.edges + iris.edgeCount; e != last; ++e) {
         int32_t y0 = y + e->y, y1 = y0 + e->rows;
@@ -165,10 +165,10 @@ template <bool kClipRows, int32_t kPixels>
             y0 = std::max(y0, 0), y1 = std::min(y1, height);
             if (y0 >= y1) continue;
         }
-        const double* a = columns + stride * y0 + 4 * ptrdiff_t(e->x);
-        const double* b = columns + stride * y1 + 4 * ptrdiff_t(e->x);
+        const double* a = columns + stride * y0;
+        const double* b = columns + stride * y1;
         for (int32_t p = 0; p < kPixels; ++p)
-            AddRun(a + 4 * p, b + 4 * p, e->weight, kept + p);
+            AddRun(a + at(e->x, p), b + at(e->x, p), e->weight, kept + p);
     }
     for (int32_t p = 0; p < kPixels; ++p)
         sum[p] = kept[p];
@@ -178,48 +178,40 @@ template <bool kClipRows, int32_t kPixels>
 // time: one pixel's additions wait on each other while the others' run alongside, and each
 // end's sums are read once from memory for all of them. Every pixel takes its terms in the
 // same order whatever its neighbours, so that its sum is the same to the bit.
-template <bool kClipRows, int32_t kTogether>
+template <Reach kReach, int32_t kTogether>
 [[gnu::always_inline]] inline void AddKernelEnds(const ShapeIris& iris, const double* rows,
                                                  const double* columns, ptrdiff_t stride, int32_t x,
-                                                 int32_t y, int32_t count, int32_t height,
-                                                 Sums4* sum) {
-    rows += 4 * ptrdiff_t(x);
-    columns += 4 * ptrdiff_t(x);
+                                                 int32_t y, int32_t count, int32_t width,
+                                                 int32_t height, Sums4* sum) {
     int32_t p = 0;
     for (; p + kTogether <= count; p += kTogether)
-        AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
-                                      sum + p);
+        AddEnds<kReach, kTogether>(iris, rows, columns, stride, x + p, y, width, height, sum + p);
     for (; p < count; ++p)
-        AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
+        AddEnds<kReach, 1>(iris, rows, columns, stride, x + p, y, width, height, sum + p);
 }
 
 // AddKernelEnds through the wide registers, for processors that have them.
-template <bool kClipRows>
+template <Reach kReach>
 [[gnu::target("avx")]] void AddKernelEndsWide(const ShapeIris& iris, const double* rows,
                                               const double* columns, ptrdiff_t stride, int32_t x,
-                                              int32_t y, int32_t count, int32_t height,
-                                              Sums4* sum) {
+                                              int32_t y, int32_t count, int32_t width,
+                                              int32_t height, Sums4* sum) {
     // Sixteen wide registers hold eight pixels' sums and what they add.
-    AddKernelEnds<kClipRows, 8>(iris, rows, columns, stride, x, y, count, height, sum);
+    AddKernelEnds<kReach, 8>(iris, rows, columns, stride, x, y, count, width, height, sum);
 }
 
-template <bool kClipRows>
+template <Reach kReach>
 void AddKernelEndsOnAny(const ShapeIris& iris, const double* rows, const double* columns,
-                        ptrdiff_t stride, int32_t x, int32_t y, int32_t count, int32_t height,
-                        Sums4* sum) {
+                        ptrdiff_t stride, int32_t x, int32_t y, int32_t count, int32_t width,
+                        int32_t height, Sums4* sum) {
     static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
     if (wide) {
-        AddKernelEndsWide<kClipRows>(iris, rows, columns, stride, x, y, count, height, sum);
+        AddKernelEndsWide<kReach>(iris, rows, columns, stride, x, y, count, width, height, sum);
     } else {
-        AddKernelEnds<kClipRows, 4>(iris, rows, columns, stride, x, y, count, height, sum);
+        AddKernelEnds<kReach, 4>(iris, rows, columns, stride, x, y, count, width, height, sum);
     }
 }
-
-// How far the kernels around a group of pixels reach: within the world; beyond its top or
-// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
-// it. Beyond the world each pixel sums the weight of the pixels it read.
-enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
 
 // Adds one kernel row's runs s to last around each of the kPixels neighbours from x on to
 // their sums, sums being the row's prefix sums of width pixels.
@@ -342,21 +334,29 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeIris& iris, int32_t x, int32_t y,
     const bool rowsWithin = y + e[1] >= 0 && y + e[3] < height;
     Sums4 sum[kSpanPixels] = {};
     double weight[kSpanPixels] = {};
-    if (columns) {
-        // The widened rows hold every end of a pixel within the world's ends; the pixels
-        // beyond them go row by row.
+    const double* rows = &rowTable->Row(0)[0].alpha;
+    const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
+    if (!columnSums.empty()) {
+        // Pixels within the world's ends read the kernel's ends, those that reach beyond them
+        // clamped to them; the pixels beyond go row by row.
+        const double* columns = columnSums.data();
         const int32_t first = std::clamp(-x, 0, count), last = std::clamp(width - x, first, count);
-        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x, y, first, width, height, sum,
+        const int32_t inner = std::clamp(left, first, last), outer = std::clamp(right, inner, last);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x, y, first, width, height, sum,
                                            weight);
+        AddKernelEndsOnAny<Reach::kBeyondEnds>(iris, rows, columns, stride, x + first, y,
+                                               inner - first, width, height, sum + first);
         if (rowsWithin) {
-            AddKernelEndsOnAny<false>(iris, rows, columns, rowStride, x + first, y, last - first,
-                                      height, sum + first);
+            AddKernelEndsOnAny<Reach::kWithin>(iris, rows, columns, stride, x + inner, y,
+                                               outer - inner, width, height, sum + inner);
         } else {
-            AddKernelEndsOnAny<true>(iris, rows, columns, rowStride, x + first, y, last - first,
-                                     height, sum + first);
+            AddKernelEndsOnAny<Reach::kBeyondRows>(iris, rows, columns, stride, x + inner, y,
+                                                   outer - inner, width, height, sum + inner);
         }
-        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x + last, y, count - last,
-                                           width, height, sum + last, weight + last);
+        AddKernelEndsOnAny<Reach::kBeyondEnds>(iris, rows, columns, stride, x + outer, y,
+                                               last - outer, width, height, sum + outer);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x + last, y, count - last, width,
+                                           height, sum + last, weight + last);
         if (averagesWithin) {
             for (int32_t k = first; k < last; ++k) {
                 if (!rowsWithin || k < left || k >= right)
@@ -364,17 +364,17 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeIris& iris, int32_t x, int32_t y,
             }
         }
     } else {
-        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x, y, left, width, height, sum,
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x, y, left, width, height, sum,
                                            weight);
         if (rowsWithin) {
-            AddKernelOnAny<Reach::kWithin>(kernel, rows, rowStride, x + left, y, right - left,
-                                           width, height, sum + left, nullptr);
+            AddKernelOnAny<Reach::kWithin>(kernel, rows, stride, x + left, y, right - left, width,
+                                           height, sum + left, nullptr);
         } else {
-            AddKernelOnAny<Reach::kBeyondRows>(kernel, rows, rowStride, x + left, y, right - left,
+            AddKernelOnAny<Reach::kBeyondRows>(kernel, rows, stride, x + left, y, right - left,
                                                width, height, sum + left, weight + left);
         }
-        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, rowStride, x + right, y, count - right,
-                                           width, height, sum + right, weight + right);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x + right, y, count - right, width,
+                                           height, sum + right, weight + right);
     }
     // A kernel that reads nothing sums to zero, which stores clear; only an average within the
     // world needs the weight read.
@@ -400,7 +400,7 @@ void SY_DOFBufferX<P>::SampleSpan(float x, float y, int32_t first, int32_t count
     };
     const auto iy = static_cast<int32_t>(y - static_cast<float>(originY));
     for (int32_t k = 0; k < count;) {
-        const ShapeIris* kernel = rows ? KernelFor(radius[k]) : nullptr;
+        const ShapeIris* kernel = rowTable ? KernelFor(radius[k]) : nullptr;
         if (!kernel) {
             Sample(at(k), y, radius[k], out + k);
             ++k;

@@ -91,20 +91,13 @@ private:
 
     PF_WorldX<P> world;
     std::unique_ptr<PF_SummedAreaTable> areaTable;
-    std::unique_ptr<PF_HorizontalSumTable<P>> rowTable;
-    // The rows' prefix sums, alpha, red, green, blue for each column from 0 to width: rows[y ×
-    // rowStride + 4x]. Float layers read rowTable's; the others a copy of it widened by the
-    // kernels' reach on either side, zero on the left and the row's whole sum on the right, so
-    // that a kernel reaching beyond the ends reads them as it reads within, by its ends.
-    const double* rows = nullptr;
-    ptrdiff_t rowStride = 0;
-    SY_AccountedVector<double> paddedRows;
-    // Sums of the widened rows down their columns: row y, laid out as they are, sums rows
-    // [0, y). Empty for float layers: reading a kernel by its ends takes differences of sums
-    // far larger than the kernel's, which leaves traces of rounding where the layer is clear,
-    // and float colour, divided by such an alpha, would show them; 8- and 16-bit levels round
-    // them away.
+    using Table = PF_HorizontalSumTable<P>;
+    std::unique_ptr<Table> rowTable;
+    // Sums of rowTable down its columns: row y, laid out as rowTable's, sums its rows [0, y).
+    // Empty only for float layers: reading a kernel by its ends takes differences of sums far
+    // larger than the kernel's, which leaves traces of rounding where the layer is clear, and
+    // float colour, divided by such an alpha, would show them; 8- and 16-bit levels round them
+    // away.
     SY_AccountedVector<double> columnSums;
-    const double* columns = nullptr;  // columnSums at column 0, or null without them
     std::shared_ptr<const ShapeKernelArray> kernels;
 };

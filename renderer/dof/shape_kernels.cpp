@@ -100,8 +100,6 @@ std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc
                 const ShapeKernel::Row& last = kernel.Rows()[kernel.RowCount() - 1];
                 ends += 2 * size_t(last.firstSegment + last.segmentCount);
             }
-            const int32_t* e = kernel.Extent();
-            array->reach = std::max({array->reach, -e[0], e[2] + 1});
             array->irisList.push_back(std::move(iris));
         }
         array->edgeList.reserve(ends);

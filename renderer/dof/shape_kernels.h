@@ -37,7 +37,6 @@ struct ShapeKernelArray {
     SY_AccountedVector<ShapeIris> irisList;
     SY_AccountedVector<ShapeEdge> edgeList;  // every kernel's ends, irisList's point into it
     float step = 0;                          // 1 / count, or 0 when count is 0
-    int32_t reach = 0;  // no kernel has an end further than this many columns from its pixel
 
     // The kernel for a radius that is the share s (0..1) of the largest; null below one step,
     // where the blur is too small to show.
