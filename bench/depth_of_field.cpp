@@ -3,7 +3,7 @@
 // (radius 5 to 40 pixels) on the farthest. Reports the time per frame and per covered pixel,
 // on one thread, for the sharp frame and for the blurred one through the fast rectangle (a box
 // over summed areas) and through a hexagonal and a half-rounded octagonal iris (kernels over
-// row sums); and, when OpenCV is
+// row sums), at 8 bits and in float; and, when OpenCV is
 // there, filter2D with a disc of radius 40 over one flat frame of the same size, as a floor.
 #include <benchmark/benchmark.h>
 
@@ -43,28 +43,31 @@ M_Matrix4 CardPlacement(int32_t k) {
     return m;
 }
 
-struct Scene : bench::CardScene<PF_Pixel8> {
-    Scene() : bench::CardScene<PF_Pixel8>(kCards, kTextureSize, true, 11, &CardPlacement) {}
+template <class P>
+struct Scene : bench::CardScene<P> {
+    Scene() : bench::CardScene<P>(kCards, kTextureSize, true, 11, &CardPlacement) {}
 
     // irisShape 0: no depth of field; 1: the fast rectangle; 6: a hexagon; 8: an octagon
     // with roundness one half.
     void Focus(int32_t irisShape, double largestRadius) {
-        scene.dof.enabled = irisShape != 0;
-        scene.dof.zoom = kDistance;
-        scene.dof.focusDistance = kDepths[0];
-        scene.dof.aperture = kApertureFor40 * largestRadius / 40;
-        scene.dof.blurLevel = 1;
-        scene.dof.irisShape = irisShape;
-        scene.dof.irisRoundness = irisShape == 8 ? 0.5 : 0;
+        SY_CameraDOFDesc& dof = this->scene.dof;
+        dof.enabled = irisShape != 0;
+        dof.zoom = kDistance;
+        dof.focusDistance = kDepths[0];
+        dof.aperture = kApertureFor40 * largestRadius / 40;
+        dof.blurLevel = 1;
+        dof.irisShape = irisShape;
+        dof.irisRoundness = irisShape == 8 ? 0.5 : 0;
     }
 
     void Render(PF_World* destination) {
-        SY_RenderFrame(scene, &fetcher, &progress, nullptr, false, destination, nullptr);
+        SY_RenderFrame(this->scene, &this->fetcher, &this->progress, nullptr, false, destination,
+                       nullptr);
     }
 };
 
 double CoveredPixels() {
-    static const double covered = Scene().CoveredPixels();
+    static const double covered = Scene<PF_Pixel8>().CoveredPixels();
     return covered;
 }
 
@@ -75,11 +78,12 @@ void ReportPerCoveredPixel(benchmark::State& state) {
 }
 
 // Arguments: iris shape (0 sharp, 1 box, 6 hexagon, 8 rounded octagon), largest blur radius
-// in pixels.
+// in pixels. P: the pixels of the cards and the frame.
+template <class P>
 void BM_Frame(benchmark::State& state) {
-    Scene scene;
+    Scene<P> scene;
     scene.Focus(static_cast<int32_t>(state.range(0)), static_cast<double>(state.range(1)));
-    PF_WorldX<PF_Pixel8> frame(kWidth, kHeight);
+    PF_WorldX<P> frame(kWidth, kHeight);
     CoveredPixels();
     for (auto _ : state) {
         scene.Render(&frame);
@@ -97,7 +101,8 @@ void Frames(benchmark::internal::Benchmark* b) {
     b->Unit(benchmark::kMillisecond)->Iterations(3);
 }
 
-BENCHMARK(BM_Frame)->Apply(Frames);
+BENCHMARK(BM_Frame<PF_Pixel8>)->Apply(Frames);
+BENCHMARK(BM_Frame<PF_PixelFloat>)->Apply(Frames);
 
 #ifdef OSTREL_HAVE_OPENCV
 // A disc of the given radius, normalised, filtered over one flat 8-bit RGBA frame of random

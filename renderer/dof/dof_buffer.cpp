@@ -128,13 +128,25 @@ typedef double Sums4 __attribute__((vector_size(32), aligned(8)));
     *sum += at * Sums4{weight, weight, weight, weight};
 }
 
-// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their
-// sums, the kernel within the world's ends: row and column prefix sums from rows and columns,
-// both at (x, 0) and stride doubles a row. kClipRows leaves out the rows beyond the height.
-template <bool kClipRows, int32_t kPixels>
+// How far the kernels around a group of pixels reach: within the world; beyond its top or
+// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
+// it. Beyond the world each pixel sums the weight of the pixels it read.
+enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
+
+// Adds the ends of an iris around each of the kPixels neighbours from (x, y) on to their sums,
+// as far as kReach says: row and column prefix sums from rows and columns, stride doubles a
+// row, of a width × height world. An end beyond the world's ends reads the end's sums there.
+template <Reach kReach, int32_t kPixels>
 [[gnu::always_inline]] inline void AddEnds(const ShapeIris& iris, const double* rows,
-                                           const double* columns, ptrdiff_t stride, int32_t y,
-                                           int32_t height, Sums4* sum) {
+                                           const double* columns, ptrdiff_t stride, int32_t x,
+                                           int32_t y, int32_t width, int32_t height, Sums4* sum) {
+    constexpr bool kClipRows = kReach != Reach::kWithin;
+    // Where pixel p finds its end at column offset dx in a row.
+    auto at = [&](int32_t dx, int32_t p) {
+        const ptrdiff_t column = ptrdiff_t(x) + dx + p;
+        return 4 *
+               (kReach == Reach::kBeyondEnds ? std::clamp<ptrdiff_t>(column, 0, width) : column);
+    };
     Sums4 kept[kPixels];
     for (int32_t p = 0; p < kPixels; ++p)
         kept[p] = sum[p];
@@ -143,9 +155,9 @@ template <bool kClipRows, int32_t kPixels>
     for (; e != single; ++e) {
         const int32_t yy = y + e->y;
         if (kClipRows && (yy < 0 || yy >= height)) continue;
-        const double* a = rows + stride * yy + 4 * ptrdiff_t(e->x);
+        const double* row = rows + stride * yy;
         for (int32_t p = 0; p < kPixels; ++p)
-            AddEnd(a + 4 * p, e->weight, kept + p);
+            AddEnd(row + at(e->x, p), e->weight, kept + p);
     }
     for (const ShapeEdge* last = iris.edges + iris.edgeCount; e != last; ++e) {
         int32_t y0 = y + e->y, y1 = y0 + e->rows;
@@ -153,19 +165,53 @@ template <bool kClipRows, int32_t kPixels>
             y0 = std::max(y0, 0), y1 = std::min(y1, height);
             if (y0 >= y1) continue;
         }
-        const double* a = columns + stride * y0 + 4 * ptrdiff_t(e->x);
-        const double* b = columns + stride * y1 + 4 * ptrdiff_t(e->x);
+        const double* a = columns + stride * y0;
+        const double* b = columns + stride * y1;
         for (int32_t p = 0; p < kPixels; ++p)
-            AddRun(a + 4 * p, b + 4 * p, e->weight, kept + p);
+            AddRun(a + at(e->x, p), b + at(e->x, p), e->weight, kept + p);
     }
     for (int32_t p = 0; p < kPixels; ++p)
         sum[p] = kept[p];
 }
 
-// How far the kernels around a group of pixels reach: within the world; beyond its top or
-// bottom only, whose rows are then left out; or beyond its ends too, which are then kept within
-// it. Beyond the world each pixel sums the weight of the pixels it read.
-enum class Reach { kWithin, kBeyondRows, kBeyondEnds };
+// Adds the iris' ends around each of the count neighbours (x + p, y) to sum[p], kTogether at a
+// time: one pixel's additions wait on each other while the others' run alongside, and each
+// end's sums are read once from memory for all of them. Every pixel takes its terms in the
+// same order whatever its neighbours, so that its sum is the same to the bit.
+template <Reach kReach, int32_t kTogether>
+[[gnu::always_inline]] inline void AddKernelEnds(const ShapeIris& iris, const double* rows,
+                                                 const double* columns, ptrdiff_t stride, int32_t x,
+                                                 int32_t y, int32_t count, int32_t width,
+                                                 int32_t height, Sums4* sum) {
+    int32_t p = 0;
+    for (; p + kTogether <= count; p += kTogether)
+        AddEnds<kReach, kTogether>(iris, rows, columns, stride, x + p, y, width, height, sum + p);
+    for (; p < count; ++p)
+        AddEnds<kReach, 1>(iris, rows, columns, stride, x + p, y, width, height, sum + p);
+}
+
+// AddKernelEnds through the wide registers, for processors that have them.
+template <Reach kReach>
+[[gnu::target("avx")]] void AddKernelEndsWide(const ShapeIris& iris, const double* rows,
+                                              const double* columns, ptrdiff_t stride, int32_t x,
+                                              int32_t y, int32_t count, int32_t width,
+                                              int32_t height, Sums4* sum) {
+    // Sixteen wide registers hold eight pixels' sums and what they add.
+    AddKernelEnds<kReach, 8>(iris, rows, columns, stride, x, y, count, width, height, sum);
+}
+
+template <Reach kReach>
+void AddKernelEndsOnAny(const ShapeIris& iris, const double* rows, const double* columns,
+                        ptrdiff_t stride, int32_t x, int32_t y, int32_t count, int32_t width,
+                        int32_t height, Sums4* sum) {
+    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    if (count <= 0) return;
+    if (wide) {
+        AddKernelEndsWide<kReach>(iris, rows, columns, stride, x, y, count, width, height, sum);
+    } else {
+        AddKernelEnds<kReach, 4>(iris, rows, columns, stride, x, y, count, width, height, sum);
+    }
+}
 
 // Adds one kernel row's runs s to last around each of the kPixels neighbours from x on to
 // their sums, sums being the row's prefix sums of width pixels.
@@ -200,53 +246,22 @@ template <Reach kReach, int32_t kPixels>
         sum[p] = kept[p];
 }
 
-// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row sums of a
-// width × height world to sum[p], as far as kReach says. Every pixel takes its terms in the
-// same order whatever its neighbours, so that its sum is the same to the bit; its reach, which
-// only its place decides, picks the order. Near the world's edges the terms go row by row and
-// run by run: the neighbours go through each kernel row together, so that the row's sums are
-// read once from memory for all of them, and four at a time, because one pixel's additions
-// wait on each other while the others' run alongside. Within the world's ends, given sums
-// down the columns, the kernel's ends are read instead, each column of ends once for all its
-// rows.
-template <Reach kReach, int32_t kTogether, class Table>
-[[gnu::always_inline]] inline void AddKernel(const ShapeIris& iris, const Table& table,
-                                             const double* columns, int32_t x, int32_t y,
-                                             int32_t count, int32_t width, int32_t height,
-                                             Sums4* sum, double* weight) {
-    const ShapeKernel& kernel = *iris.kernel;
-    if (kReach != Reach::kBeyondEnds && columns) {
-        constexpr bool kClipRows = kReach == Reach::kBeyondRows;
-        if constexpr (kClipRows) {
-            // Every pixel reads the same rows: one weight for all, summed as run by run.
-            double read = 0;
-            const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
-            for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
-                if (y + row->y < 0 || y + row->y >= height) continue;
-                const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
-                for (int32_t k = 0; k < row->segmentCount; ++k, ++s)
-                    read += static_cast<double>(s->weight) * s->length;
-            }
-            for (int32_t p = 0; p < count; ++p)
-                weight[p] += read;
-        }
-        const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
-        const double* rows = &table.Row(0)[x].alpha;
-        columns += 4 * ptrdiff_t(x);
-        int32_t p = 0;
-        for (; p + kTogether <= count; p += kTogether)
-            AddEnds<kClipRows, kTogether>(iris, rows + 4 * p, columns + 4 * p, stride, y, height,
-                                          sum + p);
-        for (; p < count; ++p)
-            AddEnds<kClipRows, 1>(iris, rows + 4 * p, columns + 4 * p, stride, y, height, sum + p);
-        return;
-    }
+// Adds the kernel's runs around each of the count neighbours (x + p, y) over the row prefix
+// sums of a width × height world, rows stride doubles apart, to sum[p], as far as kReach says.
+// The terms go row by row and run by run, the neighbours through each kernel row together,
+// kTogether at a time, as for the ends. Each pixel's reach, which only its place decides,
+// picks the order of its terms.
+template <Reach kReach, int32_t kTogether>
+[[gnu::always_inline]] inline void AddKernel(const ShapeKernel& kernel, const double* rows,
+                                             ptrdiff_t stride, int32_t x, int32_t y, int32_t count,
+                                             int32_t width, int32_t height, Sums4* sum,
+                                             double* weight) {
     const ShapeKernel::Segment* segments = kernel.Segments();
     const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
     for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
         const int32_t yy = y + row->y;
         if (kReach != Reach::kWithin && (yy < 0 || yy >= height)) continue;
-        const double* sums = &table.Row(yy)[0].alpha;
+        const double* sums = rows + stride * yy;
         const ShapeKernel::Segment* s = segments + row->firstSegment;
         const ShapeKernel::Segment* last = s + row->segmentCount;
         int32_t p = 0;
@@ -258,26 +273,42 @@ template <Reach kReach, int32_t kTogether, class Table>
 }
 
 // AddKernel through the wide registers, for processors that have them.
-template <Reach kReach, class Table>
-[[gnu::target("avx")]] void AddKernelWide(const ShapeIris& iris, const Table& table,
-                                          const double* columns, int32_t x, int32_t y,
-                                          int32_t count, int32_t width, int32_t height, Sums4* sum,
+template <Reach kReach>
+[[gnu::target("avx")]] void AddKernelWide(const ShapeKernel& kernel, const double* rows,
+                                          ptrdiff_t stride, int32_t x, int32_t y, int32_t count,
+                                          int32_t width, int32_t height, Sums4* sum,
                                           double* weight) {
-    // Sixteen wide registers hold eight pixels' sums and what they add.
-    AddKernel<kReach, 8>(iris, table, columns, x, y, count, width, height, sum, weight);
+    AddKernel<kReach, 8>(kernel, rows, stride, x, y, count, width, height, sum, weight);
 }
 
-template <Reach kReach, class Table>
-void AddKernelOnAny(const ShapeIris& iris, const Table& table, const double* columns, int32_t x,
+template <Reach kReach>
+void AddKernelOnAny(const ShapeKernel& kernel, const double* rows, ptrdiff_t stride, int32_t x,
                     int32_t y, int32_t count, int32_t width, int32_t height, Sums4* sum,
                     double* weight) {
     static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
     if (wide) {
-        AddKernelWide<kReach>(iris, table, columns, x, y, count, width, height, sum, weight);
+        AddKernelWide<kReach>(kernel, rows, stride, x, y, count, width, height, sum, weight);
     } else {
-        AddKernel<kReach, 4>(iris, table, columns, x, y, count, width, height, sum, weight);
+        AddKernel<kReach, 4>(kernel, rows, stride, x, y, count, width, height, sum, weight);
     }
+}
+
+// The weight of the pixels of a width × height world that the kernel around (x, y) reads, added
+// up as the row-by-row reading adds it.
+double WeightRead(const ShapeKernel& kernel, int32_t x, int32_t y, int32_t width, int32_t height) {
+    double weight = 0;
+    const ShapeKernel::Row* end = kernel.Rows() + kernel.RowCount();
+    for (const ShapeKernel::Row* row = kernel.Rows(); row != end; ++row) {
+        if (y + row->y < 0 || y + row->y >= height) continue;
+        const ShapeKernel::Segment* s = kernel.Segments() + row->firstSegment;
+        for (int32_t k = 0; k < row->segmentCount; ++k, ++s) {
+            const int32_t x0 = std::clamp(x + s->x, 0, width);
+            const int32_t x1 = std::clamp(x + s->x + s->length, 0, width);
+            weight += static_cast<double>(s->weight) * (x1 - x0);
+        }
+    }
+    return weight;
 }
 
 // Stores the kernel sum scaled by n (one over the weight read) as a pixel.
@@ -303,27 +334,58 @@ void SY_DOFBufferX<P>::SampleKernel(const ShapeIris& iris, int32_t x, int32_t y,
     const bool rowsWithin = y + e[1] >= 0 && y + e[3] < height;
     Sums4 sum[kSpanPixels] = {};
     double weight[kSpanPixels] = {};
-    const Table& table = *rowTable;
-    const double* columns = columnSums.empty() ? nullptr : columnSums.data();
-    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x, y, left, width, height, sum,
-                                       weight);
-    if (rowsWithin) {
-        AddKernelOnAny<Reach::kWithin>(iris, table, columns, x + left, y, right - left, width,
-                                       height, sum + left, nullptr);
+    const double* rows = &rowTable->Row(0)[0].alpha;
+    const ptrdiff_t stride = 4 * (ptrdiff_t(width) + 1);
+    if (!columnSums.empty()) {
+        // Pixels within the world's ends read the kernel's ends, those that reach beyond them
+        // clamped to them; the pixels beyond go row by row.
+        const double* columns = columnSums.data();
+        const int32_t first = std::clamp(-x, 0, count), last = std::clamp(width - x, first, count);
+        const int32_t inner = std::clamp(left, first, last), outer = std::clamp(right, inner, last);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x, y, first, width, height, sum,
+                                           weight);
+        AddKernelEndsOnAny<Reach::kBeyondEnds>(iris, rows, columns, stride, x + first, y,
+                                               inner - first, width, height, sum + first);
+        if (rowsWithin) {
+            AddKernelEndsOnAny<Reach::kWithin>(iris, rows, columns, stride, x + inner, y,
+                                               outer - inner, width, height, sum + inner);
+        } else {
+            AddKernelEndsOnAny<Reach::kBeyondRows>(iris, rows, columns, stride, x + inner, y,
+                                                   outer - inner, width, height, sum + inner);
+        }
+        AddKernelEndsOnAny<Reach::kBeyondEnds>(iris, rows, columns, stride, x + outer, y,
+                                               last - outer, width, height, sum + outer);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x + last, y, count - last, width,
+                                           height, sum + last, weight + last);
+        if (averagesWithin) {
+            for (int32_t k = first; k < last; ++k) {
+                if (!rowsWithin || k < left || k >= right)
+                    weight[k] = WeightRead(kernel, x + k, y, width, height);
+            }
+        }
     } else {
-        AddKernelOnAny<Reach::kBeyondRows>(iris, table, columns, x + left, y, right - left, width,
-                                           height, sum + left, weight + left);
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x, y, left, width, height, sum,
+                                           weight);
+        if (rowsWithin) {
+            AddKernelOnAny<Reach::kWithin>(kernel, rows, stride, x + left, y, right - left, width,
+                                           height, sum + left, nullptr);
+        } else {
+            AddKernelOnAny<Reach::kBeyondRows>(kernel, rows, stride, x + left, y, right - left,
+                                               width, height, sum + left, weight + left);
+        }
+        AddKernelOnAny<Reach::kBeyondEnds>(kernel, rows, stride, x + right, y, count - right, width,
+                                           height, sum + right, weight + right);
     }
-    AddKernelOnAny<Reach::kBeyondEnds>(iris, table, columns, x + right, y, count - right, width,
-                                       height, sum + right, weight + right);
+    // A kernel that reads nothing sums to zero, which stores clear; only an average within the
+    // world needs the weight read.
     const double n = kernel.Normalization();
     for (int32_t k = 0; k < count; ++k) {
-        if (rowsWithin && k >= left && k < right) {
+        if (!averagesWithin || (rowsWithin && k >= left && k < right)) {
             StoreSum(sum[k], n, out + k);
         } else if (!(weight[k] > 0)) {
             out[k] = P{};
         } else {
-            StoreSum(sum[k], averagesWithin ? 1 / weight[k] : n, out + k);
+            StoreSum(sum[k], 1 / weight[k], out + k);
         }
     }
 }

@@ -63,10 +63,16 @@ int32_t AppendEdges(const ShapeKernel& kernel, EdgeScratch* scratch,
         }
         std::swap(above, here);
     }
-    auto columns = std::stable_partition(found.begin(), found.end(),
-                                         [](const ShapeEdge& e) { return e.rows == 1; });
-    edges->insert(edges->end(), found.begin(), found.end());
-    return static_cast<int32_t>(columns - found.begin());
+    // Each kind in the order found.
+    const size_t start = edges->size();
+    for (const ShapeEdge& e : found) {
+        if (e.rows == 1) edges->push_back(e);
+    }
+    const auto singles = static_cast<int32_t>(edges->size() - start);
+    for (const ShapeEdge& e : found) {
+        if (e.rows != 1) edges->push_back(e);
+    }
+    return singles;
 }
 
 }  // namespace
@@ -80,8 +86,8 @@ std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc
         array->count = static_cast<int32_t>(8 * maxRadius);
         array->step = array->count ? 1.0f / static_cast<float>(array->count) : 0.0f;
         array->irisList.reserve(static_cast<size_t>(array->count) + 1);
-        std::vector<size_t> firstEdge;
-        EdgeScratch scratch;
+        // Each run has at most two ends: room for every kernel's, so that the list grows once.
+        size_t ends = 0;
         for (int32_t i = 0; i <= array->count; ++i) {
             double t = array->count ? static_cast<double>(i) / array->count : 0.0;
             ShapeIris iris;
@@ -89,10 +95,20 @@ std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc
                 SY_AccountedAllocator<ShapeKernel>(), static_cast<int32_t>(dof.irisShape),
                 dof.irisRoundness, t * maxRadius, dof.irisAspect, SY_DOFXScale(dof),
                 dof.irisRotation, dof.diffractionFringe);
+            const ShapeKernel& kernel = *iris.kernel;
+            if (kernel.RowCount()) {
+                const ShapeKernel::Row& last = kernel.Rows()[kernel.RowCount() - 1];
+                ends += 2 * size_t(last.firstSegment + last.segmentCount);
+            }
+            array->irisList.push_back(std::move(iris));
+        }
+        array->edgeList.reserve(ends);
+        std::vector<size_t> firstEdge;
+        EdgeScratch scratch;
+        for (ShapeIris& iris : array->irisList) {
             firstEdge.push_back(array->edgeList.size());
             iris.singleCount = AppendEdges(*iris.kernel, &scratch, &array->edgeList);
             iris.edgeCount = static_cast<int32_t>(array->edgeList.size() - firstEdge.back());
-            array->irisList.push_back(std::move(iris));
         }
         // The list has stopped growing: its ends stay where they are.
         for (size_t i = 0; i < firstEdge.size(); ++i)

@@ -3,6 +3,7 @@
 #include <cmath>
 #include <cstring>
 #include <new>
+#include <utility>
 #include <vector>
 
 #include "bee_engine.h"
@@ -40,19 +41,85 @@ std::vector<Point> Outline(int32_t sides, double roundness, double aspect, doubl
     return outline;
 }
 
-// Where the horizontal line at y crosses a convex outline scaled by scale: false when it misses.
-bool Cross(const std::vector<Point>& outline, double scale, double y, double* left, double* right) {
+// An iris outline with its sides sorted by height: bucket b of count spans the heights from
+// y0 + b / perHeight on, and lists every side that reaches into it.
+struct Trace {
+    int32_t sides = 0;
+    double roundness = 0, aspect = 0, xStretch = 0, rotation = 0;
+    std::vector<Point> outline;
+    double y0 = 0, perHeight = 0;
+    std::vector<int32_t> first;   // bucket b's sides are listed[first[b], first[b + 1])
+    std::vector<int32_t> listed;  // side k runs from outline[k − 1] (the last for 0) to [k]
+
+    int32_t Bucket(double y) const {
+        const double at = (y - y0) * perHeight;
+        const auto count = static_cast<int32_t>(first.size()) - 1;
+        return !(at >= 0) ? 0 : at >= count ? count - 1 : static_cast<int32_t>(at);
+    }
+};
+
+// The outline of an iris and its buckets. A frame traces the same iris at every radius, so
+// each thread keeps the last one.
+const Trace& TraceOf(int32_t sides, double roundness, double aspect, double xStretch,
+                     double rotation) {
+    thread_local Trace kept;
+    if (!kept.outline.empty() && kept.sides == sides && kept.roundness == roundness &&
+        kept.aspect == aspect && kept.xStretch == xStretch && kept.rotation == rotation)
+        return kept;
+    Trace trace;
+    trace.sides = sides;
+    trace.roundness = roundness;
+    trace.aspect = aspect;
+    trace.xStretch = xStretch;
+    trace.rotation = rotation;
+    trace.outline = Outline(sides, roundness, aspect, xStretch, rotation);
+    const std::vector<Point>& outline = trace.outline;
+    const auto n = static_cast<int32_t>(outline.size());
+    double top = HUGE_VAL, bottom = -HUGE_VAL;
+    for (const Point& p : outline) {
+        top = std::min(top, p.y);
+        bottom = std::max(bottom, p.y);
+    }
+    // A side goes into the buckets from its top's to its bottom's; Bucket never decreases with
+    // the height, so a side that reaches height y is in y's bucket.
+    const int32_t count = 2 * n;
+    trace.y0 = top;
+    trace.perHeight = bottom > top ? count / (bottom - top) : 0;
+    trace.first.resize(static_cast<size_t>(count) + 1);
+    std::vector<std::vector<int32_t>> buckets(static_cast<size_t>(count));
+    for (int32_t k = 0; k < n; ++k) {
+        const Point& p = outline[static_cast<size_t>((k + n - 1) % n)];
+        const Point& q = outline[static_cast<size_t>(k)];
+        const int32_t b0 = trace.Bucket(std::min(p.y, q.y)), b1 = trace.Bucket(std::max(p.y, q.y));
+        for (int32_t b = b0; b <= b1; ++b)
+            buckets[static_cast<size_t>(b)].push_back(k);
+    }
+    for (size_t b = 0; b < buckets.size(); ++b) {
+        trace.listed.insert(trace.listed.end(), buckets[b].begin(), buckets[b].end());
+        trace.first[b + 1] = static_cast<int32_t>(trace.listed.size());
+    }
+    kept = std::move(trace);
+    return kept;
+}
+
+// Where the horizontal line at y crosses the convex outline scaled by scale: false when it
+// misses.
+bool Cross(const Trace& trace, double scale, double y, double* left, double* right) {
     y /= scale;
     double lo = HUGE_VAL, hi = -HUGE_VAL;
-    const Point* p = &outline.back();
-    for (const Point& q : outline) {
+    const std::vector<Point>& outline = trace.outline;
+    const auto n = static_cast<int32_t>(outline.size());
+    const int32_t b = trace.Bucket(y);
+    for (int32_t i = trace.first[static_cast<size_t>(b)]; i < trace.first[size_t(b) + 1]; ++i) {
+        const int32_t k = trace.listed[static_cast<size_t>(i)];
+        const Point* p = &outline[static_cast<size_t>((k + n - 1) % n)];
+        const Point& q = outline[static_cast<size_t>(k)];
         if ((p->y <= y && y <= q.y) || (q.y <= y && y <= p->y)) {
             double x0 = p->x, x1 = q.x;
             if (p->y != q.y) x0 = x1 = p->x + (y - p->y) * (q.x - p->x) / (q.y - p->y);
             lo = std::min({lo, x0, x1});
             hi = std::max({hi, x0, x1});
         }
-        p = &q;
     }
     *left = lo * scale;
     *right = hi * scale;
@@ -63,7 +130,8 @@ bool Cross(const std::vector<Point>& outline, double scale, double y, double* le
 
 ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double aspect,
                          double xStretch, double rotation, double fringe) {
-    std::vector<Point> outline = Outline(sides, roundness, aspect, xStretch, rotation);
+    const Trace& trace = TraceOf(sides, roundness, aspect, xStretch, rotation);
+    const std::vector<Point>& outline = trace.outline;
     double top = HUGE_VAL, bottom = -HUGE_VAL;
     for (const Point& p : outline) {
         top = std::min(top, p.y * radius);
@@ -94,12 +162,12 @@ ShapeKernel::ShapeKernel(int32_t sides, double roundness, double radius, double 
         double share = std::min(dy + 0.5, bottom) - std::max(dy - 0.5, top);
         double y = std::clamp(static_cast<double>(dy), top, bottom);
         double xl, xr;
-        if (!(share > 0) || !Cross(outline, radius, y, &xl, &xr)) continue;
+        if (!(share > 0) || !Cross(trace, radius, y, &xl, &xr)) continue;
         // Pixels whose centres lie within the inner outline are off the rim; without a fringe
         // every pixel is.
         int32_t innerFirst = INT32_MIN, innerLast = INT32_MAX;
         double il, ir;
-        if (rim != 1 && Cross(outline, radius * kInnerScale, y, &il, &ir)) {
+        if (rim != 1 && Cross(trace, radius * kInnerScale, y, &il, &ir)) {
             innerFirst = static_cast<int32_t>(std::ceil(il));
             innerLast = static_cast<int32_t>(std::floor(ir));
         } else if (rim != 1) {

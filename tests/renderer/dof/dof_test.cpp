@@ -149,17 +149,21 @@ TEST(DepthOfField, HighlightsAboveTheThresholdGain) {
 // A span's pixels sampled together are, to the bit, those sampled one by one, near the
 // buffer's ends and rows as within it, with neighbours that share a kernel and some that do
 // not; and a flat grey averaged within the buffer stays that grey up to its very ends.
-TEST(DepthOfField, SpanSamplesAsItsPixels) {
-    constexpr int32_t kCount = SY_DOFBufferX<PF_PixelFloat>::kSpanPixels, kW = kCount + 6;
+template <class P>
+void ExpectSpanSamplesAsItsPixels() {
+    constexpr int32_t kCount = SY_DOFBufferX<P>::kSpanPixels, kW = kCount + 6;
+    constexpr float kMax = PF_PixelTraits<P>::kMax;
+    using C = typename PF_PixelTraits<P>::Channel;
     for (bool flat : {false, true}) {
         SY_CameraDOFDesc dof = Lens(0, 8);
         dof.irisRoundness = 0.5;
-        auto buffer = SY_DOFBuffer::New({0, 0, kW, 30}, 32, dof, BuildShapeKernels(dof));
-        auto& pixels = static_cast<SY_DOFBufferX<PF_PixelFloat>&>(*buffer);
+        auto buffer = SY_DOFBuffer::New({0, 0, kW, 30}, PF_PixelTraits<P>::kBitDepth, dof,
+                                        BuildShapeKernels(dof));
+        auto& pixels = static_cast<SY_DOFBufferX<P>&>(*buffer);
         buffer->averagesWithin = flat;
         for (int32_t k = 0; k < kW * 30; ++k) {
-            const float grey = flat ? 0.5f : static_cast<float>(k * 37 % 101) / 100;
-            *pixels.PixelAddress(k % kW, k / kW) = {1, grey, grey, grey};
+            const auto grey = static_cast<C>(kMax * (flat ? 0.5f : float(k * 37 % 101) / 100));
+            *pixels.PixelAddress(k % kW, k / kW) = {static_cast<C>(kMax), grey, grey, grey};
         }
         buffer->PrepareTables();
         float radius[kCount];
@@ -167,18 +171,27 @@ TEST(DepthOfField, SpanSamplesAsItsPixels) {
             radius[k] = static_cast<float>(3 + k / 7 % 3 * 4);  // runs of 7 sharing a kernel
         for (float y : {0.5f, 6.5f, 15.5f, 29.5f}) {
             for (int32_t first = 0; first <= kW - kCount; ++first) {
-                PF_PixelFloat together[kCount], alone;
+                P together[kCount], alone;
                 pixels.SampleSpan(0.5f, y, first, kCount, radius, together);
                 for (int32_t k = 0; k < kCount; ++k) {
                     pixels.Sample(0.5f + static_cast<float>(first + k), y, radius[k], &alone);
                     EXPECT_EQ(std::memcmp(&alone, &together[k], sizeof alone), 0) << y << " " << k;
                     if (flat) {
-                        EXPECT_NEAR(alone.red, 0.5f, 1e-5) << y << " " << first + k;
+                        const float tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-5f : 0.0f;
+                        EXPECT_NEAR(alone.alpha, kMax, tolerance) << y << " " << first + k;
+                        EXPECT_NEAR(alone.red, float(C(kMax * 0.5f)), tolerance)
+                            << y << " " << first + k;
                     }
                 }
             }
         }
     }
+}
+
+TEST(DepthOfField, SpanSamplesAsItsPixels) {
+    ExpectSpanSamplesAsItsPixels<PF_Pixel8>();
+    ExpectSpanSamplesAsItsPixels<PF_Pixel16>();
+    ExpectSpanSamplesAsItsPixels<PF_PixelFloat>();
 }
 
 // Memory that runs out anywhere in a blurred frame fails it with 4 (std::bad_alloc from the
