@@ -45,6 +45,19 @@ inline PF_BoxAxis PF_MakeBoxAxis(float a, float b, int32_t size) {
              static_cast<float>(std::max(hi - (last << 16), int64_t(0))) * kUnit}};
 }
 
+// The same for a box [lo, hi] of at least a texel inside the texture (0 ≤ lo, lo + 65536 ≤ hi
+// ≤ size × 65536), the usual case: nothing to cut, the last texel lies beyond the first, and the
+// partly covered ranges are what the ends leave of their texels. Fewer steps than the general
+// case, with the same edges and weights.
+[[gnu::always_inline]] inline PF_BoxAxis PF_MakeBoxAxisInside(int64_t lo, int64_t hi,
+                                                              int32_t size) {
+    constexpr float kUnit = 1.0f / 65536.0f;
+    auto e0 = static_cast<int32_t>(lo >> 16), e2 = static_cast<int32_t>(hi >> 16);
+    auto w0 = static_cast<int32_t>(65536 - (lo & 0xFFFF)), w2 = static_cast<int32_t>(hi & 0xFFFF);
+    return {{e0, e0 + 1, e2, std::min(e2 + 1, size)},
+            {static_cast<float>(w0) * kUnit, 1.0f, static_cast<float>(w2) * kUnit}};
+}
+
 // Table cells that hold unsigned sums modulo 2^32: differences are exact as long as the box's
 // true sum stays below 2^32. kBelow2To31 says the caller knows it stays below 2^31, where the
 // conversion to float is a single instruction.

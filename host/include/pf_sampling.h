@@ -183,8 +183,16 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
     int64_t ry = std::clamp(pb.yRadius, 32768, kMaxAreaRadius);
     // Texel centres at integers become edges at integers.
     int64_t cx = int64_t(x) + 32768, cy = int64_t(y) + 32768;
-    PF_BoxAxis ax = PF_MakeBoxAxisFixed(cx - rx, cx + rx, w.width);
-    PF_BoxAxis ay = PF_MakeBoxAxisFixed(cy - ry, cy + ry, w.height);
+    PF_BoxAxis ax, ay;
+    // Radii of at least half a texel make boxes of at least a texel.
+    if (cx - rx >= 0 && cy - ry >= 0 && cx + rx <= int64_t(w.width) << 16 &&
+        cy + ry <= int64_t(w.height) << 16) {
+        ax = PF_MakeBoxAxisInside(cx - rx, cx + rx, w.width);
+        ay = PF_MakeBoxAxisInside(cy - ry, cy + ry, w.height);
+    } else {
+        ax = PF_MakeBoxAxisFixed(cx - rx, cx + rx, w.width);
+        ay = PF_MakeBoxAxisFixed(cy - ry, cy + ry, w.height);
+    }
     PF_Float4 sum;
     if constexpr (Traits::kIsFloat) {
         using Cells = PF_BoxCellsPixel<PF_PixelDouble>;

@@ -17,39 +17,63 @@ namespace sy_sampling {
 inline constexpr double kFarTexels = 32000.0;
 inline constexpr double kMaxRadius = 100.0;  // texels; larger footprints are capped
 
-// Rounds halves away from zero; v must lie well inside the int32 range.
-inline int32_t RoundAway(double v) {
-    return static_cast<int32_t>(v + (v < 0 ? -0.5 : 0.5));
+// The conversions and the footprint below work on both axes at once, lanes (u, v) of doubles:
+// each lane takes the same correctly rounded steps one axis alone would.
+
+// Rounds halves away from zero, both lanes; they must lie well inside the int32 range.
+inline __m128i RoundAway(__m128d v) {
+    const __m128d half = _mm_or_pd(_mm_and_pd(v, _mm_set1_pd(-0.0)), _mm_set1_pd(0.5));
+    return _mm_cvttpd_epi32(_mm_add_pd(v, half));
 }
 
-// 16.16 fixed point, rounded halves away from zero.
-inline int32_t ToFixed(double texels) {
-    return RoundAway(std::clamp(texels, -kFarTexels, kFarTexels) * 65536.0);
+// 16.16 fixed point, rounded halves away from zero. The operand order of the bounds keeps a
+// position that is not a number as it is.
+inline __m128i ToFixed(__m128d texels) {
+    const __m128d clamped =
+        _mm_min_pd(_mm_set1_pd(kFarTexels), _mm_max_pd(_mm_set1_pd(-kFarTexels), texels));
+    return RoundAway(_mm_mul_pd(clamped, _mm_set1_pd(65536.0)));
 }
 
-inline int32_t RadiusToFixed(double radius) {
-    return radius >= kMaxRadius ? 6553600 : RoundAway(radius * 65536.0);
+// Radii from kMaxRadius on are capped to it.
+inline __m128i RadiusToFixed(__m128d radius) {
+    return RoundAway(_mm_mul_pd(_mm_min_pd(_mm_set1_pd(kMaxRadius), radius), _mm_set1_pd(65536.0)));
 }
 
-// The sample point and the footprint's half-size along u and v in texels.
+// The sample point (u, v) and the footprint's half-sizes (ru, rv) in texels, as lanes.
+struct FootprintLanes {
+    __m128d point, radius;
+};
+
+inline FootprintLanes FootprintLanesOf(const SY_SpanMapping& m, bool perspective) {
+    const __m128d invW = _mm_set1_pd(m.invW);
+    FootprintLanes f;
+    f.point = _mm_mul_pd(_mm_setr_pd(m.u, m.v), invW);
+    __m128d dx = _mm_cvtps_pd(_mm_setr_ps(m.dudx, m.dvdx, 0, 0));
+    __m128d dy = _mm_cvtps_pd(_mm_setr_ps(m.dudy, m.dvdy, 0, 0));
+    if (perspective) {
+        dx = _mm_mul_pd(_mm_sub_pd(dx, _mm_mul_pd(f.point, _mm_set1_pd(m.dwdx))), invW);
+        dy = _mm_mul_pd(_mm_sub_pd(dy, _mm_mul_pd(f.point, _mm_set1_pd(m.dwdy))), invW);
+    }
+    const __m128d sign = _mm_set1_pd(-0.0);
+    // The larger of |dx| and |dy|, or |dx| where either is not a number.
+    f.radius =
+        _mm_mul_pd(_mm_set1_pd(0.5), _mm_max_pd(_mm_andnot_pd(sign, dy), _mm_andnot_pd(sign, dx)));
+    return f;
+}
+
+// The second lane (v) of a pair.
+inline double HighLane(__m128d v) {
+    return _mm_cvtsd_f64(_mm_unpackhi_pd(v, v));
+}
+
+// The same footprint as four numbers.
 struct Footprint {
     double u, v, ru, rv;
 };
 
 inline Footprint FootprintOf(const SY_SpanMapping& m, bool perspective) {
-    Footprint f;
-    f.u = m.u * m.invW;
-    f.v = m.v * m.invW;
-    double dudx = m.dudx, dudy = m.dudy, dvdx = m.dvdx, dvdy = m.dvdy;
-    if (perspective) {
-        dudx = (dudx - f.u * m.dwdx) * m.invW;
-        dudy = (dudy - f.u * m.dwdy) * m.invW;
-        dvdx = (dvdx - f.v * m.dwdx) * m.invW;
-        dvdy = (dvdy - f.v * m.dwdy) * m.invW;
-    }
-    f.ru = 0.5 * std::max(std::fabs(dudx), std::fabs(dudy));
-    f.rv = 0.5 * std::max(std::fabs(dvdx), std::fabs(dvdy));
-    return f;
+    const FootprintLanes f = FootprintLanesOf(m, perspective);
+    return {_mm_cvtsd_f64(f.point), HighLane(f.point), _mm_cvtsd_f64(f.radius), HighLane(f.radius)};
 }
 
 // Under perspective a pixel whose W range reaches the eye plane has no sensible footprint.
@@ -60,30 +84,41 @@ inline bool InFront(const SY_SpanMapping& m, bool perspective) {
 // A radius rounds to at most 32768 (half a texel) in fixed point below this many texels.
 inline constexpr double kSubpixelBelow = 32768.5 / 65536.0;
 
-// The pixel library's interpolation (bilinear or bicubic) at the fixed-point position (x, y).
+// Whether both radii lie below kSubpixelBelow.
+inline bool Subpixel(__m128d radius) {
+    return _mm_movemask_pd(_mm_cmplt_pd(radius, _mm_set1_pd(kSubpixelBelow))) == 3;
+}
+
+// The pixel library's interpolation (bilinear or bicubic) at the fixed-point position xy.
 template <class P>
-[[gnu::always_inline]] inline void Interpolate(SY_SpanTexture& texture, int32_t x, int32_t y,
-                                               P* out) {
+[[gnu::always_inline]] inline void Interpolate(SY_SpanTexture& texture, __m128i xy, P* out) {
+    const int32_t x = _mm_cvtsi128_si32(xy), y = _mm_extract_epi32(xy, 1);
     if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
         PF_SubpixelBicubic(x, y, texture.sampling, out);
     else
         PF_SubpixelBilinear(x, y, texture.sampling, out);
 }
 
-// The pixel library's filter at (u, v) with the half-sizes (ru, rv): interpolation while the
+// The pixel library's filter at the point with the half-sizes radius: interpolation while the
 // footprint stays within half a texel, the box average beyond.
+template <class P>
+[[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, __m128d point, __m128d radius,
+                                          P* out) {
+    const __m128i xy = ToFixed(point);
+    if (Subpixel(radius)) {
+        Interpolate(texture, xy, out);
+    } else {
+        PF_SampPB& pb = texture.sampling;
+        const __m128i r = RadiusToFixed(radius);
+        pb.xRadius = _mm_cvtsi128_si32(r);
+        pb.yRadius = _mm_extract_epi32(r, 1);
+        PF_AreaSample(_mm_cvtsi128_si32(xy), _mm_extract_epi32(xy, 1), pb, out);
+    }
+}
 template <class P>
 [[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, double u, double v, double ru,
                                           double rv, P* out) {
-    int32_t x = ToFixed(u), y = ToFixed(v);
-    if (ru < kSubpixelBelow && rv < kSubpixelBelow) {
-        Interpolate(texture, x, y, out);
-    } else {
-        PF_SampPB& pb = texture.sampling;
-        pb.xRadius = RadiusToFixed(ru);
-        pb.yRadius = RadiusToFixed(rv);
-        PF_AreaSample(x, y, pb, out);
-    }
+    Filter(texture, _mm_setr_pd(u, v), _mm_setr_pd(ru, rv), out);
 }
 
 // Whether the footprint stays within half a texel at each of the count pixels from m on, so
@@ -95,8 +130,7 @@ template <class P>
 // that no term grows large enough to round by that much.
 inline bool InterpolatesThroughout(const SY_SpanMapping& m, bool perspective, int32_t count) {
     if (!perspective) {
-        Footprint f = FootprintOf(m, false);
-        return f.ru < kSubpixelBelow && f.rv < kSubpixelBelow;
+        return Subpixel(FootprintLanesOf(m, false).radius);
     }
     constexpr double kBelow = 0.49;
     const double last = count - 1;
@@ -184,8 +218,8 @@ inline void SY_SampleFiltered(SY_SpanSampleState<P>& state, P* out) {
         *out = P{};
         return;
     }
-    sy_sampling::Footprint f = sy_sampling::FootprintOf(m, state.texture.perspective);
-    sy_sampling::Filter(state.texture, f.u, f.v, f.ru, f.rv, out);
+    sy_sampling::FootprintLanes f = sy_sampling::FootprintLanesOf(m, state.texture.perspective);
+    sy_sampling::Filter(state.texture, f.point, f.radius, out);
 }
 
 // Interpolated texel, one sample, for spans where InterpolatesThroughout holds: the same texel
@@ -197,8 +231,9 @@ inline void SY_SampleInterpolated(SY_SpanSampleState<P>& state, P* out) {
         *out = P{};
         return;
     }
-    sy_sampling::Interpolate(state.texture, sy_sampling::ToFixed(m.u * m.invW),
-                             sy_sampling::ToFixed(m.v * m.invW), out);
+    sy_sampling::Interpolate(
+        state.texture, sy_sampling::ToFixed(_mm_mul_pd(_mm_setr_pd(m.u, m.v), _mm_set1_pd(m.invW))),
+        out);
 }
 
 // Whether SY_SampleInterpolated serves the count pixels from the state's position on. The
@@ -247,9 +282,12 @@ inline void SY_SampleFiltered(SY_SpanSubsampleState<P>& state, P* out) {
         *out = P{};
         return;
     }
-    sy_sampling::Footprint f = sy_sampling::FootprintOf(state.mappings[i], perspective);
-    f.ru = std::min(f.ru, sy_sampling::kMaxRadius);
-    f.rv = std::min(f.rv, sy_sampling::kMaxRadius);
+    // Capped as the single sample's radii are; the bound's operand order keeps one that is
+    // not a number.
+    const __m128d radius =
+        _mm_min_pd(_mm_set1_pd(sy_sampling::kMaxRadius),
+                   sy_sampling::FootprintLanesOf(state.mappings[i], perspective).radius);
+    const double ru = _mm_cvtsd_f64(radius), rv = sy_sampling::HighLane(radius);
     double lastU = 0, lastV = 0;
     bool sampled = false;
     P texel{};
@@ -258,8 +296,8 @@ inline void SY_SampleFiltered(SY_SpanSubsampleState<P>& state, P* out) {
         const SY_SpanMapping& m = state.mappings[i];
         if (!(m.invW > 0) || !sy_sampling::InFront(m, perspective)) continue;
         double u = m.u * m.invW, v = m.v * m.invW;
-        if (!sampled || std::fabs(u - lastU) > 0.25 * f.ru || std::fabs(v - lastV) > 0.25 * f.rv) {
-            sy_sampling::Filter(state.texture, u, v, f.ru, f.rv, &texel);
+        if (!sampled || std::fabs(u - lastU) > 0.25 * ru || std::fabs(v - lastV) > 0.25 * rv) {
+            sy_sampling::Filter(state.texture, _mm_setr_pd(u, v), radius, &texel);
             lastU = u;
             lastV = v;
             sampled = true;
