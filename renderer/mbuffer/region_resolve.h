@@ -23,9 +23,9 @@ public:
         vertices_.reserve(64);
         front_.reserve(16);
         behind_.reserve(16);
-        records_.reserve(64);
+        nodes_.reserve(64);
         regions_.reserve(16);
-        fresh_.reserve(16);
+        frontToBack_.reserve(16);
         lines_.reserve(8);
     }
 
@@ -44,32 +44,42 @@ public:
     template <class PlaneOf>
     void Split(F* const* run, int32_t count, PlaneOf&& planeOf) {
         vertices_.clear();
-        records_.clear();
+        nodes_.clear();
         regions_.clear();
         for (int32_t i = 0; i < count; ++i)
             run[i]->scratchIndex = static_cast<uint16_t>(i);
         constexpr SY_SplitPoint kSquare[4] = {{0, 0}, {0, 1}, {1, 1}, {1, 0}};
         vertices_.assign(kSquare, kSquare + 4);
-        records_.push_back(run[0]);
-        regions_.push_back({0, 4, 0, 1});
+        nodes_.push_back({run[0], kEnd});
+        regions_.push_back({0, 4, 0});
         for (int32_t r = 1; r < count; ++r)
             Add(*run[r], planeOf);
     }
 
     // Each region of the last Split, weighted by its area.
-    void AddRegionsTo(SY_RegionAccumulator<Pixel>* sum) const {
+    void AddRegionsTo(SY_RegionAccumulator<Pixel>* sum) {
         for (const Region& region : regions_) {
+            frontToBack_.clear();
+            for (int32_t n = region.firstNode; n != kEnd; n = nodes_[n].next)
+                frontToBack_.push_back(nodes_[n].record);
             sum->AddRegion(SY_PolygonArea(&vertices_[region.firstVertex], region.vertexCount),
-                           &records_[region.firstRecord], region.recordCount);
+                           frontToBack_.data(), static_cast<int32_t>(frontToBack_.size()));
         }
     }
 
 private:
-    // A convex piece of the square and the records seen there, front first. Both are ranges of
-    // the shared stores, which only grow during a run.
+    // A record seen in a region and the index of the one behind it, or kEnd.
+    struct Node {
+        const F* record;
+        int32_t next;
+    };
+    static constexpr int32_t kEnd = -1;
+    // A convex piece of the square, a range of the shared vertex store, and the list of the
+    // records seen there, front first. A record goes into a list in place; only a region cut
+    // off takes a copy. Both stores only grow during a run.
     struct Region {
         int32_t firstVertex, vertexCount;
-        int32_t firstRecord, recordCount;
+        int32_t firstNode;
     };
     struct CachedLine {
         double line[3];
@@ -83,36 +93,40 @@ private:
     void Add(const F& r, PlaneOf& planeOf) {
         const SY_DepthPlane plane = planeOf(r);
         lines_.assign(r.scratchIndex, CachedLine{{0, 0, 0}, false});
-        fresh_.clear();
         const auto regionCount = static_cast<int32_t>(regions_.size());
         for (int32_t g = 0; g < regionCount; ++g) {
             Region region = regions_[g];
-            int32_t at = region.recordCount;  // where r goes in the list
-            for (int32_t s = 0; s < region.recordCount; ++s) {
-                const double* line = LineOf(plane, *records_[region.firstRecord + s], planeOf);
+            // r goes between before and at.
+            int32_t before = kEnd, at = region.firstNode;
+            for (; at != kEnd; before = at, at = nodes_[at].next) {
+                const double* line = LineOf(plane, *nodes_[at].record, planeOf);
+                // Most records leave the region whole: only a region r cuts is copied.
+                const SY_LineSide side =
+                    SY_SideOfLine(&vertices_[region.firstVertex], region.vertexCount, line);
+                if (side == SY_LineSide::kBehind) continue;
+                if (side == SY_LineSide::kFront) break;
                 front_.clear();
                 behind_.clear();
                 SY_SplitPolygon(&vertices_[region.firstVertex], region.vertexCount, line, &front_,
                                 &behind_);
-                if (front_.empty()) continue;
-                if (behind_.empty()) {
-                    at = s;
-                    break;
-                }
                 Region part = Stored(front_);
-                Insert(region, s, r, &part);
-                fresh_.push_back(part);
+                part.firstNode = CopyWith(region.firstNode, at, r);
+                regions_.push_back(part);
                 const Region rest = Stored(behind_);
                 region.firstVertex = rest.firstVertex;
                 region.vertexCount = rest.vertexCount;
             }
             // Behind an opaque record r is hidden here.
-            if (at == 0 || !records_[region.firstRecord + at - 1]->opaque)
-                Insert(region, at, r, &region);
+            if (before == kEnd || !nodes_[before].record->opaque) {
+                const auto node = static_cast<int32_t>(nodes_.size());
+                nodes_.push_back({&r, r.opaque ? kEnd : at});
+                (before == kEnd ? region.firstNode : nodes_[before].next) = node;
+            }
             regions_[g] = region;
         }
         // Each new region goes to the front of the list, the last one made first.
-        regions_.insert(regions_.begin(), fresh_.rbegin(), fresh_.rend());
+        std::reverse(regions_.begin() + regionCount, regions_.end());
+        std::rotate(regions_.begin(), regions_.begin() + regionCount, regions_.end());
     }
 
     // a·u + b·v + c = zR − zS over the square; a record wholly in front of S (level with it
@@ -140,26 +154,31 @@ private:
     Region Stored(const SY_AccountedVector<SY_SplitPoint>& polygon) {
         const auto first = static_cast<int32_t>(vertices_.size());
         vertices_.insert(vertices_.end(), polygon.begin(), polygon.end());
-        return {first, static_cast<int32_t>(polygon.size()), 0, 0};
+        return {first, static_cast<int32_t>(polygon.size()), kEnd};
     }
 
-    // Gives *to the list of `from` with r put before its record `at`, without the records
-    // behind r when r is opaque.
-    void Insert(const Region& from, int32_t at, const F& r, Region* to) {
-        const auto first = static_cast<int32_t>(records_.size());
-        const int32_t end = r.opaque ? at : from.recordCount;
-        for (int32_t i = 0; i < end; ++i) {
-            if (i == at) records_.push_back(&r);
-            const F* kept = records_[from.firstRecord + i];
-            records_.push_back(kept);
+    // A copy of the list from node first with r put before node at, without the records behind
+    // r when r is opaque; its first node.
+    int32_t CopyWith(int32_t first, int32_t at, const F& r) {
+        const auto copy = static_cast<int32_t>(nodes_.size());
+        auto append = [this](const F* record) {
+            nodes_.push_back({record, static_cast<int32_t>(nodes_.size()) + 1});
+        };
+        for (int32_t n = first; n != at; n = nodes_[n].next)
+            append(nodes_[n].record);
+        append(&r);
+        if (!r.opaque) {
+            for (int32_t n = at; n != kEnd; n = nodes_[n].next)
+                append(nodes_[n].record);
         }
-        if (end == at) records_.push_back(&r);
-        to->firstRecord = first;
-        to->recordCount = static_cast<int32_t>(records_.size()) - first;
+        nodes_.back().next = kEnd;
+        return copy;
     }
 
     SY_AccountedVector<SY_SplitPoint> vertices_, front_, behind_;
-    SY_AccountedVector<const F*> records_;
-    SY_AccountedVector<Region> regions_, fresh_;
-    SY_AccountedVector<CachedLine> lines_;  // by the earlier record's scratchIndex
+    SY_AccountedVector<Node> nodes_;
+    // New regions are made at the end of the list and then moved to its front.
+    SY_AccountedVector<Region> regions_;
+    SY_AccountedVector<const F*> frontToBack_;  // one region's records, to composite them
+    SY_AccountedVector<CachedLine> lines_;      // by the earlier record's scratchIndex
 };
