@@ -112,6 +112,16 @@ inline SY_LineSide SY_SideOfLine(const SY_SplitPoint* polygon, int32_t count,
     return inFront == count ? SY_LineSide::kFront : SY_LineSide::kBoth;
 }
 
+// Whether every point of the box from low to high, and so every vertex of a polygon inside
+// it, gives the line a value < 0, judged from the one corner where the value is greatest. A
+// rounded product or sum never decreases when an operand grows, so no vertex can give a
+// greater value than that corner: the answer agrees with SY_SideOfLine's wherever it is yes.
+inline bool SY_BoxBehindLine(const SY_SplitPoint& low, const SY_SplitPoint& high,
+                             const double line[3]) {
+    const SY_SplitPoint corner{line[0] >= 0 ? high.u : low.u, line[1] >= 0 ? high.v : low.v};
+    return SY_LineValue(line, corner) < 0;
+}
+
 // Splits the convex polygon (count vertices) by the line a·u + b·v + c = 0 into the part where
 // the value is ≥ 0 (front) and where it is < 0 (behind), appending each part's vertices.
 // A crossing point is computed from the edge's end of greater u (then greater v), whichever
