@@ -91,6 +91,37 @@ struct SY_SplitPoint {
     double u, v;
 };
 
+// The value a·u + b·v + c of the line at p; both the split and the test for one use this one
+// expression, so that they put every vertex on the same side.
+inline double SY_LineValue(const double line[3], const SY_SplitPoint& p) {
+    return line[0] * p.u + line[1] * p.v + line[2];
+}
+
+enum class SY_LineSide { kFront, kBehind, kBoth };
+
+// Where the polygon (count ≥ 1 vertices) lies against the line: wholly where the value is ≥ 0,
+// wholly where it is < 0, or on both sides, which is when SY_SplitPolygon gives two parts.
+inline SY_LineSide SY_SideOfLine(const SY_SplitPoint* polygon, int32_t count,
+                                 const double line[3]) {
+    if (line[0] == 0 && line[1] == 0 && line[2] != 0)
+        return line[2] > 0 ? SY_LineSide::kFront : SY_LineSide::kBehind;
+    int32_t inFront = 0;
+    for (int32_t i = 0; i < count; ++i)
+        inFront += SY_LineValue(line, polygon[i]) >= 0;
+    if (inFront == 0) return SY_LineSide::kBehind;
+    return inFront == count ? SY_LineSide::kFront : SY_LineSide::kBoth;
+}
+
+// Whether every point of the box from low to high, and so every vertex of a polygon inside
+// it, gives the line a value < 0, judged from the one corner where the value is greatest. A
+// rounded product or sum never decreases when an operand grows, so no vertex can give a
+// greater value than that corner: the answer agrees with SY_SideOfLine's wherever it is yes.
+inline bool SY_BoxBehindLine(const SY_SplitPoint& low, const SY_SplitPoint& high,
+                             const double line[3]) {
+    const SY_SplitPoint corner{line[0] >= 0 ? high.u : low.u, line[1] >= 0 ? high.v : low.v};
+    return SY_LineValue(line, corner) < 0;
+}
+
 // Splits the convex polygon (count vertices) by the line a·u + b·v + c = 0 into the part where
 // the value is ≥ 0 (front) and where it is < 0 (behind), appending each part's vertices.
 // A crossing point is computed from the edge's end of greater u (then greater v), whichever
@@ -98,13 +129,8 @@ struct SY_SplitPoint {
 template <class Out>
 void SY_SplitPolygon(const SY_SplitPoint* polygon, int32_t count, const double line[3], Out* front,
                      Out* behind) {
-    const double a = line[0], b = line[1], c = line[2];
-    if (a == 0 && b == 0 && c != 0) {
-        Out* whole = c > 0 ? front : behind;
-        whole->insert(whole->end(), polygon, polygon + count);
-        return;
-    }
-    auto value = [&](const SY_SplitPoint& p) { return a * p.u + b * p.v + c; };
+    const double a = line[0], b = line[1];
+    auto value = [&](const SY_SplitPoint& p) { return SY_LineValue(line, p); };
     const SY_SplitPoint* previous = &polygon[count - 1];
     bool previousInFront = value(*previous) >= 0;
     for (int32_t i = 0; i < count; ++i) {

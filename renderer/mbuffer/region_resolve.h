@@ -23,9 +23,9 @@ public:
         vertices_.reserve(64);
         front_.reserve(16);
         behind_.reserve(16);
-        records_.reserve(64);
+        positions_.reserve(64);
         regions_.reserve(16);
-        fresh_.reserve(16);
+        frontToBack_.reserve(16);
         lines_.reserve(8);
     }
 
@@ -41,35 +41,44 @@ public:
 
     // Cuts the pixel into regions for the run with each record's plane given by
     // planeOf(record), an SY_DepthPlane. Writes each record's position into its scratchIndex.
+    // The run must stay in place until AddRegionsTo.
     template <class PlaneOf>
     void Split(F* const* run, int32_t count, PlaneOf&& planeOf) {
+        run_ = run;
+        count_ = count;
         vertices_.clear();
-        records_.clear();
+        positions_.clear();
         regions_.clear();
         for (int32_t i = 0; i < count; ++i)
             run[i]->scratchIndex = static_cast<uint16_t>(i);
         constexpr SY_SplitPoint kSquare[4] = {{0, 0}, {0, 1}, {1, 1}, {1, 0}};
         vertices_.assign(kSquare, kSquare + 4);
-        records_.push_back(run[0]);
-        regions_.push_back({0, 4, 0, 1});
+        regions_.push_back({0, 4, NewSlot(), 1, {0, 0}, {1, 1}});
+        positions_[0] = 0;
         for (int32_t r = 1; r < count; ++r)
             Add(*run[r], planeOf);
     }
 
     // Each region of the last Split, weighted by its area.
-    void AddRegionsTo(SY_RegionAccumulator<Pixel>* sum) const {
+    void AddRegionsTo(SY_RegionAccumulator<Pixel>* sum) {
         for (const Region& region : regions_) {
+            frontToBack_.clear();
+            for (int32_t i = 0; i < region.recordCount; ++i)
+                frontToBack_.push_back(run_[positions_[region.firstRecord + i]]);
             sum->AddRegion(SY_PolygonArea(&vertices_[region.firstVertex], region.vertexCount),
-                           &records_[region.firstRecord], region.recordCount);
+                           frontToBack_.data(), region.recordCount);
         }
     }
 
 private:
-    // A convex piece of the square and the records seen there, front first. Both are ranges of
-    // the shared stores, which only grow during a run.
+    // A convex piece of the square, a range of the shared vertex store, and the records seen
+    // there, front first, by their positions in the run. Each region's list has a slot of its
+    // own, room for the whole run, so that a record goes into it in place; only a region cut
+    // off takes a copy. Both stores only grow during a run.
     struct Region {
         int32_t firstVertex, vertexCount;
         int32_t firstRecord, recordCount;
+        SY_SplitPoint low, high;  // the box around the vertices, for a quick test
     };
     struct CachedLine {
         double line[3];
@@ -83,46 +92,52 @@ private:
     void Add(const F& r, PlaneOf& planeOf) {
         const SY_DepthPlane plane = planeOf(r);
         lines_.assign(r.scratchIndex, CachedLine{{0, 0, 0}, false});
-        fresh_.clear();
         const auto regionCount = static_cast<int32_t>(regions_.size());
         for (int32_t g = 0; g < regionCount; ++g) {
             Region region = regions_[g];
-            int32_t at = region.recordCount;  // where r goes in the list
-            for (int32_t s = 0; s < region.recordCount; ++s) {
-                const double* line = LineOf(plane, *records_[region.firstRecord + s], planeOf);
+            int32_t at = 0;  // where r goes in the list
+            for (; at < region.recordCount; ++at) {
+                const double* line = LineOf(plane, positions_[region.firstRecord + at], planeOf);
+                // Most records are wholly in front of r over the region, as a corner of its box
+                // shows; the vertices are looked at only near where r goes, and only a region
+                // r cuts is copied.
+                if (SY_BoxBehindLine(region.low, region.high, line)) continue;
+                const SY_LineSide side =
+                    SY_SideOfLine(&vertices_[region.firstVertex], region.vertexCount, line);
+                if (side == SY_LineSide::kBehind) continue;
+                if (side == SY_LineSide::kFront) break;
                 front_.clear();
                 behind_.clear();
                 SY_SplitPolygon(&vertices_[region.firstVertex], region.vertexCount, line, &front_,
                                 &behind_);
-                if (front_.empty()) continue;
-                if (behind_.empty()) {
-                    at = s;
-                    break;
-                }
-                Region part = Stored(front_);
-                Insert(region, s, r, &part);
-                fresh_.push_back(part);
-                const Region rest = Stored(behind_);
-                region.firstVertex = rest.firstVertex;
-                region.vertexCount = rest.vertexCount;
+                Region part = Stored(front_, NewSlot());
+                CopyWith(region, at, r, &part);
+                regions_.push_back(part);
+                region = Stored(behind_, region.firstRecord, region.recordCount);
             }
             // Behind an opaque record r is hidden here.
-            if (at == 0 || !records_[region.firstRecord + at - 1]->opaque)
-                Insert(region, at, r, &region);
+            if (at == 0 || !run_[positions_[region.firstRecord + at - 1]]->opaque) {
+                uint16_t* list = &positions_[region.firstRecord];
+                const int32_t kept = r.opaque ? at : region.recordCount;
+                std::copy_backward(list + at, list + kept, list + kept + 1);
+                list[at] = r.scratchIndex;
+                region.recordCount = kept + 1;
+            }
             regions_[g] = region;
         }
         // Each new region goes to the front of the list, the last one made first.
-        regions_.insert(regions_.begin(), fresh_.rbegin(), fresh_.rend());
+        std::reverse(regions_.begin() + regionCount, regions_.end());
+        std::rotate(regions_.begin(), regions_.begin() + regionCount, regions_.end());
     }
 
-    // a·u + b·v + c = zR − zS over the square; a record wholly in front of S (level with it
-    // counting as in front, as later records of equal key are) or wholly behind it gives a
-    // line that leaves the whole region on one side.
+    // a·u + b·v + c = zR − zS over the square for S at `position` in the run; a record wholly
+    // in front of S (level with it counting as in front, as later records of equal key are) or
+    // wholly behind it gives a line that leaves the whole region on one side.
     template <class PlaneOf>
-    const double* LineOf(const SY_DepthPlane& plane, const F& s, PlaneOf& planeOf) {
-        CachedLine& cached = lines_[s.scratchIndex];
+    const double* LineOf(const SY_DepthPlane& plane, uint16_t position, PlaneOf& planeOf) {
+        CachedLine& cached = lines_[position];
         if (!cached.known) {
-            const SY_DepthPlane other = planeOf(s);
+            const SY_DepthPlane other = planeOf(*run_[position]);
             const SY_CornerDifferences d = SY_DifferenceAtCorners(other, plane);
             const double lowest = std::min({d.e[0], d.e[1], d.e[2], d.e[3]});
             const double highest = std::max({d.e[0], d.e[1], d.e[2], d.e[3]});
@@ -136,30 +151,48 @@ private:
         return cached.line;
     }
 
-    // A region of the polygon, its records still to be set.
-    Region Stored(const SY_AccountedVector<SY_SplitPoint>& polygon) {
-        const auto first = static_cast<int32_t>(vertices_.size());
+    // A region of the polygon showing the list at firstRecord.
+    Region Stored(const SY_AccountedVector<SY_SplitPoint>& polygon, int32_t firstRecord,
+                  int32_t recordCount = 0) {
+        Region region{static_cast<int32_t>(vertices_.size()),
+                      static_cast<int32_t>(polygon.size()),
+                      firstRecord,
+                      recordCount,
+                      polygon[0],
+                      polygon[0]};
+        for (const SY_SplitPoint& p : polygon) {
+            region.low = {std::min(region.low.u, p.u), std::min(region.low.v, p.v)};
+            region.high = {std::max(region.high.u, p.u), std::max(region.high.v, p.v)};
+        }
         vertices_.insert(vertices_.end(), polygon.begin(), polygon.end());
-        return {first, static_cast<int32_t>(polygon.size()), 0, 0};
+        return region;
+    }
+
+    // Room for a list of the whole run; its first index.
+    int32_t NewSlot() {
+        const auto first = static_cast<int32_t>(positions_.size());
+        positions_.resize(positions_.size() + static_cast<size_t>(count_));
+        return first;
     }
 
     // Gives *to the list of `from` with r put before its record `at`, without the records
     // behind r when r is opaque.
-    void Insert(const Region& from, int32_t at, const F& r, Region* to) {
-        const auto first = static_cast<int32_t>(records_.size());
-        const int32_t end = r.opaque ? at : from.recordCount;
-        for (int32_t i = 0; i < end; ++i) {
-            if (i == at) records_.push_back(&r);
-            const F* kept = records_[from.firstRecord + i];
-            records_.push_back(kept);
-        }
-        if (end == at) records_.push_back(&r);
-        to->firstRecord = first;
-        to->recordCount = static_cast<int32_t>(records_.size()) - first;
+    void CopyWith(const Region& from, int32_t at, const F& r, Region* to) {
+        const uint16_t* list = &positions_[from.firstRecord];
+        uint16_t* copy = &positions_[to->firstRecord];
+        std::copy(list, list + at, copy);
+        copy[at] = r.scratchIndex;
+        const int32_t kept = r.opaque ? at : from.recordCount;
+        std::copy(list + at, list + kept, copy + at + 1);
+        to->recordCount = kept + 1;
     }
 
     SY_AccountedVector<SY_SplitPoint> vertices_, front_, behind_;
-    SY_AccountedVector<const F*> records_;
-    SY_AccountedVector<Region> regions_, fresh_;
-    SY_AccountedVector<CachedLine> lines_;  // by the earlier record's scratchIndex
+    SY_AccountedVector<uint16_t> positions_;  // the regions' lists, a slot of count_ each
+    // New regions are made at the end of the list and then moved to its front.
+    SY_AccountedVector<Region> regions_;
+    SY_AccountedVector<const F*> frontToBack_;  // one region's records, to composite them
+    SY_AccountedVector<CachedLine> lines_;      // by the earlier record's position
+    F* const* run_ = nullptr;
+    int32_t count_ = 0;
 };

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdint>
 #include <numeric>
 
@@ -43,6 +44,39 @@ TEST(MBufferAA, CrossingLayersShareEachPixelByArea) {
     }
     const PF_PixelFloat& meeting = world.At(24, 0);
     EXPECT_GT(std::min({meeting.red, meeting.green, meeting.blue}), 0.04f);
+}
+
+// Five half-transparent layers turned about one vertical line through the pixel's centre
+// (z = s · (X − 0.5) + t · (Y − 0.5)): every pair crosses inside the pixel, so a new layer
+// lands in the middle of lists already cut many times. At each of 256² points a layer with n
+// layers in front shows by 0.5ⁿ⁺¹ of its red, over an alpha of 1 − 0.5⁵; the area average may
+// differ by the lines' length / 256.
+TEST(MBufferAA, ManyLayersCrossingInOnePixel) {
+    constexpr int32_t kLayers = 5, kSide = 256;
+    const float slope[kLayers][2] = {{-3, .2f}, {-1, -.1f}, {-.5f, .05f}, {.5f, .3f}, {2, 0}};
+    SY_MBufferAAX<PF_PixelFloat> buffer({0, 0, 1, 1});
+    PF_PixelFloat color[kLayers];
+    for (int32_t k = 0; k < kLayers; ++k) {
+        color[k] = {0.5f, k / 4.0f, 0, 0};
+        const float key = -0.5f * (std::fabs(slope[k][0]) + std::fabs(slope[k][1]));  // lowest z
+        buffer.AddFragment(&color[k], 1.0f, 2, key, slope[k][0], slope[k][1], buffer.HeadAt(0, 0),
+                           0);
+    }
+    PF_WorldX<PF_PixelFloat> world(1, 1);
+    buffer.Resolve(nullptr, nullptr, world);
+    double want = 0;
+    for (int32_t i = 0; i < kSide * kSide; ++i) {
+        const double u = (i % kSide + 0.5) / kSide - 0.5, v = (i / kSide + 0.5) / kSide - 0.5;
+        auto z = [&](int32_t k) { return slope[k][0] * u + slope[k][1] * v; };
+        for (int32_t k = 0; k < kLayers; ++k) {
+            double share = 0.5 / (kSide * kSide * (31.0 / 32));
+            for (int32_t j = 0; j < kLayers; ++j)
+                share *= z(j) > z(k) ? 0.5 : 1.0;
+            want += share * color[k].red;
+        }
+    }
+    EXPECT_FLOAT_EQ(world.At(0, 0).alpha, 31.0f / 32);
+    EXPECT_NEAR(world.At(0, 0).red, want, 4.0 / kSide);
 }
 
 }  // namespace
