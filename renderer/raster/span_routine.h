@@ -6,6 +6,9 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
+#include <cstring>
+
+#include <emmintrin.h>
 
 #include "pf_pixel.h"
 #include "pf_xfer.h"
@@ -70,22 +73,68 @@ SY_Coverage<P> MatteCoverage(typename PF_PixelTraits<P>::Channel matte, SY_Cover
         return static_cast<uint8_t>((uint32_t{matte} * layer + 127) / 255);
 }
 
+// A pixel's four channels (alpha, red, green, blue) as floats, and back; stored values are in
+// the channel's range and whole for integer channels.
+template <class P>
+__m128 LoadChannels(const P& texel) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat) {
+        return _mm_loadu_ps(&texel.alpha);
+    } else {
+        const __m128i zero = _mm_setzero_si128();
+        __m128i v;
+        if constexpr (Traits::kBitDepth == 16) {
+            v = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(&texel));
+        } else {
+            uint32_t bytes;
+            std::memcpy(&bytes, &texel, sizeof bytes);
+            v = _mm_unpacklo_epi8(_mm_cvtsi32_si128(static_cast<int>(bytes)), zero);
+        }
+        return _mm_cvtepi32_ps(_mm_unpacklo_epi16(v, zero));
+    }
+}
+
+template <class P>
+void StoreChannels(__m128 c, P* texel) {
+    using Traits = PF_PixelTraits<P>;
+    if constexpr (Traits::kIsFloat) {
+        _mm_storeu_ps(&texel->alpha, c);
+    } else {
+        __m128i v = _mm_cvttps_epi32(c);
+        if constexpr (Traits::kBitDepth == 16) {
+            // The low halves of the four lanes; a signed pack would turn 32768 into 32767.
+            v = _mm_shufflehi_epi16(_mm_shufflelo_epi16(v, _MM_SHUFFLE(3, 3, 2, 0)),
+                                    _MM_SHUFFLE(3, 3, 2, 0));
+            _mm_storel_epi64(reinterpret_cast<__m128i*>(texel),
+                             _mm_shuffle_epi32(v, _MM_SHUFFLE(3, 3, 2, 0)));
+        } else {
+            v = _mm_packus_epi16(_mm_packs_epi32(v, v), v);
+            const uint32_t bytes = static_cast<uint32_t>(_mm_cvtsi128_si32(v));
+            std::memcpy(texel, &bytes, sizeof bytes);
+        }
+    }
+}
+
 // texel × diffuse + specular, with specular in units of the channel maximum; integer channels
-// round and clamp, float channels keep their range.
+// round and clamp, float channels keep their range. The three colour channels share one vector
+// and take the same float operations, in the same order, as each alone; alpha passes unchanged.
 template <class P>
 void ApplyLighting(const SY_Lighting& light, P* texel) {
     using Traits = PF_PixelTraits<P>;
-    using C = typename Traits::Channel;
-    C* channels[3] = {&texel->red, &texel->green, &texel->blue};
-    for (int k = 0; k < 3; ++k) {
-        float c = static_cast<float>(*channels[k]) * light.diffuse[k];
-        if constexpr (Traits::kIsFloat) {
-            *channels[k] = c + light.specular[k];
-        } else {
-            c += 0.5f + light.specular[k] * Traits::kMax;
-            *channels[k] = static_cast<C>(std::clamp(c, 0.0f, Traits::kMax));
-        }
+    const __m128 t = LoadChannels(*texel);
+    // Lane 0, alpha's, is a don't-care in both: it is put back from the texel at the end.
+    __m128 diffuse = _mm_loadu_ps(light.diffuse);
+    diffuse = _mm_shuffle_ps(diffuse, diffuse, _MM_SHUFFLE(2, 1, 0, 0));
+    const __m128 specular = _mm_loadu_ps(&light.diffuse[2]);
+    __m128 c = _mm_mul_ps(t, diffuse);
+    if constexpr (Traits::kIsFloat) {
+        c = _mm_add_ps(c, specular);
+    } else {
+        const __m128 max = _mm_set1_ps(Traits::kMax);
+        c = _mm_add_ps(c, _mm_add_ps(_mm_set1_ps(0.5f), _mm_mul_ps(specular, max)));
+        c = _mm_min_ps(_mm_max_ps(c, _mm_setzero_ps()), max);
     }
+    StoreChannels(_mm_move_ss(c, t), texel);
 }
 
 // One pixel on its way from the sampler to the delivery.
