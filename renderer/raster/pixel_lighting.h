@@ -41,7 +41,7 @@ struct PixelLighting {
             v[k] = L::Splat(shader.eye[k]) - p[k];
         Real lengthSquared = SY_Dot<L>(v, v);
         if (L::Any(L::Less(lengthSquared, L::Splat(1e-48)))) SY_ThrowZeroLengthVector();
-        Real inverse = L::Splat(1.0) / L::Sqrt(lengthSquared);
+        Real inverse = SY_InverseSqrt<L>(lengthSquared);
         for (int k = 0; k < 3; ++k)
             v[k] = v[k] * inverse;
     }
@@ -80,7 +80,7 @@ struct PixelLighting {
             // A light on the surface point has no direction: it is left out, not reported.
             active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
             if (L::None(active)) return;
-            Real inverse = L::Splat(1.0) / L::Sqrt(distanceSquared);
+            Real inverse = SY_InverseSqrt<L>(distanceSquared);
             for (int k = 0; k < 3; ++k)
                 l[k] = l[k] * inverse;
         }
