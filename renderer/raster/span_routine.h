@@ -122,10 +122,11 @@ template <class P>
 void ApplyLighting(const SY_Lighting& light, P* texel) {
     using Traits = PF_PixelTraits<P>;
     const __m128 t = LoadChannels(*texel);
-    // Lane 0, alpha's, is a don't-care in both: it is put back from the texel at the end.
-    __m128 diffuse = _mm_loadu_ps(light.diffuse);
-    diffuse = _mm_shuffle_ps(diffuse, diffuse, _MM_SHUFFLE(2, 1, 0, 0));
-    const __m128 specular = _mm_loadu_ps(&light.diffuse[2]);
+    // Built from single floats: a wider load across the lighting's separate stores would wait
+    // for them to reach the cache. Lane 0, alpha's, is put back from the texel at the end.
+    const __m128 diffuse = _mm_setr_ps(1.0f, light.diffuse[0], light.diffuse[1], light.diffuse[2]);
+    const __m128 specular =
+        _mm_setr_ps(0.0f, light.specular[0], light.specular[1], light.specular[2]);
     __m128 c = _mm_mul_ps(t, diffuse);
     if constexpr (Traits::kIsFloat) {
         c = _mm_add_ps(c, specular);
