@@ -86,6 +86,6 @@ private:
 }  // namespace
 
 void SY_LayerShader::LightFourPixels(const double* const p[4], const double n[3],
-                                     SY_Lighting* const out[4]) const {
-    sy_lighting::Light<SY_FourLanes>(*this, p, n, out);
+                                     SY_Lighting* const out[4], SY_LightSet reaching) const {
+    sy_lighting::Light<SY_FourLanes>(*this, p, n, out, reaching);
 }

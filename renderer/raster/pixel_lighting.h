@@ -18,10 +18,12 @@ struct PixelLighting {
 
     // Every lane array is written before it is read: Light() sets the points and the normal,
     // Run() the terms. Left unset here, as clearing them cost a string store on every pixel.
-    explicit PixelLighting(const SY_LayerShader& layerShader) : shader(layerShader) {}
+    PixelLighting(const SY_LayerShader& layerShader, SY_LightSet lightsReaching)
+        : shader(layerShader), reaching(lightsReaching) {}
 
     const SY_LayerShader& shader;
-    Real p[3];  // surface points; read only when the shader needs them
+    SY_LightSet reaching;  // the lit path leaves the other lights out
+    Real p[3];             // surface points; read only when the shader needs them
     Real n[3];
     Single diffuse[3];
     Single specular[3];
@@ -51,7 +53,9 @@ struct PixelLighting {
             diffuse[c] = specular[c] = L::SplatSingle(0.0f);
         Real v[3] = {L::Splat(0.0), L::Splat(0.0), L::Splat(0.0)};
         if (shader.needsPoint) ViewVector(v);
-        for (const SY_LightState* light : shader.lights) {
+        for (int32_t i = 0; i < shader.lights.Count(); ++i) {
+            const SY_LightState* light = shader.lights[i];
+            if (i < 64 && !((reaching >> i) & 1)) continue;
             if (light->type == kSY_LightAmbient) {
                 if (shader.material.ambient == 0.0) continue;
                 for (int c = 0; c < 3; ++c) {
@@ -226,8 +230,8 @@ struct PixelLighting {
 
 template <class L>
 void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
-           SY_Lighting* const out[L::kCount], bool shadowsOnly = false) {
-    PixelLighting<L> lighting(shader);
+           SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
+    PixelLighting<L> lighting(shader, reaching);
     for (int k = 0; k < 3; ++k) {
         // Without the need the span routine does not work out the points.
         lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);

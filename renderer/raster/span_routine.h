@@ -217,15 +217,15 @@ template <class State>
 // the span loop stays small.
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
-                                  const double normal[3], const bool (&taken)[kPairs],
-                                  Pixel<P>* pixels) {
+                                  SY_LightSet reaching, const double normal[3],
+                                  const bool (&taken)[kPairs], Pixel<P>* pixels) {
     SY_Lighting light[2 * kPairs];
     if constexpr (kPairs == 2) {
         if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
             const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
                                              pixels[3].point};
             SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
-            shader.LightFourPixels(points, normal, outs);
+            shader.LightFourPixels(points, normal, outs, reaching);
             for (int k = 0; k < 4; ++k)
                 ApplyLighting(light[k], &pixels[k].texel);
             return;
@@ -235,14 +235,34 @@ template <int kPairs, class P>
         if (!taken[pair]) continue;
         Pixel<P>* two = pixels + 2 * pair;
         if (lanes != SY_LightingLanes::kOne) {
-            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1]);
+            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1],
+                                  reaching);
         } else {
-            shader.LightOnePixel(two[0].point, normal, &light[0]);
-            shader.LightOnePixel(two[1].point, normal, &light[1]);
+            shader.LightOnePixel(two[0].point, normal, &light[0], reaching);
+            shader.LightOnePixel(two[1].point, normal, &light[1], reaching);
         }
         ApplyLighting(light[0], &two[0].texel);
         ApplyLighting(light[1], &two[1].texel);
     }
+}
+
+// The lights that can reach the count pixels from the state's position on, from the layer
+// points of the first and the last. The points the loop steps to stray from that segment by
+// the rounding of the float ray steps, a few parts in 1e8 of their size per step.
+template <class State>
+SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
+                               const SY_SpanRayState& ray, int32_t count) {
+    const SY_SpanMapping& m = FirstMapping(state);
+    const double steps = count - 1;
+    const double lastInvW = state.texture.perspective ? 1.0 / (m.w + steps * m.dwdx) : m.invW;
+    if (!(m.invW > 0) || !(lastInvW > 0)) return kSY_AllLights;
+    double first[3], last[3], size = 0;
+    for (int k = 0; k < 3; ++k) {
+        first[k] = ray.d[k] * m.invW;
+        last[k] = (ray.d[k] + steps * ray.sx[k]) * lastInvW;
+        size += std::fabs(first[k]) + std::fabs(last[k]);
+    }
+    return shader.LightsReaching(first, last, ray.normal, (1e-6 + 1e-7 * count) * size);
 }
 
 }  // namespace sy_span
@@ -266,6 +286,9 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
+    const SY_LightSet reaching = setup.shaded && setup.needsPoint
+                                     ? LightsReachingSpan(shader, state, ray, count)
+                                     : kSY_AllLights;
 
     Pixel<P> pixels[4];
     int32_t i = 0;
@@ -286,7 +309,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                     Advance(setup.needsPoint, state, ray);
                 }
             }
-            if (setup.shaded) LightPairs(shader, lanes, ray.normal, taken, pixels);
+            if (setup.shaded) LightPairs(shader, lanes, reaching, ray.normal, taken, pixels);
             for (int k = 0; k < 2 * kPairs; ++k) {
                 if (taken[k / 2] && !pixels[k].skipped)
                     delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
@@ -303,7 +326,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
         if (pixels[0].skipped) return;
         if (setup.shaded) {
             SY_Lighting light;
-            shader.LightOnePixel(pixels[0].point, ray.normal, &light);
+            shader.LightOnePixel(pixels[0].point, ray.normal, &light, reaching);
             ApplyLighting(light, &pixels[0].texel);
         }
         delivery.Deliver(x + i, pixels[0].texel, pixels[0].coverage, pixels[0].depth, thread);
