@@ -232,10 +232,16 @@ template <class L>
 void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
            SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
     PixelLighting<L> lighting(shader, reaching);
-    for (int k = 0; k < 3; ++k) {
-        // Without the need the span routine does not work out the points.
-        lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);
+    for (int k = 0; k < 3; ++k)
         lighting.n[k] = L::Splat(n[k]);
+    // Without the need the span routine does not work out the points. Two loops, not a choice
+    // per coordinate, which the compiler turned into clearing the points with a string store.
+    if (shader.needsPoint) {
+        for (int k = 0; k < 3; ++k)
+            lighting.p[k] = L::Load(p, k);
+    } else {
+        for (int k = 0; k < 3; ++k)
+            lighting.p[k] = L::Splat(0.0);
     }
     lighting.Run(shadowsOnly);
     lighting.Store(out);
