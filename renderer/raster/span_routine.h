@@ -119,7 +119,7 @@ void StoreChannels(__m128 c, P* texel) {
 // round and clamp, float channels keep their range. The three colour channels share one vector
 // and take the same float operations, in the same order, as each alone; alpha passes unchanged.
 template <class P>
-void ApplyLighting(const SY_Lighting& light, P* texel) {
+[[gnu::always_inline]] inline void ApplyLighting(const SY_Lighting& light, P* texel) {
     using Traits = PF_PixelTraits<P>;
     const __m128 t = LoadChannels(*texel);
     // Built from single floats: a wider load across the lighting's separate stores would wait
