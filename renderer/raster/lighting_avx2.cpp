@@ -86,6 +86,10 @@ private:
 }  // namespace
 
 void SY_LayerShader::LightFourPixels(const double* const p[4], const double n[3],
-                                     SY_Lighting* const out[4], SY_LightSet reaching) const {
-    sy_lighting::Light<SY_FourLanes>(*this, p, n, out, reaching);
+                                     SY_FourLightings* out, SY_LightSet reaching) const {
+    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, p, n, reaching);
+    for (int c = 0; c < 3; ++c) {
+        _mm_store_ps(out->diffuse[c], lighting.diffuse[c]);
+        _mm_store_ps(out->specular[c], lighting.specular[c]);
+    }
 }

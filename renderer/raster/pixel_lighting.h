@@ -228,9 +228,10 @@ struct PixelLighting {
     }
 };
 
+// The lighting of L::kCount points of the layer, left in the lanes of the returned terms.
 template <class L>
-void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
-           SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
+PixelLighting<L> Lit(const SY_LayerShader& shader, const double* const p[L::kCount],
+                     const double n[3], SY_LightSet reaching, bool shadowsOnly = false) {
     PixelLighting<L> lighting(shader, reaching);
     for (int k = 0; k < 3; ++k)
         lighting.n[k] = L::Splat(n[k]);
@@ -244,7 +245,13 @@ void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const
             lighting.p[k] = L::Splat(0.0);
     }
     lighting.Run(shadowsOnly);
-    lighting.Store(out);
+    return lighting;
+}
+
+template <class L>
+void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
+           SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
+    Lit<L>(shader, p, n, reaching, shadowsOnly).Store(out);
 }
 
 }  // namespace sy_lighting

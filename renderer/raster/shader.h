@@ -68,6 +68,12 @@ struct SY_Lighting {
     float specular[3];
 };
 
+// The lighting of four pixels, channel by channel: diffuse[c][i] is channel c of pixel i's.
+struct SY_FourLightings {
+    alignas(16) float diffuse[3][4];
+    alignas(16) float specular[3][4];
+};
+
 // A set of a layer's lights: bit i for light i. Lights from the 64th on are always in a set.
 using SY_LightSet = uint64_t;
 inline constexpr SY_LightSet kSY_AllLights = ~SY_LightSet{0};
@@ -90,7 +96,7 @@ public:
                         SY_LightSet reaching = kSY_AllLights) const;
     // Four points at once, bit for bit as four calls of LightOnePixel; only where
     // SY_WidestLightingLanes() gives kFour.
-    void LightFourPixels(const double* const p[4], const double n[3], SY_Lighting* const out[4],
+    void LightFourPixels(const double* const p[4], const double n[3], SY_FourLightings* out,
                          SY_LightSet reaching = kSY_AllLights) const;
     // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
     // for layers drawn from an image, which are not lit.

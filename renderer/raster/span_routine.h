@@ -8,9 +8,10 @@
 #include <cstdint>
 #include <cstring>
 
-#include <emmintrin.h>
+#include <smmintrin.h>
 
 #include "pf_pixel.h"
+#include "pf_vec4.h"
 #include "pf_xfer.h"
 #include "renderer/raster/samplers.h"
 #include "renderer/raster/shader.h"
@@ -73,69 +74,47 @@ SY_Coverage<P> MatteCoverage(typename PF_PixelTraits<P>::Channel matte, SY_Cover
         return static_cast<uint8_t>((uint32_t{matte} * layer + 127) / 255);
 }
 
-// A pixel's four channels (alpha, red, green, blue) as floats, and back; stored values are in
-// the channel's range and whole for integer channels.
-template <class P>
-__m128 LoadChannels(const P& texel) {
-    using Traits = PF_PixelTraits<P>;
-    if constexpr (Traits::kIsFloat) {
-        return _mm_loadu_ps(&texel.alpha);
-    } else {
-        const __m128i zero = _mm_setzero_si128();
-        __m128i v;
-        if constexpr (Traits::kBitDepth == 16) {
-            v = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(&texel));
-        } else {
-            uint32_t bytes;
-            std::memcpy(&bytes, &texel, sizeof bytes);
-            v = _mm_unpacklo_epi8(_mm_cvtsi32_si128(static_cast<int>(bytes)), zero);
-        }
-        return _mm_cvtepi32_ps(_mm_unpacklo_epi16(v, zero));
-    }
-}
-
+// A pixel's four channels (alpha, red, green, blue) from floats that are in the channel's
+// range, and whole for integer channels.
 template <class P>
 void StoreChannels(__m128 c, P* texel) {
     using Traits = PF_PixelTraits<P>;
     if constexpr (Traits::kIsFloat) {
         _mm_storeu_ps(&texel->alpha, c);
     } else {
-        __m128i v = _mm_cvttps_epi32(c);
+        const __m128i v = _mm_cvttps_epi32(c);
         if constexpr (Traits::kBitDepth == 16) {
-            // The low halves of the four lanes; a signed pack would turn 32768 into 32767.
-            v = _mm_shufflehi_epi16(_mm_shufflelo_epi16(v, _MM_SHUFFLE(3, 3, 2, 0)),
-                                    _MM_SHUFFLE(3, 3, 2, 0));
-            _mm_storel_epi64(reinterpret_cast<__m128i*>(texel),
-                             _mm_shuffle_epi32(v, _MM_SHUFFLE(3, 3, 2, 0)));
+            _mm_storel_epi64(reinterpret_cast<__m128i*>(texel), _mm_packus_epi32(v, v));
         } else {
-            v = _mm_packus_epi16(_mm_packs_epi32(v, v), v);
-            const uint32_t bytes = static_cast<uint32_t>(_mm_cvtsi128_si32(v));
+            const __m128i shorts = _mm_packs_epi32(v, v);
+            const uint32_t bytes =
+                static_cast<uint32_t>(_mm_cvtsi128_si32(_mm_packus_epi16(shorts, shorts)));
             std::memcpy(texel, &bytes, sizeof bytes);
         }
     }
 }
 
-// texel × diffuse + specular, with specular in units of the channel maximum; integer channels
-// round and clamp, float channels keep their range. The three colour channels share one vector
-// and take the same float operations, in the same order, as each alone; alpha passes unchanged.
+// texel × diffuse + specular on four lanes, with specular in units of the channel maximum;
+// integer channels round and clamp, float channels keep their range. Each lane takes the same
+// float operations, in the same order, as one channel alone would.
+template <class P>
+__m128 LitChannels(__m128 texel, __m128 diffuse, __m128 specular) {
+    using Traits = PF_PixelTraits<P>;
+    const __m128 c = _mm_mul_ps(texel, diffuse);
+    if constexpr (Traits::kIsFloat) return _mm_add_ps(c, specular);
+    const __m128 max = _mm_set1_ps(Traits::kMax);
+    const __m128 lit = _mm_add_ps(c, _mm_add_ps(_mm_set1_ps(0.5f), _mm_mul_ps(specular, max)));
+    return _mm_min_ps(_mm_max_ps(lit, _mm_setzero_ps()), max);
+}
+
+// One pixel's lighting, its three colour channels in one vector; alpha passes unchanged.
 template <class P>
 [[gnu::always_inline]] inline void ApplyLighting(const SY_Lighting& light, P* texel) {
-    using Traits = PF_PixelTraits<P>;
-    const __m128 t = LoadChannels(*texel);
-    // Built from single floats: a wider load across the lighting's separate stores would wait
-    // for them to reach the cache. Lane 0, alpha's, is put back from the texel at the end.
+    const __m128 t = PF_LoadFloat4(*texel);
     const __m128 diffuse = _mm_setr_ps(1.0f, light.diffuse[0], light.diffuse[1], light.diffuse[2]);
     const __m128 specular =
         _mm_setr_ps(0.0f, light.specular[0], light.specular[1], light.specular[2]);
-    __m128 c = _mm_mul_ps(t, diffuse);
-    if constexpr (Traits::kIsFloat) {
-        c = _mm_add_ps(c, specular);
-    } else {
-        const __m128 max = _mm_set1_ps(Traits::kMax);
-        c = _mm_add_ps(c, _mm_add_ps(_mm_set1_ps(0.5f), _mm_mul_ps(specular, max)));
-        c = _mm_min_ps(_mm_max_ps(c, _mm_setzero_ps()), max);
-    }
-    StoreChannels(_mm_move_ss(c, t), texel);
+    StoreChannels(_mm_move_ss(LitChannels<P>(t, diffuse, specular), t), texel);
 }
 
 // One pixel on its way from the sampler to the delivery.
@@ -147,6 +126,23 @@ struct Pixel {
     double point[3];         // surface point, when lighting needs it
     SY_FragmentDepth depth;  // set only for deliveries that use it
 };
+
+// Four pixels' lighting, channel by channel as the lighting gives it: the texels turned into
+// channel planes, lit a plane at a time and turned back; alpha passes unchanged.
+template <class P>
+[[gnu::always_inline]] inline void ApplyLighting(const SY_FourLightings& light, Pixel<P>* pixels) {
+    __m128 t[4];
+    for (int i = 0; i < 4; ++i)
+        t[i] = PF_LoadFloat4(pixels[i].texel);
+    _MM_TRANSPOSE4_PS(t[0], t[1], t[2], t[3]);
+    for (int c = 0; c < 3; ++c) {
+        t[1 + c] =
+            LitChannels<P>(t[1 + c], _mm_load_ps(light.diffuse[c]), _mm_load_ps(light.specular[c]));
+    }
+    _MM_TRANSPOSE4_PS(t[0], t[1], t[2], t[3]);
+    for (int i = 0; i < 4; ++i)
+        StoreChannels(t[i], &pixels[i].texel);
+}
 
 // The per-span constants of the loop.
 template <class P>
@@ -224,10 +220,9 @@ template <int kPairs, class P>
         if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
             const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
                                              pixels[3].point};
-            SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
-            shader.LightFourPixels(points, normal, outs, reaching);
-            for (int k = 0; k < 4; ++k)
-                ApplyLighting(light[k], &pixels[k].texel);
+            SY_FourLightings four;
+            shader.LightFourPixels(points, normal, &four, reaching);
+            ApplyLighting(four, pixels);
             return;
         }
     }

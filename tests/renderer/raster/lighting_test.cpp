@@ -101,10 +101,14 @@ void ExpectFourLikeOne(const SY_LayerShader& shader, double x) {
     const double p[4][3] = {{x, 0, 0}, {x + 150, -40, 0}, {x - 70, 90, 0}, {x + 20, 300, 0}};
     const double* const points[4] = {p[0], p[1], p[2], p[3]};
     SY_Lighting alone[4], four[4];
-    SY_Lighting* const outs[4] = {&four[0], &four[1], &four[2], &four[3]};
+    SY_FourLightings lanes;
     for (int i = 0; i < 4; ++i)
         shader.LightOnePixel(p[i], kFront, &alone[i]);
-    shader.LightFourPixels(points, kFront, outs);
+    shader.LightFourPixels(points, kFront, &lanes);
+    for (int i = 0; i < 4; ++i) {
+        four[i] = {{lanes.diffuse[0][i], lanes.diffuse[1][i], lanes.diffuse[2][i]},
+                   {lanes.specular[0][i], lanes.specular[1][i], lanes.specular[2][i]}};
+    }
     EXPECT_EQ(std::memcmp(alone, four, sizeof alone), 0) << "four at " << x;
 }
 
