@@ -95,8 +95,9 @@ struct PixelLighting {
         if (shader.material.lightTransmission == 0.0) {
             active = L::AndNot(behind, active);
             if (L::None(active)) return;
+        } else {
+            facing = L::Select(behind, -facing, facing);
         }
-        facing = L::Select(behind, -facing, facing);
 
         Single spot = L::SplatSingle(1.0f);
         if (light.type == kSY_LightSpot) {
@@ -107,7 +108,10 @@ struct PixelLighting {
             if (L::None(active)) return;
             spot = SY_SpotEdge<L>(light, c);
         }
-        Single k = spot * SY_Falloff<L>(light, distanceSquared);
+        // The falloff is looked at only where it can be other than 1: a call for nothing costs
+        // the registers it makes the caller save.
+        Single k =
+            SY_FalloffUsesDistance(light) ? spot * SY_Falloff<L>(light, distanceSquared) : spot;
         if (shader.material.lightTransmission != 0.0) {
             k = L::SelectSingle(
                 behind, k * L::SplatSingle(static_cast<float>(shader.material.lightTransmission)),
