@@ -1,15 +1,13 @@
 // Lane packs for the lighting routines: one pixel in plain doubles and floats, or two pixels side
 // by side in SSE2 registers. The lighting is written once over these, so both forms run the same
 // operations in the same order on every lane and agree bit for bit: every operation used here is
-// correctly rounded IEEE arithmetic in both its scalar and its packed instruction, and the one
-// estimate, the reciprocal square root, comes from the same table in its scalar and packed forms.
+// correctly rounded IEEE arithmetic in both its scalar and its packed instruction.
 #pragma once
 
 #include <cmath>
 #include <cstdint>
 
 #include <emmintrin.h>
-#include <xmmintrin.h>
 
 // One pixel. Masks are plain booleans, so after a `None` test the compiler drops the selects.
 struct SY_OneLane {
@@ -26,10 +24,6 @@ struct SY_OneLane {
     static Single FromLanes(const float lanes[kCount]) { return lanes[0]; }
 
     static Real Sqrt(Real v) { return std::sqrt(v); }
-    // The processor's 12-bit estimate of 1/√v, for v in float range.
-    static Real InverseSqrtEstimate(Real v) {
-        return _mm_cvtss_f32(_mm_rsqrt_ss(_mm_set_ss(static_cast<float>(v))));
-    }
     static Single ToSingle(Real v) { return static_cast<float>(v); }
     static Real ToReal(Single v) { return v; }
     static Single Max(Single a, Single b) { return a > b ? a : b; }
@@ -85,7 +79,6 @@ struct SY_TwoLanes {
     }
 
     static Real Sqrt(Real v) { return _mm_sqrt_pd(v); }
-    static Real InverseSqrtEstimate(Real v) { return _mm_cvtps_pd(_mm_rsqrt_ps(_mm_cvtpd_ps(v))); }
     static Single ToSingle(Real v) { return _mm_cvtpd_ps(v); }
     static Real ToReal(Single v) { return _mm_cvtps_pd(v); }
     static Single Max(Single a, Single b) {

@@ -20,22 +20,6 @@ typename L::Real SY_Dot(const typename L::Real a[3], const typename L::Real b[3]
     return a[0] * b[0] + a[1] * b[1] + a[2] * b[2];
 }
 
-// 1/√x to about 1e-13 relative: the processor's float estimate refined by two Newton steps in
-// doubles, which is much cheaper than a square root and a division. Lanes outside the range in
-// which the estimate can be made in floats take the exact form instead.
-template <class L>
-typename L::Real SY_InverseSqrt(typename L::Real x) {
-    using Real = typename L::Real;
-    const Real threeHalves = L::Splat(1.5);
-    const Real halfX = L::Splat(0.5) * x;
-    Real y = L::InverseSqrtEstimate(x);
-    y = y * (threeHalves - halfX * y * y);
-    y = y * (threeHalves - halfX * y * y);
-    typename L::Mask outside = L::Or(L::Less(x, L::Splat(1e-30)), L::Less(L::Splat(1e30), x));
-    if (L::Any(outside)) y = L::Select(outside, L::Splat(1.0) / L::Sqrt(x), y);
-    return y;
-}
-
 template <class L>
 typename L::Single SY_Smoothstep(typename L::Single t) {
     return t * t * (L::SplatSingle(3.0f) - L::SplatSingle(2.0f) * t);

@@ -33,9 +33,6 @@ struct SY_FourLanes {
     static Single FromLanes(const float lanes[kCount]) { return _mm_loadu_ps(lanes); }
 
     static Real Sqrt(Real v) { return _mm256_sqrt_pd(v); }
-    static Real InverseSqrtEstimate(Real v) {
-        return _mm256_cvtps_pd(_mm_rsqrt_ps(_mm256_cvtpd_ps(v)));
-    }
     static Single ToSingle(Real v) { return _mm256_cvtpd_ps(v); }
     static Real ToReal(Single v) { return _mm256_cvtps_pd(v); }
     static Single Max(Single a, Single b) {

@@ -43,7 +43,7 @@ struct PixelLighting {
             v[k] = L::Splat(shader.eye[k]) - p[k];
         Real lengthSquared = SY_Dot<L>(v, v);
         if (L::Any(L::Less(lengthSquared, L::Splat(1e-48)))) SY_ThrowZeroLengthVector();
-        Real inverse = SY_InverseSqrt<L>(lengthSquared);
+        Real inverse = L::Splat(1.0) / L::Sqrt(lengthSquared);
         for (int k = 0; k < 3; ++k)
             v[k] = v[k] * inverse;
     }
@@ -84,7 +84,7 @@ struct PixelLighting {
             // A light on the surface point has no direction: it is left out, not reported.
             active = L::AndNot(L::Less(distanceSquared, L::Splat(1e-12)), active);
             if (L::None(active)) return;
-            Real inverse = SY_InverseSqrt<L>(distanceSquared);
+            Real inverse = L::Splat(1.0) / L::Sqrt(distanceSquared);
             for (int k = 0; k < 3; ++k)
                 l[k] = l[k] * inverse;
         }

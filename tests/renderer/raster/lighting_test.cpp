@@ -3,11 +3,9 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
-#include <random>
 #include <tuple>
 #include <vector>
 
-#include "renderer/raster/pixel_lighting.h"
 #include "renderer/raster/shader.h"
 #include "renderer/scene/render_context.h"
 #include "renderer/scene/renderable.h"
@@ -249,40 +247,6 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
     EXPECT_GT(front.diffuse[0], 0);
     EXPECT_GT(front.specular[0], 0);
     EXPECT_EQ(std::memcmp(&front, &back, sizeof front), 0);
-}
-
-// The reference takes every 1/√ in full double precision where the lighting refines a float
-// estimate. Over points spread about the layer, under a spot with a sharp edge (g = 2000), a
-// falloff of each kind, a light behind the layer and a narrow highlight, the two differ by less
-// than half a code at 8 and at 16 bits, for a texel at the channel maximum.
-TEST(Lighting, WithinHalfACodeOfTheDoublePrecisionReference) {
-    struct Reference : SY_OneLane {
-        static Real InverseSqrtEstimate(Real v) { return 1.0 / std::sqrt(v); }
-    };
-    SY_SpecularTables tables;
-    const SY_LightState lights[] = {Spot(100, -50, -300, 0, 0, -1, 0.9f, 0.9005f),
-                                    Falloff(Light(kSY_LightPoint, -200, 80, -150), 2, 120, 0),
-                                    Falloff(Light(kSY_LightPoint, 50, 300, -90), 1, 100, 200),
-                                    Light(kSY_LightPoint, 30, 40, 250)};
-    auto shader = LitShader({&lights[0], &lights[1], &lights[2], &lights[3]});
-    shader->material.diffuse = 0.8, shader->material.specular = 0.7, shader->material.metal = 0.5;
-    shader->material.lightTransmission = 0.4;
-    shader->specularTable = &tables.ForShininess(80);
-    std::mt19937 random(7);
-    std::uniform_real_distribution<double> across(-400, 400);
-    float worst = 0;
-    for (int i = 0; i < 20000; ++i) {
-        const double p[3] = {across(random), across(random), 0}, *const points[1] = {p};
-        SY_Lighting lit, reference, *const outs[1] = {&reference};
-        shader->LightOnePixel(p, kFront, &lit);
-        sy_lighting::Light<Reference>(*shader, points, kFront, outs, kSY_AllLights);
-        for (int c = 0; c < 3; ++c) {
-            worst = std::max(worst, std::fabs(lit.diffuse[c] - reference.diffuse[c]) +
-                                        std::fabs(lit.specular[c] - reference.specular[c]));
-        }
-    }
-    for (float max : {255.0f, 32768.0f})
-        EXPECT_LT(worst * max, 0.5) << max;
 }
 
 // A light on the surface point has no direction and is left out silently (the paired point
