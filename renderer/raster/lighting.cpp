@@ -34,20 +34,37 @@ double Dot(const double a[3], const double b[3]) {
     return a[0] * b[0] + a[1] * b[1] + a[2] * b[2];
 }
 
-// Whether a light with a position can add anything to the points within `radius` of `centre`
-// on the layer with normal n. Every test leaves a margin far above the rounding of the
-// per-pixel tests it stands for, so a light it drops is one each pixel would drop.
-bool ReachesSphere(const SY_LightState& light, const SY_Material& material, const double centre[3],
-                   double radius, const double n[3]) {
+// A stretch of the layer: its points lie within `slack` of the segment between two points,
+// and so within `radius` of the segment's centre.
+struct Stretch {
+    const double* first;
+    const double* last;
+    double slack;
+    double centre[3];
+    double radius;
+};
+
+// Whether a light with a position can add anything to a stretch of the layer with normal n.
+// Every test leaves a margin far above the rounding of the per-pixel tests it stands for, so a
+// light it drops is one each pixel would drop.
+bool Reaches(const SY_LightState& light, const SY_Material& material, const Stretch& stretch,
+             const double n[3]) {
+    // The light's height over the layer's plane, along n, varies linearly along the stretch.
+    if (material.lightTransmission == 0.0) {
+        double height = -HUGE_VAL;
+        for (const double* end : {stretch.first, stretch.last}) {
+            const double toLight[3] = {light.position[0] - end[0], light.position[1] - end[1],
+                                       light.position[2] - end[2]};
+            height = std::max(height, Dot(n, toLight));
+        }
+        if (height + stretch.slack * std::sqrt(Dot(n, n)) < 0.0) return false;
+    }
+    const double* centre = stretch.centre;
+    const double radius = stretch.radius;
     const double toLight[3] = {light.position[0] - centre[0], light.position[1] - centre[1],
                                light.position[2] - centre[2]};
     const double distance = std::sqrt(Dot(toLight, toLight));
     if (!(distance > radius)) return true;
-    // The light's side of the layer's plane is the same for every point of the sphere.
-    if (material.lightTransmission == 0.0 &&
-        Dot(n, toLight) + radius * std::sqrt(Dot(n, n)) < 0.0) {
-        return false;
-    }
     if (light.falloffType == kSY_FalloffSmooth) {
         // Beyond the zone's outer edge, or the radius for a zone of no width, there is no light.
         const double edgeSquared =
@@ -70,19 +87,21 @@ bool ReachesSphere(const SY_LightState& light, const SY_Material& material, cons
 
 SY_LightSet SY_LayerShader::LightsReaching(const double first[3], const double last[3],
                                            const double n[3], double slack) const {
-    double centre[3], half[3];
+    Stretch stretch{first, last, slack, {}, 0};
+    double half[3];
     for (int k = 0; k < 3; ++k) {
-        centre[k] = 0.5 * (first[k] + last[k]);
+        stretch.centre[k] = 0.5 * (first[k] + last[k]);
         half[k] = 0.5 * (last[k] - first[k]);
     }
-    const double radius = std::sqrt(Dot(half, half)) + slack;
-    if (!std::isfinite(radius) || !std::isfinite(Dot(centre, centre))) return kSY_AllLights;
+    stretch.radius = std::sqrt(Dot(half, half)) + slack;
+    if (!std::isfinite(stretch.radius) || !std::isfinite(Dot(stretch.centre, stretch.centre)))
+        return kSY_AllLights;
     SY_LightSet reaching = kSY_AllLights;
     const int32_t count = std::min<int32_t>(lights.Count(), 64);
     for (int32_t i = 0; i < count; ++i) {
         const SY_LightState& light = *lights[i];
         const bool hasPosition = light.type == kSY_LightSpot || light.type == kSY_LightPoint;
-        if (hasPosition && !ReachesSphere(light, material, centre, radius, n))
+        if (hasPosition && !Reaches(light, material, stretch, n))
             reaching &= ~(SY_LightSet{1} << i);
     }
     return reaching;

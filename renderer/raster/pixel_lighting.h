@@ -16,7 +16,7 @@ struct PixelLighting {
     using Single = typename L::Single;
     using Mask = typename L::Mask;
 
-    // Every lane array is written before it is read: Light() sets the points and the normal,
+    // Every lane array is written before it is read: Lit() sets the points and the normal,
     // Run() the terms. Left unset here, as clearing them cost a string store on every pixel.
     PixelLighting(const SY_LayerShader& layerShader, SY_LightSet lightsReaching)
         : shader(layerShader), reaching(lightsReaching) {}

@@ -243,7 +243,8 @@ template <int kPairs, class P>
 
 // The lights that can reach the count pixels from the state's position on, from the layer
 // points of the first and the last. The points the loop steps to stray from that segment by
-// the rounding of the float ray steps, a few parts in 1e8 of their size per step.
+// the rounding of the float ray steps: at most 6e-8 of the ray per step, which 1/W, changing
+// along the span by at most the ratio of its ends, scales into the points.
 template <class State>
 SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
                                const SY_SpanRayState& ray, int32_t count) {
@@ -257,7 +258,8 @@ SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
         last[k] = (ray.d[k] + steps * ray.sx[k]) * lastInvW;
         size += std::fabs(first[k]) + std::fabs(last[k]);
     }
-    return shader.LightsReaching(first, last, ray.normal, (1e-6 + 1e-7 * count) * size);
+    const double ratio = std::max(m.invW, lastInvW) / std::min(m.invW, lastInvW);
+    return shader.LightsReaching(first, last, ray.normal, (1e-6 + 1e-7 * count * ratio) * size);
 }
 
 }  // namespace sy_span

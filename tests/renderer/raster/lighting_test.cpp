@@ -249,6 +249,29 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
     EXPECT_EQ(std::memcmp(&front, &back, sizeof front), 0);
 }
 
+// A stretch of the layer from (−200, 0) to (200, 0) leaves out a spot whose cone (radius 145
+// on the layer) falls 600 away, a light behind the layer and one whose smooth zone ends 300
+// short of it; it keeps a spot and a point over it. Points along it light bit for bit the same
+// with the others skipped.
+TEST(Lighting, LightsThatCannotReachAStretchAreLeftOut) {
+    const SY_LightState lights[] = {
+        Spot(0, 0, -300, 0, 0, -1, 0.9f, 0.95f), Spot(0, 600, -300, 0, 0, -1, 0.9f, 0.95f),
+        Light(kSY_LightPoint, 0, 0, 100), Falloff(Light(kSY_LightPoint, 0, 500, -10), 1, 100, 100),
+        Light(kSY_LightPoint, 0, 0, -100)};
+    auto shader = LitShader({&lights[0], &lights[1], &lights[2], &lights[3], &lights[4]});
+    shader->material.diffuse = 1;
+    const double first[3] = {-200, 0, 0}, last[3] = {200, 0, 0};
+    const SY_LightSet reaching = shader->LightsReaching(first, last, kFront, 1e-3);
+    EXPECT_EQ(reaching & 0x1F, 0x11u);
+    for (double x = -200; x <= 200; x += 0.25) {
+        const double p[3] = {x, 0, 0};
+        SY_Lighting all, some;
+        shader->LightOnePixel(p, kFront, &all);
+        shader->LightOnePixel(p, kFront, &some, reaching);
+        EXPECT_EQ(std::memcmp(&all, &some, sizeof all), 0) << x;
+    }
+}
+
 // A light on the surface point has no direction and is left out silently (the paired point
 // is lit by it); an eye on the point ends the frame with the math library's zero-length code,
 // reported once, from either lane of a pair.
