@@ -62,10 +62,8 @@ struct SY_FourLanes {
     static Single Keep(Mask m, Single a) { return _mm_and_ps(Narrow(m), a); }
 
     static Single Lookup(const float* table, Real q, double steps) {
-        alignas(16) int32_t index[4];
-        _mm_store_si128(reinterpret_cast<__m128i*>(index),
-                        _mm256_cvttpd_epi32(_mm256_mul_pd(q, _mm256_set1_pd(steps))));
-        return _mm_setr_ps(table[index[0]], table[index[1]], table[index[2]], table[index[3]]);
+        return _mm_i32gather_ps(table, _mm256_cvttpd_epi32(_mm256_mul_pd(q, _mm256_set1_pd(steps))),
+                                4);
     }
 
 private:
@@ -83,6 +81,10 @@ private:
 }  // namespace
 
 void SY_LayerShader::LightFourPixels(const double* const p[4], const double n[3],
-                                     SY_Lighting* const out[4]) const {
-    sy_lighting::Light<SY_FourLanes>(*this, p, n, out);
+                                     SY_FourLightings* out, SY_LightSet reaching) const {
+    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, p, n, reaching);
+    for (int c = 0; c < 3; ++c) {
+        _mm_store_ps(out->diffuse[c], lighting.diffuse[c]);
+        _mm_store_ps(out->specular[c], lighting.specular[c]);
+    }
 }

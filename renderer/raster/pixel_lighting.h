@@ -16,12 +16,14 @@ struct PixelLighting {
     using Single = typename L::Single;
     using Mask = typename L::Mask;
 
-    // Every lane array is written before it is read: Light() sets the points and the normal,
+    // Every lane array is written before it is read: Lit() sets the points and the normal,
     // Run() the terms. Left unset here, as clearing them cost a string store on every pixel.
-    explicit PixelLighting(const SY_LayerShader& layerShader) : shader(layerShader) {}
+    PixelLighting(const SY_LayerShader& layerShader, SY_LightSet lightsReaching)
+        : shader(layerShader), reaching(lightsReaching) {}
 
     const SY_LayerShader& shader;
-    Real p[3];  // surface points; read only when the shader needs them
+    SY_LightSet reaching;  // the lit path leaves the other lights out
+    Real p[3];             // surface points; read only when the shader needs them
     Real n[3];
     Single diffuse[3];
     Single specular[3];
@@ -51,7 +53,9 @@ struct PixelLighting {
             diffuse[c] = specular[c] = L::SplatSingle(0.0f);
         Real v[3] = {L::Splat(0.0), L::Splat(0.0), L::Splat(0.0)};
         if (shader.needsPoint) ViewVector(v);
-        for (const SY_LightState* light : shader.lights) {
+        for (int32_t i = 0; i < shader.lights.Count(); ++i) {
+            const SY_LightState* light = shader.lights[i];
+            if (i < 64 && !((reaching >> i) & 1)) continue;
             if (light->type == kSY_LightAmbient) {
                 if (shader.material.ambient == 0.0) continue;
                 for (int c = 0; c < 3; ++c) {
@@ -91,8 +95,9 @@ struct PixelLighting {
         if (shader.material.lightTransmission == 0.0) {
             active = L::AndNot(behind, active);
             if (L::None(active)) return;
+        } else {
+            facing = L::Select(behind, -facing, facing);
         }
-        facing = L::Select(behind, -facing, facing);
 
         Single spot = L::SplatSingle(1.0f);
         if (light.type == kSY_LightSpot) {
@@ -103,7 +108,10 @@ struct PixelLighting {
             if (L::None(active)) return;
             spot = SY_SpotEdge<L>(light, c);
         }
-        Single k = spot * SY_Falloff<L>(light, distanceSquared);
+        // The falloff is looked at only where it can be other than 1: a call for nothing costs
+        // the registers it makes the caller save.
+        Single k =
+            SY_FalloffUsesDistance(light) ? spot * SY_Falloff<L>(light, distanceSquared) : spot;
         if (shader.material.lightTransmission != 0.0) {
             k = L::SelectSingle(
                 behind, k * L::SplatSingle(static_cast<float>(shader.material.lightTransmission)),
@@ -224,17 +232,30 @@ struct PixelLighting {
     }
 };
 
+// The lighting of L::kCount points of the layer, left in the lanes of the returned terms.
 template <class L>
-void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
-           SY_Lighting* const out[L::kCount], bool shadowsOnly = false) {
-    PixelLighting<L> lighting(shader);
-    for (int k = 0; k < 3; ++k) {
-        // Without the need the span routine does not work out the points.
-        lighting.p[k] = shader.needsPoint ? L::Load(p, k) : L::Splat(0.0);
+PixelLighting<L> Lit(const SY_LayerShader& shader, const double* const p[L::kCount],
+                     const double n[3], SY_LightSet reaching, bool shadowsOnly = false) {
+    PixelLighting<L> lighting(shader, reaching);
+    for (int k = 0; k < 3; ++k)
         lighting.n[k] = L::Splat(n[k]);
+    // Without the need the span routine does not work out the points. Two loops, not a choice
+    // per coordinate, which the compiler turned into clearing the points with a string store.
+    if (shader.needsPoint) {
+        for (int k = 0; k < 3; ++k)
+            lighting.p[k] = L::Load(p, k);
+    } else {
+        for (int k = 0; k < 3; ++k)
+            lighting.p[k] = L::Splat(0.0);
     }
     lighting.Run(shadowsOnly);
-    lighting.Store(out);
+    return lighting;
+}
+
+template <class L>
+void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
+           SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
+    Lit<L>(shader, p, n, reaching, shadowsOnly).Store(out);
 }
 
 }  // namespace sy_lighting

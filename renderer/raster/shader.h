@@ -68,6 +68,16 @@ struct SY_Lighting {
     float specular[3];
 };
 
+// The lighting of four pixels, channel by channel: diffuse[c][i] is channel c of pixel i's.
+struct SY_FourLightings {
+    alignas(16) float diffuse[3][4];
+    alignas(16) float specular[3][4];
+};
+
+// A set of a layer's lights: bit i for light i. Lights from the 64th on are always in a set.
+using SY_LightSet = uint64_t;
+inline constexpr SY_LightSet kSY_AllLights = ~SY_LightSet{0};
+
 class SY_LayerShader : public SY_Shader {
 public:
     bool NeedsSurfacePoint() const override { return needsPoint != 0; }
@@ -75,19 +85,28 @@ public:
     // Lights the surface point p with the unit normal n (both in world space; n turned toward
     // the camera, so a layer seen from behind is lit like its front). p is read only when
     // needsPoint is set. Throws the math library's zero-length code, after reporting it, when
-    // the eye lies on the surface.
-    void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
+    // the eye lies on the surface. Lights outside `reaching` are left out: the caller knows
+    // they add nothing at p (LightsReaching).
+    void LightOnePixel(const double p[3], const double n[3], SY_Lighting* out,
+                       SY_LightSet reaching = kSY_AllLights) const;
     // Lights two points of the layer at once in vector registers, bit for bit as two calls of
     // LightOnePixel. Span routines use it where SY_WidestLightingLanes() gives kTwo or more.
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
-                        SY_Lighting* out1, SY_Lighting* out2) const;
+                        SY_Lighting* out1, SY_Lighting* out2,
+                        SY_LightSet reaching = kSY_AllLights) const;
     // Four points at once, bit for bit as four calls of LightOnePixel; only where
     // SY_WidestLightingLanes() gives kFour.
-    void LightFourPixels(const double* const p[4], const double n[3],
-                         SY_Lighting* const out[4]) const;
+    void LightFourPixels(const double* const p[4], const double n[3], SY_FourLightings* out,
+                         SY_LightSet reaching = kSY_AllLights) const;
     // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
     // for layers drawn from an image, which are not lit.
     void ShadowOnePixel(const double p[3], const double n[3], SY_Lighting* out) const;
+    // The lights that can add to the lit pixels of a stretch of the layer with the unit normal
+    // n: every point of it lies within `slack` of the segment from `first` to `last`. Left out
+    // are those behind the layer (when it lets no light through), those whose cone or falloff
+    // misses the stretch; a set, worked out once, that spares the pixels their tests.
+    SY_LightSet LightsReaching(const double first[3], const double last[3], const double n[3],
+                               double slack) const;
 
     uint16_t layerId = 0;  // passed to every shadow lookup
     // The layer's material. A shader made by hand starts with no light terms and takes no

@@ -6,8 +6,12 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
+#include <cstring>
+
+#include <smmintrin.h>
 
 #include "pf_pixel.h"
+#include "pf_vec4.h"
 #include "pf_xfer.h"
 #include "renderer/raster/samplers.h"
 #include "renderer/raster/shader.h"
@@ -70,22 +74,47 @@ SY_Coverage<P> MatteCoverage(typename PF_PixelTraits<P>::Channel matte, SY_Cover
         return static_cast<uint8_t>((uint32_t{matte} * layer + 127) / 255);
 }
 
-// texel × diffuse + specular, with specular in units of the channel maximum; integer channels
-// round and clamp, float channels keep their range.
+// A pixel's four channels (alpha, red, green, blue) from floats that are in the channel's
+// range, and whole for integer channels.
 template <class P>
-void ApplyLighting(const SY_Lighting& light, P* texel) {
+void StoreChannels(__m128 c, P* texel) {
     using Traits = PF_PixelTraits<P>;
-    using C = typename Traits::Channel;
-    C* channels[3] = {&texel->red, &texel->green, &texel->blue};
-    for (int k = 0; k < 3; ++k) {
-        float c = static_cast<float>(*channels[k]) * light.diffuse[k];
-        if constexpr (Traits::kIsFloat) {
-            *channels[k] = c + light.specular[k];
+    if constexpr (Traits::kIsFloat) {
+        _mm_storeu_ps(&texel->alpha, c);
+    } else {
+        const __m128i v = _mm_cvttps_epi32(c);
+        if constexpr (Traits::kBitDepth == 16) {
+            _mm_storel_epi64(reinterpret_cast<__m128i*>(texel), _mm_packus_epi32(v, v));
         } else {
-            c += 0.5f + light.specular[k] * Traits::kMax;
-            *channels[k] = static_cast<C>(std::clamp(c, 0.0f, Traits::kMax));
+            const __m128i shorts = _mm_packs_epi32(v, v);
+            const uint32_t bytes =
+                static_cast<uint32_t>(_mm_cvtsi128_si32(_mm_packus_epi16(shorts, shorts)));
+            std::memcpy(texel, &bytes, sizeof bytes);
         }
     }
+}
+
+// texel × diffuse + specular on four lanes, with specular in units of the channel maximum;
+// integer channels round and clamp, float channels keep their range. Each lane takes the same
+// float operations, in the same order, as one channel alone would.
+template <class P>
+__m128 LitChannels(__m128 texel, __m128 diffuse, __m128 specular) {
+    using Traits = PF_PixelTraits<P>;
+    const __m128 c = _mm_mul_ps(texel, diffuse);
+    if constexpr (Traits::kIsFloat) return _mm_add_ps(c, specular);
+    const __m128 max = _mm_set1_ps(Traits::kMax);
+    const __m128 lit = _mm_add_ps(c, _mm_add_ps(_mm_set1_ps(0.5f), _mm_mul_ps(specular, max)));
+    return _mm_min_ps(_mm_max_ps(lit, _mm_setzero_ps()), max);
+}
+
+// One pixel's lighting, its three colour channels in one vector; alpha passes unchanged.
+template <class P>
+[[gnu::always_inline]] inline void ApplyLighting(const SY_Lighting& light, P* texel) {
+    const __m128 t = PF_LoadFloat4(*texel);
+    const __m128 diffuse = _mm_setr_ps(1.0f, light.diffuse[0], light.diffuse[1], light.diffuse[2]);
+    const __m128 specular =
+        _mm_setr_ps(0.0f, light.specular[0], light.specular[1], light.specular[2]);
+    StoreChannels(_mm_move_ss(LitChannels<P>(t, diffuse, specular), t), texel);
 }
 
 // One pixel on its way from the sampler to the delivery.
@@ -97,6 +126,23 @@ struct Pixel {
     double point[3];         // surface point, when lighting needs it
     SY_FragmentDepth depth;  // set only for deliveries that use it
 };
+
+// Four pixels' lighting, channel by channel as the lighting gives it: the texels turned into
+// channel planes, lit a plane at a time and turned back; alpha passes unchanged.
+template <class P>
+[[gnu::always_inline]] inline void ApplyLighting(const SY_FourLightings& light, Pixel<P>* pixels) {
+    __m128 t[4];
+    for (int i = 0; i < 4; ++i)
+        t[i] = PF_LoadFloat4(pixels[i].texel);
+    _MM_TRANSPOSE4_PS(t[0], t[1], t[2], t[3]);
+    for (int c = 0; c < 3; ++c) {
+        t[1 + c] =
+            LitChannels<P>(t[1 + c], _mm_load_ps(light.diffuse[c]), _mm_load_ps(light.specular[c]));
+    }
+    _MM_TRANSPOSE4_PS(t[0], t[1], t[2], t[3]);
+    for (int i = 0; i < 4; ++i)
+        StoreChannels(t[i], &pixels[i].texel);
+}
 
 // The per-span constants of the loop.
 template <class P>
@@ -167,17 +213,16 @@ template <class State>
 // the span loop stays small.
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
-                                  const double normal[3], const bool (&taken)[kPairs],
-                                  Pixel<P>* pixels) {
+                                  SY_LightSet reaching, const double normal[3],
+                                  const bool (&taken)[kPairs], Pixel<P>* pixels) {
     SY_Lighting light[2 * kPairs];
     if constexpr (kPairs == 2) {
         if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
             const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
                                              pixels[3].point};
-            SY_Lighting* const outs[4] = {&light[0], &light[1], &light[2], &light[3]};
-            shader.LightFourPixels(points, normal, outs);
-            for (int k = 0; k < 4; ++k)
-                ApplyLighting(light[k], &pixels[k].texel);
+            SY_FourLightings four;
+            shader.LightFourPixels(points, normal, &four, reaching);
+            ApplyLighting(four, pixels);
             return;
         }
     }
@@ -185,14 +230,36 @@ template <int kPairs, class P>
         if (!taken[pair]) continue;
         Pixel<P>* two = pixels + 2 * pair;
         if (lanes != SY_LightingLanes::kOne) {
-            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1]);
+            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1],
+                                  reaching);
         } else {
-            shader.LightOnePixel(two[0].point, normal, &light[0]);
-            shader.LightOnePixel(two[1].point, normal, &light[1]);
+            shader.LightOnePixel(two[0].point, normal, &light[0], reaching);
+            shader.LightOnePixel(two[1].point, normal, &light[1], reaching);
         }
         ApplyLighting(light[0], &two[0].texel);
         ApplyLighting(light[1], &two[1].texel);
     }
+}
+
+// The lights that can reach the count pixels from the state's position on, from the layer
+// points of the first and the last. The points the loop steps to stray from that segment by
+// the rounding of the float ray steps: at most 6e-8 of the ray per step, which 1/W, changing
+// along the span by at most the ratio of its ends, scales into the points.
+template <class State>
+SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
+                               const SY_SpanRayState& ray, int32_t count) {
+    const SY_SpanMapping& m = FirstMapping(state);
+    const double steps = count - 1;
+    const double lastInvW = state.texture.perspective ? 1.0 / (m.w + steps * m.dwdx) : m.invW;
+    if (!(m.invW > 0) || !(lastInvW > 0)) return kSY_AllLights;
+    double first[3], last[3], size = 0;
+    for (int k = 0; k < 3; ++k) {
+        first[k] = ray.d[k] * m.invW;
+        last[k] = (ray.d[k] + steps * ray.sx[k]) * lastInvW;
+        size += std::fabs(first[k]) + std::fabs(last[k]);
+    }
+    const double ratio = std::max(m.invW, lastInvW) / std::min(m.invW, lastInvW);
+    return shader.LightsReaching(first, last, ray.normal, (1e-6 + 1e-7 * count * ratio) * size);
 }
 
 }  // namespace sy_span
@@ -216,6 +283,9 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
     setup.colorOnly = shader.material.acceptsShadows == kSY_AcceptsShadowsOnly;
     setup.shaded = shader.shaded != 0;
     setup.needsPoint = shader.NeedsSurfacePoint();
+    const SY_LightSet reaching = setup.shaded && setup.needsPoint
+                                     ? LightsReachingSpan(shader, state, ray, count)
+                                     : kSY_AllLights;
 
     Pixel<P> pixels[4];
     int32_t i = 0;
@@ -236,7 +306,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                     Advance(setup.needsPoint, state, ray);
                 }
             }
-            if (setup.shaded) LightPairs(shader, lanes, ray.normal, taken, pixels);
+            if (setup.shaded) LightPairs(shader, lanes, reaching, ray.normal, taken, pixels);
             for (int k = 0; k < 2 * kPairs; ++k) {
                 if (taken[k / 2] && !pixels[k].skipped)
                     delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
@@ -253,7 +323,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
         if (pixels[0].skipped) return;
         if (setup.shaded) {
             SY_Lighting light;
-            shader.LightOnePixel(pixels[0].point, ray.normal, &light);
+            shader.LightOnePixel(pixels[0].point, ray.normal, &light, reaching);
             ApplyLighting(light, &pixels[0].texel);
         }
         delivery.Deliver(x + i, pixels[0].texel, pixels[0].coverage, pixels[0].depth, thread);

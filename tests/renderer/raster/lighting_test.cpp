@@ -99,10 +99,14 @@ void ExpectFourLikeOne(const SY_LayerShader& shader, double x) {
     const double p[4][3] = {{x, 0, 0}, {x + 150, -40, 0}, {x - 70, 90, 0}, {x + 20, 300, 0}};
     const double* const points[4] = {p[0], p[1], p[2], p[3]};
     SY_Lighting alone[4], four[4];
-    SY_Lighting* const outs[4] = {&four[0], &four[1], &four[2], &four[3]};
+    SY_FourLightings lanes;
     for (int i = 0; i < 4; ++i)
         shader.LightOnePixel(p[i], kFront, &alone[i]);
-    shader.LightFourPixels(points, kFront, outs);
+    shader.LightFourPixels(points, kFront, &lanes);
+    for (int i = 0; i < 4; ++i) {
+        four[i] = {{lanes.diffuse[0][i], lanes.diffuse[1][i], lanes.diffuse[2][i]},
+                   {lanes.specular[0][i], lanes.specular[1][i], lanes.specular[2][i]}};
+    }
     EXPECT_EQ(std::memcmp(alone, four, sizeof alone), 0) << "four at " << x;
 }
 
@@ -243,6 +247,29 @@ TEST(Lighting, BackFacingLayerIsLitLikeItsFront) {
     EXPECT_GT(front.diffuse[0], 0);
     EXPECT_GT(front.specular[0], 0);
     EXPECT_EQ(std::memcmp(&front, &back, sizeof front), 0);
+}
+
+// A stretch of the layer from (−200, 0) to (200, 0) leaves out a spot whose cone (radius 145
+// on the layer) falls 600 away, a light behind the layer and one whose smooth zone ends 300
+// short of it; it keeps a spot and a point over it. Points along it light bit for bit the same
+// with the others skipped.
+TEST(Lighting, LightsThatCannotReachAStretchAreLeftOut) {
+    const SY_LightState lights[] = {
+        Spot(0, 0, -300, 0, 0, -1, 0.9f, 0.95f), Spot(0, 600, -300, 0, 0, -1, 0.9f, 0.95f),
+        Light(kSY_LightPoint, 0, 0, 100), Falloff(Light(kSY_LightPoint, 0, 500, -10), 1, 100, 100),
+        Light(kSY_LightPoint, 0, 0, -100)};
+    auto shader = LitShader({&lights[0], &lights[1], &lights[2], &lights[3], &lights[4]});
+    shader->material.diffuse = 1;
+    const double first[3] = {-200, 0, 0}, last[3] = {200, 0, 0};
+    const SY_LightSet reaching = shader->LightsReaching(first, last, kFront, 1e-3);
+    EXPECT_EQ(reaching & 0x1F, 0x11u);
+    for (double x = -200; x <= 200; x += 0.25) {
+        const double p[3] = {x, 0, 0};
+        SY_Lighting all, some;
+        shader->LightOnePixel(p, kFront, &all);
+        shader->LightOnePixel(p, kFront, &some, reaching);
+        EXPECT_EQ(std::memcmp(&all, &some, sizeof all), 0) << x;
+    }
 }
 
 // A light on the surface point has no direction and is left out silently (the paired point
