@@ -171,8 +171,8 @@ void DrawBlurredRow(const void* closure, int32_t row, int32_t, int32_t thread) {
 
 // At least the largest blur radius the pixels of columns [left, right) and rows [top, bottom)
 // ask for. The plane's W is affine across the screen and the radius grows with W's distance
-// from the focus, so the corners bound it; only W near or behind the eye, where the model
-// blurs as much as it can, is bounded by that.
+// from the focus, so the corners bound it; W near or behind the eye (or not a number), where
+// the model may blur as much as it can, is bounded by that.
 float LargestRadius(const SY_ScreenGeometry& geometry, const SY_DOFBuffer& buffer, int32_t left,
                     int32_t top, int32_t right, int32_t bottom) {
     if (!buffer.model.Blurs()) return 0;
@@ -181,7 +181,7 @@ float LargestRadius(const SY_ScreenGeometry& geometry, const SY_DOFBuffer& buffe
     for (double x : {left + 0.5, right - 0.5}) {
         for (double y : {top + 0.5, bottom - 0.5}) {
             const double w = e[2] * x + e[5] * y + e[8];
-            if (w < 1e-9) return buffer.model.maxRadius;
+            if (!(w >= 1e-9)) return buffer.model.maxRadius;
             largest = std::max(largest, buffer.RadiusAtW(w));
         }
     }
