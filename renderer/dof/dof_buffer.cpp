@@ -22,7 +22,8 @@ auto OrOutOfMemory(Make make) {
 
 }  // namespace
 
-SY_DOFBuffer::SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof)
+SY_DOFBuffer::SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof,
+                           std::shared_ptr<const ShapeKernelArray> shapeKernels)
     : originX(bounds.left),
       originY(bounds.top),
       width(std::max(bounds.right - bounds.left, 0)),
@@ -35,7 +36,8 @@ SY_DOFBuffer::SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof)
       highlightGain(dof.highlightGain),
       // The camera gives the threshold in 8-bit levels whatever the depth.
       highlightThreshold(dof.highlightThreshold / 255),
-      highlightSaturation(dof.highlightSaturation) {}
+      highlightSaturation(dof.highlightSaturation),
+      kernels(std::move(shapeKernels)) {}
 
 std::unique_ptr<SY_DOFBuffer> SY_DOFBuffer::New(const M_LRect& bounds, int16_t bitDepth,
                                                 const SY_CameraDOFDesc& dof,
@@ -54,7 +56,7 @@ std::unique_ptr<SY_DOFBuffer> SY_DOFBuffer::New(const M_LRect& bounds, int16_t b
 template <class P>
 SY_DOFBufferX<P>::SY_DOFBufferX(const M_LRect& bounds, const SY_CameraDOFDesc& dof,
                                 std::shared_ptr<const ShapeKernelArray> shapeKernels)
-    : SY_DOFBuffer(bounds, dof), world(width, height), kernels(std::move(shapeKernels)) {}
+    : SY_DOFBuffer(bounds, dof, std::move(shapeKernels)), world(width, height) {}
 
 template <class P>
 void SY_DOFBufferX<P>::PrepareTables() {

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <memory>
+#include <utility>
 
 #include "m_matrix.h"
 #include "pf_tables.h"
@@ -25,7 +26,8 @@ class SY_DOFBuffer : public PF_PixelContainer<SY_DOFBufferX<PF_Pixel8>, SY_DOFBu
                                               SY_DOFBufferX<PF_PixelFloat>> {
 public:
     // A cleared buffer over bounds (output pixels) of the depth bitDepth, for the camera's
-    // depth of field. kernels: the frame's iris kernels, null for the simple shapes. Reports
+    // depth of field. kernels: the frame's iris kernels (see UseKernels), null for the simple
+    // shapes. Reports
     // and throws 3 for a depth other than 8, 16 or 32, and throws 4 without memory.
     static std::unique_ptr<SY_DOFBuffer> New(const M_LRect& bounds, int16_t bitDepth,
                                              const SY_CameraDOFDesc& dof,
@@ -33,6 +35,12 @@ public:
 
     // Builds the sums that sampling reads, once the layer is drawn. Throws 4 without memory.
     virtual void PrepareTables() = 0;
+
+    // The iris kernels sampling reads from now on, which must reach the largest radius it is
+    // asked for.
+    void UseKernels(std::shared_ptr<const ShapeKernelArray> shapeKernels) {
+        kernels = std::move(shapeKernels);
+    }
 
     // Where a layer render stores its pixels.
     virtual SY_SpanImageRecord Target() = 0;
@@ -55,7 +63,10 @@ public:
     bool averagesWithin = false;
 
 protected:
-    SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof);
+    SY_DOFBuffer(const M_LRect& bounds, const SY_CameraDOFDesc& dof,
+                 std::shared_ptr<const ShapeKernelArray> shapeKernels);
+
+    std::shared_ptr<const ShapeKernelArray> kernels;
 };
 
 template <class P>
@@ -99,5 +110,4 @@ private:
     // float colour, divided by such an alpha, would show them; 8- and 16-bit levels round them
     // away.
     SY_AccountedVector<double> columnSums;
-    std::shared_ptr<const ShapeKernelArray> kernels;
 };

@@ -77,38 +77,56 @@ int32_t AppendEdges(const ShapeKernel& kernel, EdgeScratch* scratch,
 
 }  // namespace
 
-std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc& dof) {
+std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(
+    const SY_CameraDOFDesc& dof, float largestRadius,
+    std::shared_ptr<const ShapeKernelArray> made) {
     if (dof.irisShape < 3) return nullptr;
-    const double maxRadius = SY_DOFModel(dof).maxRadius;
+    const SY_DOFModel model(dof);
+    const double maxRadius = model.maxRadius;
+    const auto count = static_cast<int32_t>(8 * maxRadius);
     try {
         auto array =
             std::allocate_shared<ShapeKernelArray>(SY_AccountedAllocator<ShapeKernelArray>());
-        array->count = static_cast<int32_t>(8 * maxRadius);
+        array->count = count;
         array->step = array->count ? 1.0f / static_cast<float>(array->count) : 0.0f;
-        array->irisList.reserve(static_cast<size_t>(array->count) + 1);
+        // The kernel the sampling picks for largestRadius, found as it finds it.
+        const int32_t last = array->IndexForShare(std::min(1.0f, largestRadius / model.maxRadius));
+        if (made && static_cast<int32_t>(made->irisList.size()) > last) return made;
+        const size_t kept = made ? made->irisList.size() : 0;
+        array->irisList.reserve(static_cast<size_t>(last) + 1);
         // Each run has at most two ends: room for every kernel's, so that the list grows once.
-        size_t ends = 0;
-        for (int32_t i = 0; i <= array->count; ++i) {
-            double t = array->count ? static_cast<double>(i) / array->count : 0.0;
+        size_t ends = made ? made->edgeList.size() : 0;
+        for (int32_t i = 0; i <= last; ++i) {
             ShapeIris iris;
-            iris.kernel = std::allocate_shared<const ShapeKernel>(
-                SY_AccountedAllocator<ShapeKernel>(), static_cast<int32_t>(dof.irisShape),
-                dof.irisRoundness, t * maxRadius, dof.irisAspect, SY_DOFXScale(dof),
-                dof.irisRotation, dof.diffractionFringe);
-            const ShapeKernel& kernel = *iris.kernel;
-            if (kernel.RowCount()) {
-                const ShapeKernel::Row& last = kernel.Rows()[kernel.RowCount() - 1];
-                ends += 2 * size_t(last.firstSegment + last.segmentCount);
+            if (static_cast<size_t>(i) < kept) {
+                iris = made->irisList[static_cast<size_t>(i)];
+            } else {
+                double t = array->count ? static_cast<double>(i) / array->count : 0.0;
+                iris.kernel = std::allocate_shared<const ShapeKernel>(
+                    SY_AccountedAllocator<ShapeKernel>(), static_cast<int32_t>(dof.irisShape),
+                    dof.irisRoundness, t * maxRadius, dof.irisAspect, SY_DOFXScale(dof),
+                    dof.irisRotation, dof.diffractionFringe);
+                const ShapeKernel& kernel = *iris.kernel;
+                if (kernel.RowCount()) {
+                    const ShapeKernel::Row& row = kernel.Rows()[kernel.RowCount() - 1];
+                    ends += 2 * size_t(row.firstSegment + row.segmentCount);
+                }
             }
             array->irisList.push_back(std::move(iris));
         }
         array->edgeList.reserve(ends);
         std::vector<size_t> firstEdge;
         EdgeScratch scratch;
-        for (ShapeIris& iris : array->irisList) {
+        for (size_t i = 0; i < array->irisList.size(); ++i) {
+            ShapeIris& iris = array->irisList[i];
             firstEdge.push_back(array->edgeList.size());
-            iris.singleCount = AppendEdges(*iris.kernel, &scratch, &array->edgeList);
-            iris.edgeCount = static_cast<int32_t>(array->edgeList.size() - firstEdge.back());
+            if (i < kept) {
+                array->edgeList.insert(array->edgeList.end(), iris.edges,
+                                       iris.edges + iris.edgeCount);
+            } else {
+                iris.singleCount = AppendEdges(*iris.kernel, &scratch, &array->edgeList);
+                iris.edgeCount = static_cast<int32_t>(array->edgeList.size() - firstEdge.back());
+            }
         }
         // The list has stopped growing: its ends stay where they are.
         for (size_t i = 0; i < firstEdge.size(); ++i)

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <limits>
 #include <memory>
 
 #include "bee_engine.h"
@@ -30,23 +31,33 @@ struct ShapeIris {
 };
 
 // Kernel i has the radius maxRadius × i / count: one per eighth of a pixel from 0 to the
-// largest radius the blur level allows.
+// largest radius the blur level allows. Only the kernels up to the largest radius the frame's
+// layers ask for are made: the rest, up to the blur level's cap, would cost far more than those.
 struct ShapeKernelArray {
     int32_t stepsPerPixel = 8;
-    int32_t count = 0;  // the array holds count + 1 kernels
+    int32_t count = 0;  // kernels 0 to count have a place; irisList holds those made, from 0 on
     SY_AccountedVector<ShapeIris> irisList;
     SY_AccountedVector<ShapeEdge> edgeList;  // every kernel's ends, irisList's point into it
     float step = 0;                          // 1 / count, or 0 when count is 0
 
+    // The index of the kernel for a radius that is the share s (0..1) of the largest.
+    int32_t IndexForShare(float s) const {
+        return std::min(static_cast<int32_t>(s * static_cast<float>(count)), count);
+    }
+
     // The kernel for a radius that is the share s (0..1) of the largest; null below one step,
-    // where the blur is too small to show.
+    // where the blur is too small to show. Shares beyond those made read the largest made.
     const ShapeIris* ForShare(float s) const {
         if (count == 0 || s < step) return nullptr;
-        auto index = static_cast<int32_t>(s * static_cast<float>(count));
-        return &irisList[static_cast<size_t>(std::min(index, count))];
+        return &irisList[static_cast<size_t>(
+            std::min(IndexForShare(s), static_cast<int32_t>(irisList.size()) - 1))];
     }
 };
 
-// The kernels of the camera's iris, or null when the iris shape is one of the simple ones
-// (below 3) that blur with a box. Throws 4 without memory, with nothing kept.
-std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(const SY_CameraDOFDesc& dof);
+// The kernels of the camera's iris for radii up to largestRadius (output pixels), or null when
+// the iris shape is one of the simple ones (below 3) that blur with a box. made, when given, is
+// an array of the same camera's: returned as it is when it reaches far enough, otherwise its
+// kernels are taken over. Throws 4 without memory, with nothing kept.
+std::shared_ptr<const ShapeKernelArray> BuildShapeKernels(
+    const SY_CameraDOFDesc& dof, float largestRadius = std::numeric_limits<float>::max(),
+    std::shared_ptr<const ShapeKernelArray> made = nullptr);

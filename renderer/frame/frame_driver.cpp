@@ -102,14 +102,13 @@ void DrawThroughDepthOfField(SY_RenderContext* context, SY_TRLayer* renderable,
         renderable->Render(context, camera, shader, context->scene->fieldMode, target);
         return;
     }
-    const SY_CameraDOFDesc& dof = context->scene->dof;
-    if (!context->dofKernels) context->dofKernels = BuildShapeKernels(dof);
+    // The combine hands the buffer the kernels, once it knows how far the layer's blur goes.
     std::unique_ptr<SY_DOFBuffer> buffer =
-        SY_DOFBuffer::New(rect, context->destination->GetBitDepth(), dof, context->dofKernels);
+        SY_DOFBuffer::New(rect, context->destination->GetBitDepth(), context->scene->dof, nullptr);
     buffer->averagesWithin = renderable->unbounded;
     renderable->Render(context, camera, shader, 0, SY_RenderTarget(buffer->Target()));
     buffer->PrepareTables();
-    SY_CombineDepthOfField(context, *renderable, camera, shader, *buffer, target);
+    SY_CombineDepthOfField(context, *renderable, camera, shader, buffer.get(), target);
 }
 
 void DrawRenderable(SY_RenderContext* context, SY_TRLayer* renderable,

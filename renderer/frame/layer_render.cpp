@@ -169,11 +169,31 @@ void DrawBlurredRow(const void* closure, int32_t row, int32_t, int32_t thread) {
         });
 }
 
+// At least the largest blur radius the pixels of columns [left, right) and rows [top, bottom)
+// ask for. The plane's W is affine across the screen and the radius grows with W's distance
+// from the focus, so the corners bound it; W near or behind the eye (or not a number), where
+// the model may blur as much as it can, is bounded by that.
+float LargestRadius(const SY_ScreenGeometry& geometry, const SY_DOFBuffer& buffer, int32_t left,
+                    int32_t top, int32_t right, int32_t bottom) {
+    if (!buffer.model.Blurs()) return 0;
+    const double* e = &geometry.screenToTexture[geometry.firstValid].mat[0][0];
+    float largest = 0;
+    for (double x : {left + 0.5, right - 0.5}) {
+        for (double y : {top + 0.5, bottom - 0.5}) {
+            const double w = e[2] * x + e[5] * y + e[8];
+            if (!(w >= 1e-9)) return buffer.model.maxRadius;
+            largest = std::max(largest, buffer.RadiusAtW(w));
+        }
+    }
+    // A row's W steps by a float from its first pixel: a margin well beyond what that rounds.
+    return largest * 1.001f + 0.01f;
+}
+
 }  // namespace
 
 void SY_CombineDepthOfField(SY_RenderContext* context, const SY_TRLayer& renderable,
                             const SY_CameraView& camera, const SY_Shader* shader,
-                            const SY_DOFBuffer& buffer, const SY_RenderTarget& target) {
+                            SY_DOFBuffer* buffer, const SY_RenderTarget& target) {
     SY_ScreenGeometry geometry;
     geometry.Build(*context, renderable, camera.worldToScreen, camera.count,
                    GeometryFlagsFor(renderable, camera, shader));
@@ -183,17 +203,22 @@ void SY_CombineDepthOfField(SY_RenderContext* context, const SY_TRLayer& rendera
     bool outsideClear = renderable.trackMatte && renderable.trackMatte->OutsideIsClear();
     if (renderable.trackMatte && !matte && outsideClear) return;
     const PF_World& destination = *context->destination;
-    int32_t left = std::max(buffer.originX, 0), top = std::max(buffer.originY, 0);
-    int32_t right = std::min(buffer.originX + buffer.width, destination.width);
-    int32_t bottom = std::min(buffer.originY + buffer.height, destination.height);
+    int32_t left = std::max(buffer->originX, 0), top = std::max(buffer->originY, 0);
+    int32_t right = std::min(buffer->originX + buffer->width, destination.width);
+    int32_t bottom = std::min(buffer->originY + buffer->height, destination.height);
     if (right <= left || bottom <= top) return;
+    // Kernels for every radius the layer asks for, kept for the frame's later layers.
+    const SY_CameraDOFDesc& dof = context->scene->dof;
+    context->dofKernels = BuildShapeKernels(
+        dof, LargestRadius(geometry, *buffer, left, top, right, bottom), context->dofKernels);
+    buffer->UseKernels(context->dofKernels);
     const SY_Material& material = renderable.material;
     BlurredRowClosure closure{
         {&geometry, shader, matte, matte && outsideClear, nullptr, &target,
          context->scene->colorSettings,
          SY_SpanBlend{SY_DeliveredMode(material), material.opacity, SY_DepthOffset(material)},
          right - left},
-        &buffer,
+        buffer,
         left};
     RunRows(context, top, bottom - top, context->scene->fieldMode, &DrawBlurredRow, &closure);
 }

@@ -36,7 +36,7 @@ struct SY_RenderContext {
     int32_t renderableCount = 0;
     int32_t renderablesDone = 0;
     SY_SpecularTables specularTables;
-    // The camera's iris kernels, made when the first layer needs them.
+    // The camera's iris kernels, made as far as the layers drawn so far have needed them.
     std::shared_ptr<const ShapeKernelArray> dofKernels;
     // Caster textures' sums while shadow maps are built; a cache, so filled through const.
     mutable SY_SumTableCache shadowSums;

@@ -196,12 +196,32 @@ TEST(DepthOfField, SpanSamplesAsItsPixels) {
 
 // Memory that runs out anywhere in a blurred frame fails it with 4 (std::bad_alloc from the
 // tracked objects, which the render entry reports as 4) and frees what it took.
+// Kernels made as far as one layer needs, then taken over and made further for another, are
+// those made all at once; an array that reaches far enough is kept as it is.
+TEST(DepthOfField, KernelsMadeInStepsAreThoseMadeAtOnce) {
+    SY_CameraDOFDesc dof = Lens(720, 8);
+    dof.irisRoundness = 0.5;
+    auto whole = BuildShapeKernels(dof), few = BuildShapeKernels(dof, 5);
+    auto more = BuildShapeKernels(dof, 12, few);
+    EXPECT_EQ(BuildShapeKernels(dof, 3, more), more);
+    ASSERT_LT(few->irisList.size(), more->irisList.size());
+    for (size_t i = 0; i < more->irisList.size(); ++i) {
+        const ShapeIris &a = more->irisList[i], &b = whole->irisList[i];
+        ASSERT_EQ(a.edgeCount, b.edgeCount);
+        EXPECT_EQ(a.singleCount, b.singleCount);
+        for (int32_t k = 0; k < a.edgeCount; ++k) {
+            const ShapeEdge &e = a.edges[k], &f = b.edges[k];
+            EXPECT_TRUE(e.x == f.x && e.y == f.y && e.rows == f.rows && e.weight == f.weight) << i;
+        }
+    }
+}
+
 TEST(DepthOfField, OutOfMemoryFreesEverything) {
     SY_CameraDOFDesc dof = Lens(720, 6);
-    dof.blurLevel = 0.2;  // radii up to 20: 161 kernels
+    dof.blurLevel = 0.2;  // a blur of 4 pixels: the 33 kernels up to it, of the level's 161
     int32_t failures = renderer_test::FailEachAllocationInTurn(
         [&](auto fail) { EdgeRow(dof, 800, fail); }, true, 1000);
-    EXPECT_GT(failures, 2 * 161);  // two blocks a kernel, then the buffer, tables and rows
+    EXPECT_GT(failures, 2 * 33);  // two blocks a kernel, then the buffer, tables and rows
 }
 
 }  // namespace
