@@ -252,6 +252,7 @@ struct FaceJob {
     int32_t size;
     const SY_LightState* light;
     double diffusion;  // map texels
+    double reach;      // map texels from the centre that lookups can read; 0 for all
 };
 
 // Renders the casting layers of the light into occluder lists through the face, and builds the
@@ -309,6 +310,8 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
         if (!shadowsAny || rect.right <= rect.left || rect.bottom <= rect.top) continue;
         SY_ShadowFragmentArray* array = arrays.Append(rect);
         SY_ShadowShader shader(caster.material, job.diffusion, perspective);
+        shader.reachCentre[0] = shader.reachCentre[1] = job.size * 0.5;
+        shader.reachRadius = job.reach;
         caster.Render(context, camera, &shader, 0, SY_RenderTarget(*array));
     }
     arrays.Compact();
@@ -321,22 +324,49 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
                                                 merge.TakeStarts(), merge.TakeEntries());
 }
 
+// The placement turns and scales alike along every axis, so that its view keeps angles.
+bool KeepsAngles(const M_Matrix4& placement) {
+    auto dot = [&](int a, int b) {
+        return placement.mat[a][0] * placement.mat[b][0] +
+               placement.mat[a][1] * placement.mat[b][1] +
+               placement.mat[a][2] * placement.mat[b][2];
+    };
+    const double scale = dot(0, 0), tolerance = 1e-9 * scale;
+    return scale > 0 && std::fabs(dot(1, 1) - scale) <= tolerance &&
+           std::fabs(dot(2, 2) - scale) <= tolerance && std::fabs(dot(0, 1)) <= tolerance &&
+           std::fabs(dot(0, 2)) <= tolerance && std::fabs(dot(1, 2)) <= tolerance;
+}
+
+// How far from the centre of a spot light's only face lookups can read, in texels; 0 where
+// that is not known. The lighting looks up only points within the cone, which the face sees as
+// a disc of radius focal · tan(half angle); a soft lookup reads texels up to 2.5 texels to
+// each side of its point, so a margin of 4 covers the diagonal and rounding alike.
+double SpotReach(const SY_LightDesc& desc, const M_Matrix4& placement, double focal,
+                 int32_t faces) {
+    constexpr double kMargin = 4;
+    if (desc.type != kSY_LightSpot || faces != 1 || !KeepsAngles(placement)) return 0;
+    return focal * std::tan(desc.coneHalfAngle) + kMargin;
+}
+
 std::unique_ptr<SY_ShadowMap> BuildLightMap(SY_RenderContext* context, const SY_LightDesc& desc,
                                             const SY_LightState& light, int32_t size) {
+    const M_Matrix4& placement = desc.placements[desc.placements.Count() / 2];
     M_Matrix4 view;
-    Check(M_InverseMatrix4(&desc.placements[desc.placements.Count() / 2], &view));
+    Check(M_InverseMatrix4(&placement, &view));
     FaceJob job{
         &view,
         {0, 0},
         0,
         size,
         &light,
-        DiffusionTexels(light, size, context->destination->width, context->destination->height)};
+        DiffusionTexels(light, size, context->destination->width, context->destination->height),
+        0};
     if (desc.type == kSY_LightParallel) return RenderFace(context, job);
 
     job.focal = 0.5 * size / kTanHalfFace;
     FaceTurn turns[6];
     int32_t count = FaceTurns(desc, turns);
+    job.reach = SpotReach(desc, placement, job.focal, count);
     auto cube = std::make_unique<SY_CubicShadowMap>();
     for (int32_t i = 0; i < count; ++i) {
         job.turn = turns[i];

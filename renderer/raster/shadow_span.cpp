@@ -176,7 +176,13 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     P opaque{};
     opaque.alpha = kOpaque;
     Occluder(opaque, shader, &opaqueGrey);
-    for (int32_t i = 0; i < count; ++i, state.Step()) {
+    // Texels before the reach are stepped over rather than skipped by a later span start, so
+    // the state arrives at each texel inside exactly as it would across the whole span.
+    int32_t begin, end;
+    shader.ReachOfRow(x, count, y, &begin, &end);
+    for (int32_t i = 0; i < begin; ++i)
+        state.Step();
+    for (int32_t i = begin; i < end; ++i, state.Step()) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) continue;
         // Where the widest box is wholly opaque, so is every box inside it, and a layer that
@@ -274,6 +280,25 @@ SY_ShadowShader::SY_ShadowShader(const SY_Material& material, double diffusionTe
         ratio[levelCount] = 9.0f;
         ++levelCount;
     }
+}
+
+void SY_ShadowShader::ReachOfRow(int32_t x, int32_t count, int32_t y, int32_t* begin,
+                                 int32_t* end) const {
+    *begin = 0;
+    *end = count;
+    if (reachRadius == 0) return;
+    const double dy = y + 0.5 - reachCentre[1];
+    const double across = reachRadius * reachRadius - dy * dy;
+    if (across < 0) {
+        *end = 0;
+        return;
+    }
+    // Texel i is inside where |i + ½ − centre| ≤ half.
+    const double half = std::sqrt(across);
+    const double first = std::ceil(reachCentre[0] - half - 0.5) - x;
+    const double last = std::floor(reachCentre[0] + half - 0.5) + 1 - x;
+    *begin = static_cast<int32_t>(std::clamp(first, 0.0, double(count)));
+    *end = static_cast<int32_t>(std::clamp(last, double(*begin), double(count)));
 }
 
 int32_t SY_ShadowShader::ShadowBlurRadius() const {
