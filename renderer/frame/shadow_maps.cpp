@@ -7,6 +7,7 @@
 
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/shader.h"
+#include "renderer/raster/shadow_reach.h"
 #include "renderer/scene/depth_grouping.h"
 #include "renderer/scene/layer_projection.h"
 #include "renderer/scene/render_context.h"
@@ -251,9 +252,22 @@ struct FaceJob {
     double focal;  // 0: parallel light
     int32_t size;
     const SY_LightState* light;
-    double diffusion;  // map texels
-    double reach;      // map texels from the centre that lookups can read; 0 for all
+    double diffusion;           // map texels
+    SY_ShadowReach::Disc cone;  // a spot light's cone, beyond which no lookup reads
 };
+
+// What one receiver's lookups can read: its id and the box of its points in the map.
+struct ReceiverReach {
+    int32_t renderIndex;
+    SY_ShadowReach::Box box;
+};
+
+// A receiver's lookups are of points of its quadrilateral, grown by this much (in its own
+// pixels) for the frame's pixels along its edges, whose points may lie a little beyond it.
+constexpr double kReceiverGrowth = 16;
+// A soft lookup reads texels whose centres lie up to 2.5 texels from its point; a texel more
+// covers rounding.
+constexpr double kLookupReach = 4;
 
 // Renders the casting layers of the light into occluder lists through the face, and builds the
 // face's map from them; null when no layer shadows another in the face.
@@ -273,6 +287,7 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     SY_SetUpOptions options;
     options.output = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
     SY_Renderables casters, receivers;
+    SY_AccountedVector<ReceiverReach> reaches;
     for (const SY_LayerDesc& layer : context->scene->layers) {
         const SY_Material& material = layer.material;
         bool accepts = material.acceptsShadows != kSY_AcceptsShadowsOff;
@@ -286,6 +301,18 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
             options.margin = 0;
             if (SY_SetUpRenderable(layer, camera, options, &receiver))
                 receivers.push_back(std::move(receiver));
+            // Where its lookups fall, beyond the face too: near its border they read texels
+            // inside.
+            SY_SetUpOptions grown = options;
+            grown.margin = kReceiverGrowth;
+            grown.noClip = true;
+            SY_TRLayer reach(layer);
+            if (SY_SetUpRenderable(layer, camera, grown, &reach)) {
+                const double* b = reach.bounds;
+                reaches.push_back({material.renderIndex,
+                                   {b[0] - kLookupReach, b[1] - kLookupReach, b[2] + kLookupReach,
+                                    b[3] + kLookupReach}});
+            }
         }
         if (material.castsShadows) {
             // A blurred shadow spreads beyond its caster's outline.
@@ -299,7 +326,11 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     context->renderablesDone = 0;
     context->renderableCount = static_cast<int32_t>(casters.size());
     const SY_DepthSense sense = SY_DepthSenseOf(perspective);
-    SY_ShadowFragmentArrayList arrays;
+    struct Drawn {
+        SY_TRLayer* caster;
+        M_LRect rect;
+    };
+    SY_AccountedVector<Drawn> drawn;
     for (SY_TRLayer& caster : casters) {
         // Only a caster that lies in front of some other receiver somewhere is drawn.
         bool shadowsAny = std::any_of(receivers.begin(), receivers.end(), [&](const SY_TRLayer& r) {
@@ -307,12 +338,30 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
                    SY_RelateRenderables(caster, r, sense).bFirst;
         });
         M_LRect rect = PixelRect(caster, job.size);
-        if (!shadowsAny || rect.right <= rect.left || rect.bottom <= rect.top) continue;
-        SY_ShadowFragmentArray* array = arrays.Append(rect);
-        SY_ShadowShader shader(caster.material, job.diffusion, perspective);
-        shader.reachCentre[0] = shader.reachCentre[1] = job.size * 0.5;
-        shader.reachRadius = job.reach;
-        caster.Render(context, camera, &shader, 0, SY_RenderTarget(*array));
+        if (shadowsAny && rect.right > rect.left && rect.bottom > rect.top)
+            drawn.push_back({&caster, rect});
+    }
+    SY_ShadowFragmentArrayList arrays;
+    SY_AccountedVector<SY_ShadowReach::Box> boxes;
+    for (const Drawn& d : drawn) {
+        // A caster's texels matter to the lookups of every other receiver, and, through the
+        // light they leave to the occluders behind them, wherever another caster's do; its
+        // own lookups look past it.
+        const int32_t id = d.caster->material.renderIndex;
+        boxes.clear();
+        for (const ReceiverReach& r : reaches) {
+            if (r.renderIndex != id) boxes.push_back(r.box);
+        }
+        for (const Drawn& other : drawn) {
+            const M_LRect& o = other.rect;
+            if (&other != &d)
+                boxes.push_back({double(o.left), double(o.top), double(o.right), double(o.bottom)});
+        }
+        SY_ShadowReach reach(d.rect, boxes, job.cone);
+        SY_ShadowFragmentArray* array = arrays.Append(d.rect);
+        SY_ShadowShader shader(d.caster->material, job.diffusion, perspective);
+        shader.reach = &reach;
+        d.caster->Render(context, camera, &shader, 0, SY_RenderTarget(*array));
     }
     arrays.Compact();
     if (arrays.Count() == 0) return nullptr;
@@ -337,15 +386,14 @@ bool KeepsAngles(const M_Matrix4& placement) {
            std::fabs(dot(0, 2)) <= tolerance && std::fabs(dot(1, 2)) <= tolerance;
 }
 
-// How far from the centre of a spot light's only face lookups can read, in texels; 0 where
-// that is not known. The lighting looks up only points within the cone, which the face sees as
-// a disc of radius focal · tan(half angle); a soft lookup reads texels up to 2.5 texels to
-// each side of its point, so a margin of 4 covers the diagonal and rounding alike.
-double SpotReach(const SY_LightDesc& desc, const M_Matrix4& placement, double focal,
-                 int32_t faces) {
-    constexpr double kMargin = 4;
-    if (desc.type != kSY_LightSpot || faces != 1 || !KeepsAngles(placement)) return 0;
-    return focal * std::tan(desc.coneHalfAngle) + kMargin;
+// The disc of a spot light's only face outside which lookups read nothing, none where that is
+// not known. The lighting looks up only points within the cone, which the face sees as a disc
+// of radius focal · tan(half angle) about its centre; the margin covers the diagonal of a soft
+// lookup's reach.
+SY_ShadowReach::Disc SpotCone(const SY_LightDesc& desc, const M_Matrix4& placement, double focal,
+                              int32_t size, int32_t faces) {
+    if (desc.type != kSY_LightSpot || faces != 1 || !KeepsAngles(placement)) return {};
+    return {size * 0.5, size * 0.5, focal * std::tan(desc.coneHalfAngle) + kLookupReach};
 }
 
 std::unique_ptr<SY_ShadowMap> BuildLightMap(SY_RenderContext* context, const SY_LightDesc& desc,
@@ -360,13 +408,13 @@ std::unique_ptr<SY_ShadowMap> BuildLightMap(SY_RenderContext* context, const SY_
         size,
         &light,
         DiffusionTexels(light, size, context->destination->width, context->destination->height),
-        0};
+        {}};
     if (desc.type == kSY_LightParallel) return RenderFace(context, job);
 
     job.focal = 0.5 * size / kTanHalfFace;
     FaceTurn turns[6];
     int32_t count = FaceTurns(desc, turns);
-    job.reach = SpotReach(desc, placement, job.focal, count);
+    job.cone = SpotCone(desc, placement, job.focal, size, count);
     auto cube = std::make_unique<SY_CubicShadowMap>();
     for (int32_t i = 0; i < count; ++i) {
         job.turn = turns[i];

@@ -11,6 +11,8 @@
 #include "renderer/scene/specular_table.h"
 #include "u_memory.h"
 
+class SY_ShadowReach;
+
 class SY_Shader : public U_MemTrackedObject {
 public:
     virtual ~SY_Shader() = default;
@@ -46,9 +48,6 @@ public:
                                               : w - ratio[level] * diffusion);
     }
 
-    // The texels of row y, from x on, that a lookup can read: [*begin, *end) of the count.
-    void ReachOfRow(int32_t x, int32_t count, int32_t y, int32_t* begin, int32_t* end) const;
-
     uint16_t layerId = 0;
     uint16_t opacity = 32768;   // 0..32768
     uint16_t transmission = 0;  // share of the layer's colour the light keeps, 0..32768
@@ -60,10 +59,8 @@ public:
     // How far behind the layer a level lies, relative to the layer's distance from the light
     // (or to the diffusion, for a parallel light): radius / (diffusion − radius).
     float ratio[kMaxLevels] = {};
-    // Lookups read no texel whose centre lies farther than reachRadius from reachCentre (a
-    // spot light's cone); such texels are left empty. Unbounded where reachRadius is 0.
-    double reachCentre[2] = {0, 0};
-    double reachRadius = 0;
+    // The texels lookups can read, the only ones drawn; null for all of them.
+    const SY_ShadowReach* reach = nullptr;
 };
 
 // Per-channel lighting of one pixel: texel × diffuse + specular × channel maximum.

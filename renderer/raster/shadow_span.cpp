@@ -8,6 +8,7 @@
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/samplers.h"
 #include "renderer/raster/shader.h"
+#include "renderer/raster/shadow_reach.h"
 #include "renderer/raster/span_start.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_report.h"
@@ -176,15 +177,9 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     P opaque{};
     opaque.alpha = kOpaque;
     Occluder(opaque, shader, &opaqueGrey);
-    // Texels before the reach are stepped over rather than skipped by a later span start, so
-    // the state arrives at each texel inside exactly as it would across the whole span.
-    int32_t begin, end;
-    shader.ReachOfRow(x, count, y, &begin, &end);
-    for (int32_t i = 0; i < begin; ++i)
-        state.Step();
-    for (int32_t i = begin; i < end; ++i, state.Step()) {
+    auto drawTexel = [&](int32_t i) {
         const SY_SpanMapping* depth = FirstPresent(state);
-        if (!depth) continue;
+        if (!depth) return;
         // Where the widest box is wholly opaque, so is every box inside it, and a layer that
         // passes no colour then lets the same grey through at every level.
         P widest;
@@ -192,7 +187,7 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
         if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
             array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
                                      shader.layerId, heads + i, thread);
-            continue;
+            return;
         }
         present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
         for (int32_t level = 0; level + 1 < levels; ++level) {
@@ -211,6 +206,20 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
             array->AddShadowFragment(&occluders[level], shader.DepthKey(depth->w, level), 0.0f,
                                      shader.layerId, heads + i, thread);
         }
+    };
+    // Texels beyond the reach are stepped over rather than cut off by moving the span's start,
+    // so the state arrives at each texel drawn exactly as it would across the whole span.
+    const SY_ShadowReach::Run whole{x, x + count};
+    const SY_ShadowReach::Run* run = shader.reach ? shader.reach->RowBegin(y) : &whole;
+    const SY_ShadowReach::Run* lastRun = shader.reach ? shader.reach->RowEnd(y) : &whole + 1;
+    int32_t i = 0;
+    for (; run < lastRun; ++run) {
+        const int32_t begin = std::clamp(run->begin - x, i, count);
+        const int32_t end = std::clamp(run->end - x, begin, count);
+        for (; i < begin; ++i)
+            state.Step();
+        for (; i < end; ++i, state.Step())
+            drawTexel(i);
     }
 }
 
@@ -280,25 +289,6 @@ SY_ShadowShader::SY_ShadowShader(const SY_Material& material, double diffusionTe
         ratio[levelCount] = 9.0f;
         ++levelCount;
     }
-}
-
-void SY_ShadowShader::ReachOfRow(int32_t x, int32_t count, int32_t y, int32_t* begin,
-                                 int32_t* end) const {
-    *begin = 0;
-    *end = count;
-    if (reachRadius == 0) return;
-    const double dy = y + 0.5 - reachCentre[1];
-    const double across = reachRadius * reachRadius - dy * dy;
-    if (across < 0) {
-        *end = 0;
-        return;
-    }
-    // Texel i is inside where |i + ½ − centre| ≤ half.
-    const double half = std::sqrt(across);
-    const double first = std::ceil(reachCentre[0] - half - 0.5) - x;
-    const double last = std::floor(reachCentre[0] + half - 0.5) + 1 - x;
-    *begin = static_cast<int32_t>(std::clamp(first, 0.0, double(count)));
-    *end = static_cast<int32_t>(std::clamp(last, double(*begin), double(count)));
 }
 
 int32_t SY_ShadowShader::ShadowBlurRadius() const {
