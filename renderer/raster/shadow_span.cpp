@@ -4,6 +4,7 @@
 #include <cmath>
 
 #include "pf_bit_depth.h"
+#include "pf_box_sum.h"
 #include "pf_tables.h"
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/samplers.h"
@@ -80,11 +81,85 @@ private:
     Slot slots_[kSlots];
 };
 
+// Box averages from the texture's summed-area table, of cells S.
+template <class S>
+class TableSums {
+public:
+    TableSums(const PF_SummedAreaTable& table, const S* sums)
+        : width_(table.Width()), height_(table.Height()), sums_(sums) {}
+    int32_t Width() const { return width_; }
+    int32_t Height() const { return height_; }
+    // Over the texels [x0, x1) × [y0, y1).
+    template <class P>
+    void Whole(int32_t x0, int32_t y0, int32_t x1, int32_t y1, P* out) const {
+        PF_SummedAreaTable_SampleDraft(width_, height_, sums_, x0, y0, x1, y1, out);
+    }
+    // Over [x0, x1] × [y0, y1], edges anywhere.
+    template <class P>
+    void Fractional(float x0, float y0, float x1, float y1, P* out) const {
+        PF_SummedAreaTable_SampleAA(width_, height_, sums_, x0, y0, x1, y1, out);
+    }
+
+private:
+    int32_t width_, height_;
+    const S* sums_;
+};
+
+// The same averages' alpha for a texture whose texels all have full alpha, without its table:
+// every difference of sums the table would give is the area of a box of whole texels, an
+// integer the cells hold exactly, and comes out the same here, so the alpha does too. Colour
+// is left 0.
+template <class S>
+class FullAlphaSums {
+public:
+    explicit FullAlphaSums(const SY_FullAlphaSums<S>& sums) : sums_(sums) {}
+    int32_t Width() const { return sums_.Width(); }
+    int32_t Height() const { return sums_.Height(); }
+    template <class P>
+    void Whole(int32_t x0, int32_t y0, int32_t x1, int32_t y1, P* out) const {
+        using Cells = PF_BoxCellsPixel<S>;
+        using V = decltype(S::alpha);
+        // Texels outside count as transparent.
+        const int64_t wide = std::clamp(x1, 0, Width()) - std::clamp(x0, 0, Width());
+        const int64_t high = std::clamp(y1, 0, Height()) - std::clamp(y0, 0, Height());
+        const S box{V(wide * high), 0, 0, 0};
+        float area = x1 > x0 && y1 > y0 ? float(x1 - x0) * float(y1 - y0) : 0.0f;
+        pf_tables::StoreAverage(Cells::ToFloat4(Cells::Widen(box)), area, out);
+    }
+    // A box with fractional edges is less than four texels across along one axis, so it
+    // spans at most six of the axis's edges: moved to the first of them it lies in the
+    // narrow rows or columns.
+    template <class P>
+    void Fractional(float x0, float y0, float x1, float y1, P* out) const {
+        using Cells = PF_BoxCellsPixel<S>;
+        constexpr int32_t kNarrow = SY_FullAlphaSums<S>::kNarrow;
+        PF_BoxAxis ax = PF_MakeBoxAxis(x0, x1, Width());
+        PF_BoxAxis ay = PF_MakeBoxAxis(y0, y1, Height());
+        float area = x1 > x0 && y1 > y0 ? (x1 - x0) * (y1 - y0) : 0.0f;
+        auto moveToFirst = [](PF_BoxAxis* a) {
+            for (int k = 3; k >= 0; --k)
+                a->edge[k] -= a->edge[0];
+        };
+        PF_Float4 sum;
+        if (ay.edge[3] - ay.edge[0] < kNarrow) {
+            moveToFirst(&ay);
+            sum = PF_BoxSum<Cells>(sums_.Rows(), ptrdiff_t(Width()) + 1, ax, ay);
+        } else {
+            moveToFirst(&ax);
+            sum = PF_BoxSum<Cells>(sums_.Columns(), kNarrow, ax, ay);
+        }
+        pf_tables::StoreAverage(sum, area, out);
+    }
+
+private:
+    const SY_FullAlphaSums<S>& sums_;
+};
+
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
-// the layer's summed-area table (sums of type S), or from opaque where there is one.
-template <class P, class S>
-void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& texture,
-               const SY_SpanMapping& m, float scale, OpaqueBoxes<P>* opaque, P* out) {
+// sums (TableSums or FullAlphaSums), or from opaque where there is one.
+template <class P, class Sums>
+void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& m, float scale,
+               OpaqueBoxes<P>* opaque, P* out) {
     using sy_sampling::kFarTexels;
     if (!sy_sampling::InFront(m, texture.perspective)) {
         *out = P{};
@@ -105,18 +180,17 @@ void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& t
                    y0 = static_cast<int32_t>(std::floor(cv - rv)),
                    x1 = static_cast<int32_t>(std::ceil(cu + ru)),
                    y1 = static_cast<int32_t>(std::ceil(cv + rv));
-        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= table.Width() && y1 <= table.Height() &&
-            x1 > x0 && y1 > y0) {
+        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= sums.Width() && y1 <= sums.Height() && x1 > x0 &&
+            y1 > y0) {
             *out = opaque->Average(float(x1 - x0) * float(y1 - y0));
             return;
         }
-        PF_SummedAreaTable_SampleDraft(table.Width(), table.Height(), sums, x0, y0, x1, y1, out);
+        sums.Whole(x0, y0, x1, y1, out);
         return;
     }
     if (ru > 0.5 && rv > 0.5) {
-        PF_SummedAreaTable_SampleAA(table.Width(), table.Height(), sums,
-                                    static_cast<float>(cu - ru), static_cast<float>(cv - rv),
-                                    static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
+        sums.Fractional(static_cast<float>(cu - ru), static_cast<float>(cv - rv),
+                        static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
         return;
     }
     sy_sampling::Filter(texture, u, v, ru, rv, out);
@@ -134,21 +208,21 @@ const SY_SpanMapping* FirstPresent(const SY_SpanSubsampleState<P>& state) {
     return nullptr;
 }
 
-template <class P, class S>
-void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSampleState<P>& state,
-                   float scale, OpaqueBoxes<P>* opaque, P* out) {
-    SampleBox(table, sums, state.texture, state.mapping, scale, opaque, out);
+template <class P, class Sums>
+void SampleBlurred(const Sums& sums, SY_SpanSampleState<P>& state, float scale,
+                   OpaqueBoxes<P>* opaque, P* out) {
+    SampleBox(sums, state.texture, state.mapping, scale, opaque, out);
 }
 
 // The box average over the present subsamples, alpha falling with the absent ones.
-template <class P, class S>
-void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsampleState<P>& state,
-                   float scale, OpaqueBoxes<P>* opaque, P* out) {
+template <class P, class Sums>
+void SampleBlurred(const Sums& sums, SY_SpanSubsampleState<P>& state, float scale,
+                   OpaqueBoxes<P>* opaque, P* out) {
     sy_sampling::Accumulator sum;
     for (int32_t i = state.first; i <= state.last; ++i) {
         if (!(state.mappings[i].invW > 0)) continue;
         P texel;
-        SampleBox(table, sums, state.texture, state.mappings[i], scale, opaque, &texel);
+        SampleBox(sums, state.texture, state.mappings[i], scale, opaque, &texel);
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
@@ -237,21 +311,27 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
         });
         return;
     }
-    const PF_SummedAreaTable& table = *geometry.sumTable;
+    const SY_CasterSums& casterSums = geometry.casterSums;
     // A layer that passes no colour shadows by its alpha alone.
     OpaqueBoxes<P> boxes;
-    OpaqueBoxes<P>* opaque = shader.transmission == 0 && geometry.opaqueTexture ? &boxes : nullptr;
-    auto draw = [&](const auto* sums) {
+    OpaqueBoxes<P>* opaque = shader.transmission == 0 && casterSums.opaque ? &boxes : nullptr;
+    auto draw = [&](const auto& sums) {
         DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
             // The box reaches the level's radius, and at least the texel's own footprint.
             float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-            SampleBlurred(table, sums, state, scale, opaque, out);
+            SampleBlurred(sums, state, scale, opaque, out);
         });
     };
-    if (table.HasDoubleSums())
-        draw(table.DoubleSums());
-    else
-        draw(table.FloatSums());
+    if (const PF_SummedAreaTable* table = casterSums.table) {
+        if (table->HasDoubleSums())
+            draw(TableSums(*table, table->DoubleSums()));
+        else
+            draw(TableSums(*table, table->FloatSums()));
+    } else if (casterSums.doubleFullAlpha) {
+        draw(FullAlphaSums(*casterSums.doubleFullAlpha));
+    } else {
+        draw(FullAlphaSums(*casterSums.floatFullAlpha));
+    }
 }
 
 template <class P>
