@@ -71,6 +71,12 @@ public:
         }
         return slot.average;
     }
+    // Whether the last box sampled lay inside the texture with its centre at least kDeep
+    // texels from every edge, so that the filter of every level there, down to a bicubic one
+    // at the texel's own footprint, reads texels of full alpha only.
+    static constexpr double kDeep = 3.0;
+    bool LastDeep() const { return lastDeep_; }
+    void SetLastDeep(bool deep) { lastDeep_ = deep; }
 
 private:
     static constexpr uint32_t kSlots = 16;
@@ -79,6 +85,7 @@ private:
         P average{};
     };
     Slot slots_[kSlots];
+    bool lastDeep_ = false;
 };
 
 // Box averages from the texture's summed-area table, of cells S.
@@ -161,6 +168,7 @@ template <class P, class Sums>
 void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& m, float scale,
                OpaqueBoxes<P>* opaque, P* out) {
     using sy_sampling::kFarTexels;
+    if (opaque) opaque->SetLastDeep(false);
     if (!sy_sampling::InFront(m, texture.perspective)) {
         *out = P{};
         return;
@@ -182,6 +190,9 @@ void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& 
                    y1 = static_cast<int32_t>(std::ceil(cv + rv));
         if (opaque && x0 >= 0 && y0 >= 0 && x1 <= sums.Width() && y1 <= sums.Height() && x1 > x0 &&
             y1 > y0) {
+            constexpr double kDeep = OpaqueBoxes<P>::kDeep;
+            opaque->SetLastDeep(cu >= kDeep && cu <= sums.Width() - kDeep && cv >= kDeep &&
+                                cv <= sums.Height() - kDeep);
             *out = opaque->Average(float(x1 - x0) * float(y1 - y0));
             return;
         }
@@ -226,6 +237,8 @@ void SampleBlurred(const Sums& sums, SY_SpanSubsampleState<P>& state, float scal
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
+    // Not every subsample's box need lie deep inside.
+    if (opaque) opaque->SetLastDeep(false);
 }
 
 // The two occluders let the same light through.
@@ -233,13 +246,15 @@ bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
     return a.red == b.red && a.green == b.green && a.blue == b.blue;
 }
 
-// Steps the state across the span; sample(level, out) gives the layer's colour at a level. A
+// Steps the state across the span; sample(level, out) gives the layer's colour at a level, and
+// deepOpaque() tells whether the last sample of the widest level lay deep inside an opaque
+// texture (see OpaqueBoxes). A
 // level that lets through what both its neighbours let through adds nothing that blending
 // between them would not give, so only the levels where the light changes are kept: inside
 // an opaque layer one occluder stands for all of them.
-template <class P, class State, class Sample>
+template <class P, class State, class Sample, class DeepOpaque>
 void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t count, int32_t y,
-              SY_ShadowFragmentArray* array, int32_t thread, Sample sample) {
+              SY_ShadowFragmentArray* array, int32_t thread, Sample sample, DeepOpaque deepOpaque) {
     SY_ShadowFragment** heads = array->HeadAt(x, y);
     const int32_t levels = shader.levelCount;
     PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
@@ -255,10 +270,12 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) return;
         // Where the widest box is wholly opaque, so is every box inside it, and a layer that
-        // passes no colour then lets the same grey through at every level.
+        // passes no colour then lets the same grey through at every level. A float average of
+        // full alpha may round just below 1; deep inside an opaque texture every level's still
+        // rounds to the same 16-bit grey.
         P widest;
         sample(levels - 1, &widest);
-        if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
+        if (levels > 1 && shader.transmission == 0 && (widest.alpha == kOpaque || deepOpaque())) {
             array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
                                      shader.layerId, heads + i, thread);
             return;
@@ -303,12 +320,15 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
                    int32_t thread) {
     if (!shader.soft) {
         bool filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
-        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t, P* out) {
-            if (filtered)
-                SY_SampleFiltered(state, out);
-            else
-                SY_SampleNearest(state, out);
-        });
+        DrawSpan<P>(
+            shader, state, x, count, y, array, thread,
+            [&](int32_t, P* out) {
+                if (filtered)
+                    SY_SampleFiltered(state, out);
+                else
+                    SY_SampleNearest(state, out);
+            },
+            [] { return false; });
         return;
     }
     const SY_CasterSums& casterSums = geometry.casterSums;
@@ -316,11 +336,14 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
     OpaqueBoxes<P> boxes;
     OpaqueBoxes<P>* opaque = shader.transmission == 0 && casterSums.opaque ? &boxes : nullptr;
     auto draw = [&](const auto& sums) {
-        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
-            // The box reaches the level's radius, and at least the texel's own footprint.
-            float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-            SampleBlurred(sums, state, scale, opaque, out);
-        });
+        DrawSpan<P>(
+            shader, state, x, count, y, array, thread,
+            [&](int32_t level, P* out) {
+                // The box reaches the level's radius, and at least the texel's own footprint.
+                float scale = 2.0f * std::max(0.5f, shader.radius[level]);
+                SampleBlurred(sums, state, scale, opaque, out);
+            },
+            [&] { return opaque && opaque->LastDeep(); });
     };
     if (const PF_SummedAreaTable* table = casterSums.table) {
         if (table->HasDoubleSums())
