@@ -84,17 +84,19 @@ M_LRect PixelRect(const SY_TRLayer& renderable, int32_t size) {
             clamp(std::ceil(renderable.bounds[2])), clamp(std::ceil(renderable.bounds[3]))};
 }
 
-// Merges the occluder lists of every array at each texel into one run, nearest the light first.
+// Merges the occluder lists of every array at each texel into one run, nearest the light first;
+// array k has lists within occupied[k] only.
 // Each entry's transmission is the product of what every layer passed so far lets through, a
 // layer counting by its last entry passed (its blur levels replace one another).
 class MapMerge {
 public:
-    explicit MapMerge(const SY_ShadowFragmentArrayList& arrays) : arrays_(arrays) {
+    MapMerge(const SY_ShadowFragmentArrayList& arrays, const SY_AccountedVector<M_LRect>& occupied)
+        : arrays_(arrays), occupied_(occupied) {
         int32_t n = arrays.Count();
-        texels_ = arrays[0]->Bounds();
+        texels_ = occupied[0];
         size_t total = 0;
         for (int32_t k = 0; k < n; ++k) {
-            const M_LRect& b = arrays[k]->Bounds();
+            const M_LRect& b = occupied[size_t(k)];
             texels_.left = std::min(texels_.left, b.left);
             texels_.top = std::min(texels_.top, b.top);
             texels_.right = std::max(texels_.right, b.right);
@@ -119,7 +121,7 @@ public:
         for (int32_t y = texels_.top; y < texels_.bottom; ++y) {
             rowArrays_.clear();
             for (int32_t k = 0; k < arrays_.Count(); ++k) {
-                const M_LRect& b = arrays_[k]->Bounds();
+                const M_LRect& b = occupied_[size_t(k)];
                 if (y >= b.top && y < b.bottom) rowArrays_.push_back(k);
             }
             CountCovers(y);
@@ -145,7 +147,7 @@ private:
     void CountCovers(int32_t y) {
         std::fill(rowCovers_.begin(), rowCovers_.end(), uint8_t{0});
         for (int32_t k : rowArrays_) {
-            const M_LRect& b = arrays_[k]->Bounds();
+            const M_LRect& b = occupied_[size_t(k)];
             SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
             for (int32_t x = b.left; x < b.right; ++x) {
                 if (!heads[x - b.left]) continue;
@@ -173,7 +175,7 @@ private:
     void MergeTexel(int32_t x, int32_t y) {
         covering_.clear();
         for (int32_t k : rowArrays_) {
-            const M_LRect& b = arrays_[k]->Bounds();
+            const M_LRect& b = occupied_[size_t(k)];
             if (x < b.left || x >= b.right) continue;
             if (const SY_ShadowFragment* f = *arrays_[k]->HeadAt(x, y)) {
                 next_[k] = f;
@@ -233,6 +235,7 @@ private:
     }
 
     const SY_ShadowFragmentArrayList& arrays_;
+    const SY_AccountedVector<M_LRect>& occupied_;
     M_LRect texels_;
     SY_ShadowBlock<uint32_t> starts_;
     SY_ShadowBlock<SY_ShadowEntry> entries_;
@@ -342,6 +345,7 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
             drawn.push_back({&caster, rect});
     }
     SY_ShadowFragmentArrayList arrays;
+    SY_AccountedVector<M_LRect> occupied;  // where each array can have lists
     SY_AccountedVector<SY_ShadowReach::Box> boxes;
     for (const Drawn& d : drawn) {
         // A caster's texels matter to the lookups of every other receiver, and, through the
@@ -359,14 +363,24 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
         }
         SY_ShadowReach reach(d.rect, boxes, job.cone);
         SY_ShadowFragmentArray* array = arrays.Append(d.rect);
+        occupied.push_back(reach.Bounds());
         SY_ShadowShader shader(d.caster->material, job.diffusion, perspective);
         shader.reach = &reach;
         d.caster->Render(context, camera, &shader, 0, SY_RenderTarget(*array));
     }
+    // The arrays that received nothing go; so do their rectangles.
+    size_t kept = 0;
+    for (int32_t k = 0; k < arrays.Count(); ++k) {
+        if (arrays[k]->fragmentCount.load(std::memory_order_relaxed) != 0)
+            occupied[kept++] = occupied[size_t(k)];
+    }
+    occupied.resize(kept);
     arrays.Compact();
     if (arrays.Count() == 0) return nullptr;
 
-    MapMerge merge(arrays);
+    // The map's texels span the lists only: those beyond are empty, as a lookup outside the
+    // texels takes them.
+    MapMerge merge(arrays, occupied);
     merge.Run();
     const double face[4] = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
     return std::make_unique<SY_PlanarShadowMap>(worldToMap, perspective, face, merge.Texels(),

@@ -16,7 +16,7 @@ SY_ShadowReach::Run TexelsWithin(double x0, double x1, int32_t left, int32_t rig
 
 SY_ShadowReach::SY_ShadowReach(const M_LRect& rows, const SY_AccountedVector<Box>& boxes,
                                const Disc& disc)
-    : top_(rows.top) {
+    : top_(rows.top), bounds_{rows.right, rows.bottom, rows.left, rows.top} {
     rowStarts_.reserve(size_t(rows.bottom - rows.top) + 1);
     SY_AccountedVector<Run> row;
     row.reserve(boxes.size());
@@ -48,4 +48,13 @@ SY_ShadowReach::SY_ShadowReach(const M_LRect& rows, const SY_AccountedVector<Box
         }
     }
     rowStarts_.push_back(static_cast<uint32_t>(runs_.size()));
+    for (int32_t y = rows.top; y < rows.bottom; ++y) {
+        const Run* first = RowBegin(y);
+        const Run* end = RowEnd(y);
+        if (first == end) continue;
+        bounds_.left = std::min(bounds_.left, first->begin);
+        bounds_.right = std::max(bounds_.right, end[-1].end);
+        bounds_.top = std::min(bounds_.top, y);
+        bounds_.bottom = y + 1;
+    }
 }

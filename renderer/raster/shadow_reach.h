@@ -26,12 +26,15 @@ public:
     // Throws std::bad_alloc without memory.
     SY_ShadowReach(const M_LRect& rows, const SY_AccountedVector<Box>& boxes, const Disc& disc);
 
+    // The smallest rectangle that holds every run; empty (right ≤ left) where there are none.
+    const M_LRect& Bounds() const { return bounds_; }
     // The runs of row y (within the rows), left to right, disjoint and not touching.
     const Run* RowBegin(int32_t y) const { return runs_.data() + rowStarts_[size_t(y - top_)]; }
     const Run* RowEnd(int32_t y) const { return runs_.data() + rowStarts_[size_t(y - top_) + 1]; }
 
 private:
     int32_t top_;
+    M_LRect bounds_;
     SY_AccountedVector<uint32_t> rowStarts_;  // one per row and one more
     SY_AccountedVector<Run> runs_;
 };

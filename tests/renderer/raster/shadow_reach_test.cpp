@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
 #include <vector>
 
@@ -42,6 +43,16 @@ TEST(ShadowReach, RunsOfEachRow) {
                 runs.push_back({y, r->begin, r->end});
         }
         EXPECT_EQ(runs, c.runs) << c.name;
+        // The bounds are the runs' smallest rectangle.
+        M_LRect expected{c.runs[0][1], c.runs[0][0], c.runs[0][2], c.runs.back()[0] + 1};
+        for (const auto& r : c.runs) {
+            expected.left = std::min(expected.left, r[1]);
+            expected.right = std::max(expected.right, r[2]);
+        }
+        const M_LRect& b = reach.Bounds();
+        EXPECT_TRUE(b.left == expected.left && b.top == expected.top && b.right == expected.right &&
+                    b.bottom == expected.bottom)
+            << c.name;
     }
 }
 
