@@ -146,6 +146,7 @@ SY_GeometryFlags GeometryFlagsFor(const SY_TRLayer& renderable, const SY_CameraV
     flags.screenSizedTexture = renderable.collapsed && !simplePath;
     flags.needsSurfacePoint = shader && shader->NeedsSurfacePoint();
     flags.blurred = shader && shader->ShadowBlurRadius() != 0;
+    flags.alphaOnly = flags.blurred && shader->ReadsAlphaOnly();
     flags.wholeLayer = simplePath;
     flags.samplingFilter = SY_SamplingFilterOf(renderable.material);
     return flags;

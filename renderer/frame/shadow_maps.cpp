@@ -7,6 +7,7 @@
 
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/shader.h"
+#include "renderer/raster/shadow_reach.h"
 #include "renderer/scene/depth_grouping.h"
 #include "renderer/scene/layer_projection.h"
 #include "renderer/scene/render_context.h"
@@ -83,17 +84,19 @@ M_LRect PixelRect(const SY_TRLayer& renderable, int32_t size) {
             clamp(std::ceil(renderable.bounds[2])), clamp(std::ceil(renderable.bounds[3]))};
 }
 
-// Merges the occluder lists of every array at each texel into one run, nearest the light first.
+// Merges the occluder lists of every array at each texel into one run, nearest the light first;
+// array k has lists within occupied[k] only.
 // Each entry's transmission is the product of what every layer passed so far lets through, a
 // layer counting by its last entry passed (its blur levels replace one another).
 class MapMerge {
 public:
-    explicit MapMerge(const SY_ShadowFragmentArrayList& arrays) : arrays_(arrays) {
+    MapMerge(const SY_ShadowFragmentArrayList& arrays, const SY_AccountedVector<M_LRect>& occupied)
+        : arrays_(arrays), occupied_(occupied) {
         int32_t n = arrays.Count();
-        texels_ = arrays[0]->Bounds();
+        texels_ = occupied[0];
         size_t total = 0;
         for (int32_t k = 0; k < n; ++k) {
-            const M_LRect& b = arrays[k]->Bounds();
+            const M_LRect& b = occupied[size_t(k)];
             texels_.left = std::min(texels_.left, b.left);
             texels_.top = std::min(texels_.top, b.top);
             texels_.right = std::max(texels_.right, b.right);
@@ -118,7 +121,7 @@ public:
         for (int32_t y = texels_.top; y < texels_.bottom; ++y) {
             rowArrays_.clear();
             for (int32_t k = 0; k < arrays_.Count(); ++k) {
-                const M_LRect& b = arrays_[k]->Bounds();
+                const M_LRect& b = occupied_[size_t(k)];
                 if (y >= b.top && y < b.bottom) rowArrays_.push_back(k);
             }
             CountCovers(y);
@@ -144,7 +147,7 @@ private:
     void CountCovers(int32_t y) {
         std::fill(rowCovers_.begin(), rowCovers_.end(), uint8_t{0});
         for (int32_t k : rowArrays_) {
-            const M_LRect& b = arrays_[k]->Bounds();
+            const M_LRect& b = occupied_[size_t(k)];
             SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
             for (int32_t x = b.left; x < b.right; ++x) {
                 if (!heads[x - b.left]) continue;
@@ -172,7 +175,7 @@ private:
     void MergeTexel(int32_t x, int32_t y) {
         covering_.clear();
         for (int32_t k : rowArrays_) {
-            const M_LRect& b = arrays_[k]->Bounds();
+            const M_LRect& b = occupied_[size_t(k)];
             if (x < b.left || x >= b.right) continue;
             if (const SY_ShadowFragment* f = *arrays_[k]->HeadAt(x, y)) {
                 next_[k] = f;
@@ -232,6 +235,7 @@ private:
     }
 
     const SY_ShadowFragmentArrayList& arrays_;
+    const SY_AccountedVector<M_LRect>& occupied_;
     M_LRect texels_;
     SY_ShadowBlock<uint32_t> starts_;
     SY_ShadowBlock<SY_ShadowEntry> entries_;
@@ -251,8 +255,22 @@ struct FaceJob {
     double focal;  // 0: parallel light
     int32_t size;
     const SY_LightState* light;
-    double diffusion;  // map texels
+    double diffusion;           // map texels
+    SY_ShadowReach::Disc cone;  // a spot light's cone, beyond which no lookup reads
 };
+
+// What one receiver's lookups can read: its id and the box of its points in the map.
+struct ReceiverReach {
+    int32_t renderIndex;
+    SY_ShadowReach::Box box;
+};
+
+// A receiver's lookups are of points of its quadrilateral, grown by this much (in its own
+// pixels) for the frame's pixels along its edges, whose points may lie a little beyond it.
+constexpr double kReceiverGrowth = 16;
+// A soft lookup reads texels whose centres lie up to 2.5 texels from its point; a texel more
+// covers rounding.
+constexpr double kLookupReach = 4;
 
 // Renders the casting layers of the light into occluder lists through the face, and builds the
 // face's map from them; null when no layer shadows another in the face.
@@ -272,6 +290,7 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     SY_SetUpOptions options;
     options.output = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
     SY_Renderables casters, receivers;
+    SY_AccountedVector<ReceiverReach> reaches;
     for (const SY_LayerDesc& layer : context->scene->layers) {
         const SY_Material& material = layer.material;
         bool accepts = material.acceptsShadows != kSY_AcceptsShadowsOff;
@@ -285,6 +304,18 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
             options.margin = 0;
             if (SY_SetUpRenderable(layer, camera, options, &receiver))
                 receivers.push_back(std::move(receiver));
+            // Where its lookups fall, beyond the face too: near its border they read texels
+            // inside.
+            SY_SetUpOptions grown = options;
+            grown.margin = kReceiverGrowth;
+            grown.noClip = true;
+            SY_TRLayer reach(layer);
+            if (SY_SetUpRenderable(layer, camera, grown, &reach)) {
+                const double* b = reach.bounds;
+                reaches.push_back({material.renderIndex,
+                                   {b[0] - kLookupReach, b[1] - kLookupReach, b[2] + kLookupReach,
+                                    b[3] + kLookupReach}});
+            }
         }
         if (material.castsShadows) {
             // A blurred shadow spreads beyond its caster's outline.
@@ -298,7 +329,11 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     context->renderablesDone = 0;
     context->renderableCount = static_cast<int32_t>(casters.size());
     const SY_DepthSense sense = SY_DepthSenseOf(perspective);
-    SY_ShadowFragmentArrayList arrays;
+    struct Drawn {
+        SY_TRLayer* caster;
+        M_LRect rect;
+    };
+    SY_AccountedVector<Drawn> drawn;
     for (SY_TRLayer& caster : casters) {
         // Only a caster that lies in front of some other receiver somewhere is drawn.
         bool shadowsAny = std::any_of(receivers.begin(), receivers.end(), [&](const SY_TRLayer& r) {
@@ -306,37 +341,94 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
                    SY_RelateRenderables(caster, r, sense).bFirst;
         });
         M_LRect rect = PixelRect(caster, job.size);
-        if (!shadowsAny || rect.right <= rect.left || rect.bottom <= rect.top) continue;
-        SY_ShadowFragmentArray* array = arrays.Append(rect);
-        SY_ShadowShader shader(caster.material, job.diffusion, perspective);
-        caster.Render(context, camera, &shader, 0, SY_RenderTarget(*array));
+        if (shadowsAny && rect.right > rect.left && rect.bottom > rect.top)
+            drawn.push_back({&caster, rect});
     }
+    SY_ShadowFragmentArrayList arrays;
+    SY_AccountedVector<M_LRect> occupied;  // where each array can have lists
+    SY_AccountedVector<SY_ShadowReach::Box> boxes;
+    for (const Drawn& d : drawn) {
+        // A caster's texels matter to the lookups of every other receiver, and, through the
+        // light they leave to the occluders behind them, wherever another caster's do; its
+        // own lookups look past it.
+        const int32_t id = d.caster->material.renderIndex;
+        boxes.clear();
+        for (const ReceiverReach& r : reaches) {
+            if (r.renderIndex != id) boxes.push_back(r.box);
+        }
+        for (const Drawn& other : drawn) {
+            const M_LRect& o = other.rect;
+            if (&other != &d)
+                boxes.push_back({double(o.left), double(o.top), double(o.right), double(o.bottom)});
+        }
+        SY_ShadowReach reach(d.rect, boxes, job.cone);
+        SY_ShadowFragmentArray* array = arrays.Append(d.rect);
+        occupied.push_back(reach.Bounds());
+        SY_ShadowShader shader(d.caster->material, job.diffusion, perspective);
+        shader.reach = &reach;
+        d.caster->Render(context, camera, &shader, 0, SY_RenderTarget(*array));
+    }
+    // The arrays that received nothing go; so do their rectangles.
+    size_t kept = 0;
+    for (int32_t k = 0; k < arrays.Count(); ++k) {
+        if (arrays[k]->fragmentCount.load(std::memory_order_relaxed) != 0)
+            occupied[kept++] = occupied[size_t(k)];
+    }
+    occupied.resize(kept);
     arrays.Compact();
     if (arrays.Count() == 0) return nullptr;
 
-    MapMerge merge(arrays);
+    // The map's texels span the lists only: those beyond are empty, as a lookup outside the
+    // texels takes them.
+    MapMerge merge(arrays, occupied);
     merge.Run();
     const double face[4] = {0, 0, static_cast<double>(job.size), static_cast<double>(job.size)};
     return std::make_unique<SY_PlanarShadowMap>(worldToMap, perspective, face, merge.Texels(),
                                                 merge.TakeStarts(), merge.TakeEntries());
 }
 
+// The placement turns and scales alike along every axis, so that its view keeps angles.
+bool KeepsAngles(const M_Matrix4& placement) {
+    auto dot = [&](int a, int b) {
+        return placement.mat[a][0] * placement.mat[b][0] +
+               placement.mat[a][1] * placement.mat[b][1] +
+               placement.mat[a][2] * placement.mat[b][2];
+    };
+    const double scale = dot(0, 0), tolerance = 1e-9 * scale;
+    return scale > 0 && std::fabs(dot(1, 1) - scale) <= tolerance &&
+           std::fabs(dot(2, 2) - scale) <= tolerance && std::fabs(dot(0, 1)) <= tolerance &&
+           std::fabs(dot(0, 2)) <= tolerance && std::fabs(dot(1, 2)) <= tolerance;
+}
+
+// The disc of a spot light's only face outside which lookups read nothing, none where that is
+// not known. The lighting looks up only points within the cone, which the face sees as a disc
+// of radius focal · tan(half angle) about its centre; the margin covers the diagonal of a soft
+// lookup's reach.
+SY_ShadowReach::Disc SpotCone(const SY_LightDesc& desc, const M_Matrix4& placement, double focal,
+                              int32_t size, int32_t faces) {
+    if (desc.type != kSY_LightSpot || faces != 1 || !KeepsAngles(placement)) return {};
+    return {size * 0.5, size * 0.5, focal * std::tan(desc.coneHalfAngle) + kLookupReach};
+}
+
 std::unique_ptr<SY_ShadowMap> BuildLightMap(SY_RenderContext* context, const SY_LightDesc& desc,
                                             const SY_LightState& light, int32_t size) {
+    const M_Matrix4& placement = desc.placements[desc.placements.Count() / 2];
     M_Matrix4 view;
-    Check(M_InverseMatrix4(&desc.placements[desc.placements.Count() / 2], &view));
+    Check(M_InverseMatrix4(&placement, &view));
     FaceJob job{
         &view,
         {0, 0},
         0,
         size,
         &light,
-        DiffusionTexels(light, size, context->destination->width, context->destination->height)};
+        DiffusionTexels(light, size, context->destination->width, context->destination->height),
+        {}};
     if (desc.type == kSY_LightParallel) return RenderFace(context, job);
 
     job.focal = 0.5 * size / kTanHalfFace;
     FaceTurn turns[6];
     int32_t count = FaceTurns(desc, turns);
+    job.cone = SpotCone(desc, placement, job.focal, size, count);
     auto cube = std::make_unique<SY_CubicShadowMap>();
     for (int32_t i = 0; i < count; ++i) {
         job.turn = turns[i];

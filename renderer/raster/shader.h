@@ -11,6 +11,8 @@
 #include "renderer/scene/specular_table.h"
 #include "u_memory.h"
 
+class SY_ShadowReach;
+
 class SY_Shader : public U_MemTrackedObject {
 public:
     virtual ~SY_Shader() = default;
@@ -18,6 +20,8 @@ public:
     virtual bool NeedsSurfacePoint() const { return false; }
     // Radius in pixels of the blur a shadow caster is sampled with; 0 for sharp sampling.
     virtual int32_t ShadowBlurRadius() const { return 0; }
+    // Only the alpha of the blurred samples counts, so an opaque texture needs no sums.
+    virtual bool ReadsAlphaOnly() const { return false; }
     // The shader draws a frame's layer (rather than an occluder into a shadow map), so an
     // unbounded layer may take the simple path.
     virtual bool IsFrameShader() const { return true; }
@@ -36,6 +40,8 @@ public:
     SY_ShadowShader(const SY_Material& material, double diffusion, bool perspective);
 
     int32_t ShadowBlurRadius() const override;
+    // A layer that passes no colour shadows by its alpha alone.
+    bool ReadsAlphaOnly() const override { return transmission == 0; }
     bool IsFrameShader() const override { return false; }
 
     // The depth key of blur level `level` for a layer point at map depth w (larger is nearer).
@@ -57,6 +63,8 @@ public:
     // How far behind the layer a level lies, relative to the layer's distance from the light
     // (or to the diffusion, for a parallel light): radius / (diffusion − radius).
     float ratio[kMaxLevels] = {};
+    // The texels lookups can read, the only ones drawn; null for all of them.
+    const SY_ShadowReach* reach = nullptr;
 };
 
 // Per-channel lighting of one pixel: texel × diffuse + specular × channel maximum.

@@ -4,10 +4,12 @@
 #include <cmath>
 
 #include "pf_bit_depth.h"
+#include "pf_box_sum.h"
 #include "pf_tables.h"
 #include "renderer/mbuffer/shadow_fragments.h"
 #include "renderer/raster/samplers.h"
 #include "renderer/raster/shader.h"
+#include "renderer/raster/shadow_reach.h"
 #include "renderer/raster/span_start.h"
 #include "renderer/scene/screen_geometry.h"
 #include "u_report.h"
@@ -69,6 +71,12 @@ public:
         }
         return slot.average;
     }
+    // Whether the last box sampled lay inside the texture with its centre at least kDeep
+    // texels from every edge, so that the filter of every level there, down to a bicubic one
+    // at the texel's own footprint, reads texels of full alpha only.
+    static constexpr double kDeep = 3.0;
+    bool LastDeep() const { return lastDeep_; }
+    void SetLastDeep(bool deep) { lastDeep_ = deep; }
 
 private:
     static constexpr uint32_t kSlots = 16;
@@ -77,14 +85,90 @@ private:
         P average{};
     };
     Slot slots_[kSlots];
+    bool lastDeep_ = false;
+};
+
+// Box averages from the texture's summed-area table, of cells S.
+template <class S>
+class TableSums {
+public:
+    TableSums(const PF_SummedAreaTable& table, const S* sums)
+        : width_(table.Width()), height_(table.Height()), sums_(sums) {}
+    int32_t Width() const { return width_; }
+    int32_t Height() const { return height_; }
+    // Over the texels [x0, x1) × [y0, y1).
+    template <class P>
+    void Whole(int32_t x0, int32_t y0, int32_t x1, int32_t y1, P* out) const {
+        PF_SummedAreaTable_SampleDraft(width_, height_, sums_, x0, y0, x1, y1, out);
+    }
+    // Over [x0, x1] × [y0, y1], edges anywhere.
+    template <class P>
+    void Fractional(float x0, float y0, float x1, float y1, P* out) const {
+        PF_SummedAreaTable_SampleAA(width_, height_, sums_, x0, y0, x1, y1, out);
+    }
+
+private:
+    int32_t width_, height_;
+    const S* sums_;
+};
+
+// The same averages' alpha for a texture whose texels all have full alpha, without its table:
+// every difference of sums the table would give is the area of a box of whole texels, an
+// integer the cells hold exactly, and comes out the same here, so the alpha does too. Colour
+// is left 0.
+template <class S>
+class FullAlphaSums {
+public:
+    explicit FullAlphaSums(const SY_FullAlphaSums<S>& sums) : sums_(sums) {}
+    int32_t Width() const { return sums_.Width(); }
+    int32_t Height() const { return sums_.Height(); }
+    template <class P>
+    void Whole(int32_t x0, int32_t y0, int32_t x1, int32_t y1, P* out) const {
+        using Cells = PF_BoxCellsPixel<S>;
+        using V = decltype(S::alpha);
+        // Texels outside count as transparent.
+        const int64_t wide = std::clamp(x1, 0, Width()) - std::clamp(x0, 0, Width());
+        const int64_t high = std::clamp(y1, 0, Height()) - std::clamp(y0, 0, Height());
+        const S box{V(wide * high), 0, 0, 0};
+        float area = x1 > x0 && y1 > y0 ? float(x1 - x0) * float(y1 - y0) : 0.0f;
+        pf_tables::StoreAverage(Cells::ToFloat4(Cells::Widen(box)), area, out);
+    }
+    // A box with fractional edges is less than four texels across along one axis, so it
+    // spans at most six of the axis's edges: moved to the first of them it lies in the
+    // narrow rows or columns.
+    template <class P>
+    void Fractional(float x0, float y0, float x1, float y1, P* out) const {
+        using Cells = PF_BoxCellsPixel<S>;
+        constexpr int32_t kNarrow = SY_FullAlphaSums<S>::kNarrow;
+        PF_BoxAxis ax = PF_MakeBoxAxis(x0, x1, Width());
+        PF_BoxAxis ay = PF_MakeBoxAxis(y0, y1, Height());
+        float area = x1 > x0 && y1 > y0 ? (x1 - x0) * (y1 - y0) : 0.0f;
+        auto moveToFirst = [](PF_BoxAxis* a) {
+            for (int k = 3; k >= 0; --k)
+                a->edge[k] -= a->edge[0];
+        };
+        PF_Float4 sum;
+        if (ay.edge[3] - ay.edge[0] < kNarrow) {
+            moveToFirst(&ay);
+            sum = PF_BoxSum<Cells>(sums_.Rows(), ptrdiff_t(Width()) + 1, ax, ay);
+        } else {
+            moveToFirst(&ax);
+            sum = PF_BoxSum<Cells>(sums_.Columns(), kNarrow, ax, ay);
+        }
+        pf_tables::StoreAverage(sum, area, out);
+    }
+
+private:
+    const SY_FullAlphaSums<S>& sums_;
 };
 
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
-// the layer's summed-area table (sums of type S), or from opaque where there is one.
-template <class P, class S>
-void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& texture,
-               const SY_SpanMapping& m, float scale, OpaqueBoxes<P>* opaque, P* out) {
+// sums (TableSums or FullAlphaSums), or from opaque where there is one.
+template <class P, class Sums>
+void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& m, float scale,
+               OpaqueBoxes<P>* opaque, P* out) {
     using sy_sampling::kFarTexels;
+    if (opaque) opaque->SetLastDeep(false);
     if (!sy_sampling::InFront(m, texture.perspective)) {
         *out = P{};
         return;
@@ -104,18 +188,20 @@ void SampleBox(const PF_SummedAreaTable& table, const S* sums, SY_SpanTexture& t
                    y0 = static_cast<int32_t>(std::floor(cv - rv)),
                    x1 = static_cast<int32_t>(std::ceil(cu + ru)),
                    y1 = static_cast<int32_t>(std::ceil(cv + rv));
-        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= table.Width() && y1 <= table.Height() &&
-            x1 > x0 && y1 > y0) {
+        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= sums.Width() && y1 <= sums.Height() && x1 > x0 &&
+            y1 > y0) {
+            constexpr double kDeep = OpaqueBoxes<P>::kDeep;
+            opaque->SetLastDeep(cu >= kDeep && cu <= sums.Width() - kDeep && cv >= kDeep &&
+                                cv <= sums.Height() - kDeep);
             *out = opaque->Average(float(x1 - x0) * float(y1 - y0));
             return;
         }
-        PF_SummedAreaTable_SampleDraft(table.Width(), table.Height(), sums, x0, y0, x1, y1, out);
+        sums.Whole(x0, y0, x1, y1, out);
         return;
     }
     if (ru > 0.5 && rv > 0.5) {
-        PF_SummedAreaTable_SampleAA(table.Width(), table.Height(), sums,
-                                    static_cast<float>(cu - ru), static_cast<float>(cv - rv),
-                                    static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
+        sums.Fractional(static_cast<float>(cu - ru), static_cast<float>(cv - rv),
+                        static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
         return;
     }
     sy_sampling::Filter(texture, u, v, ru, rv, out);
@@ -133,24 +219,26 @@ const SY_SpanMapping* FirstPresent(const SY_SpanSubsampleState<P>& state) {
     return nullptr;
 }
 
-template <class P, class S>
-void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSampleState<P>& state,
-                   float scale, OpaqueBoxes<P>* opaque, P* out) {
-    SampleBox(table, sums, state.texture, state.mapping, scale, opaque, out);
+template <class P, class Sums>
+void SampleBlurred(const Sums& sums, SY_SpanSampleState<P>& state, float scale,
+                   OpaqueBoxes<P>* opaque, P* out) {
+    SampleBox(sums, state.texture, state.mapping, scale, opaque, out);
 }
 
 // The box average over the present subsamples, alpha falling with the absent ones.
-template <class P, class S>
-void SampleBlurred(const PF_SummedAreaTable& table, const S* sums, SY_SpanSubsampleState<P>& state,
-                   float scale, OpaqueBoxes<P>* opaque, P* out) {
+template <class P, class Sums>
+void SampleBlurred(const Sums& sums, SY_SpanSubsampleState<P>& state, float scale,
+                   OpaqueBoxes<P>* opaque, P* out) {
     sy_sampling::Accumulator sum;
     for (int32_t i = state.first; i <= state.last; ++i) {
         if (!(state.mappings[i].invW > 0)) continue;
         P texel;
-        SampleBox(table, sums, state.texture, state.mappings[i], scale, opaque, &texel);
+        SampleBox(sums, state.texture, state.mappings[i], scale, opaque, &texel);
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
+    // Not every subsample's box need lie deep inside.
+    if (opaque) opaque->SetLastDeep(false);
 }
 
 // The two occluders let the same light through.
@@ -158,13 +246,15 @@ bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
     return a.red == b.red && a.green == b.green && a.blue == b.blue;
 }
 
-// Steps the state across the span; sample(level, out) gives the layer's colour at a level. A
+// Steps the state across the span; sample(level, out) gives the layer's colour at a level, and
+// deepOpaque() tells whether the last sample of the widest level lay deep inside an opaque
+// texture (see OpaqueBoxes). A
 // level that lets through what both its neighbours let through adds nothing that blending
 // between them would not give, so only the levels where the light changes are kept: inside
 // an opaque layer one occluder stands for all of them.
-template <class P, class State, class Sample>
+template <class P, class State, class Sample, class DeepOpaque>
 void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t count, int32_t y,
-              SY_ShadowFragmentArray* array, int32_t thread, Sample sample) {
+              SY_ShadowFragmentArray* array, int32_t thread, Sample sample, DeepOpaque deepOpaque) {
     SY_ShadowFragment** heads = array->HeadAt(x, y);
     const int32_t levels = shader.levelCount;
     PF_Pixel16 occluders[SY_ShadowShader::kMaxLevels];
@@ -176,17 +266,19 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     P opaque{};
     opaque.alpha = kOpaque;
     Occluder(opaque, shader, &opaqueGrey);
-    for (int32_t i = 0; i < count; ++i, state.Step()) {
+    auto drawTexel = [&](int32_t i) {
         const SY_SpanMapping* depth = FirstPresent(state);
-        if (!depth) continue;
+        if (!depth) return;
         // Where the widest box is wholly opaque, so is every box inside it, and a layer that
-        // passes no colour then lets the same grey through at every level.
+        // passes no colour then lets the same grey through at every level. A float average of
+        // full alpha may round just below 1; deep inside an opaque texture every level's still
+        // rounds to the same 16-bit grey.
         P widest;
         sample(levels - 1, &widest);
-        if (levels > 1 && shader.transmission == 0 && widest.alpha == kOpaque) {
+        if (levels > 1 && shader.transmission == 0 && (widest.alpha == kOpaque || deepOpaque())) {
             array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
                                      shader.layerId, heads + i, thread);
-            continue;
+            return;
         }
         present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
         for (int32_t level = 0; level + 1 < levels; ++level) {
@@ -205,6 +297,20 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
             array->AddShadowFragment(&occluders[level], shader.DepthKey(depth->w, level), 0.0f,
                                      shader.layerId, heads + i, thread);
         }
+    };
+    // Texels beyond the reach are stepped over rather than cut off by moving the span's start,
+    // so the state arrives at each texel drawn exactly as it would across the whole span.
+    const SY_ShadowReach::Run whole{x, x + count};
+    const SY_ShadowReach::Run* run = shader.reach ? shader.reach->RowBegin(y) : &whole;
+    const SY_ShadowReach::Run* lastRun = shader.reach ? shader.reach->RowEnd(y) : &whole + 1;
+    int32_t i = 0;
+    for (; run < lastRun; ++run) {
+        const int32_t begin = std::clamp(run->begin - x, i, count);
+        const int32_t end = std::clamp(run->end - x, begin, count);
+        for (; i < begin; ++i)
+            state.Step();
+        for (; i < end; ++i, state.Step())
+            drawTexel(i);
     }
 }
 
@@ -214,29 +320,41 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
                    int32_t thread) {
     if (!shader.soft) {
         bool filtered = state.texture.samplingFilter != SY_SamplingFilter::kNearest;
-        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t, P* out) {
-            if (filtered)
-                SY_SampleFiltered(state, out);
-            else
-                SY_SampleNearest(state, out);
-        });
+        DrawSpan<P>(
+            shader, state, x, count, y, array, thread,
+            [&](int32_t, P* out) {
+                if (filtered)
+                    SY_SampleFiltered(state, out);
+                else
+                    SY_SampleNearest(state, out);
+            },
+            [] { return false; });
         return;
     }
-    const PF_SummedAreaTable& table = *geometry.sumTable;
+    const SY_CasterSums& casterSums = geometry.casterSums;
     // A layer that passes no colour shadows by its alpha alone.
     OpaqueBoxes<P> boxes;
-    OpaqueBoxes<P>* opaque = shader.transmission == 0 && geometry.opaqueTexture ? &boxes : nullptr;
-    auto draw = [&](const auto* sums) {
-        DrawSpan<P>(shader, state, x, count, y, array, thread, [&](int32_t level, P* out) {
-            // The box reaches the level's radius, and at least the texel's own footprint.
-            float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-            SampleBlurred(table, sums, state, scale, opaque, out);
-        });
+    OpaqueBoxes<P>* opaque = shader.transmission == 0 && casterSums.opaque ? &boxes : nullptr;
+    auto draw = [&](const auto& sums) {
+        DrawSpan<P>(
+            shader, state, x, count, y, array, thread,
+            [&](int32_t level, P* out) {
+                // The box reaches the level's radius, and at least the texel's own footprint.
+                float scale = 2.0f * std::max(0.5f, shader.radius[level]);
+                SampleBlurred(sums, state, scale, opaque, out);
+            },
+            [&] { return opaque && opaque->LastDeep(); });
     };
-    if (table.HasDoubleSums())
-        draw(table.DoubleSums());
-    else
-        draw(table.FloatSums());
+    if (const PF_SummedAreaTable* table = casterSums.table) {
+        if (table->HasDoubleSums())
+            draw(TableSums(*table, table->DoubleSums()));
+        else
+            draw(TableSums(*table, table->FloatSums()));
+    } else if (casterSums.doubleFullAlpha) {
+        draw(FullAlphaSums(*casterSums.doubleFullAlpha));
+    } else {
+        draw(FullAlphaSums(*casterSums.floatFullAlpha));
+    }
 }
 
 template <class P>

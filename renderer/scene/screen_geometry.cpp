@@ -97,7 +97,7 @@ void SY_ScreenGeometry::Build(const SY_RenderContext& context, const SY_TRLayer&
         flags.screenSizedTexture ? &footprint.rect : nullptr);
     texture = acquired.world;
     if (!texture) return;
-    if (flags.blurred) sumTable = &context.shadowSums.For(renderIndex, *texture, &opaqueTexture);
+    if (flags.blurred) casterSums = context.shadowSums.For(renderIndex, *texture, flags.alphaOnly);
 
     int32_t count = renderable.subsamples.Count();
     screenToTexture.Allocate(count);

@@ -10,6 +10,7 @@
 #include "renderer/scene/fetchers.h"
 #include "renderer/scene/owned_array.h"
 #include "renderer/scene/renderable.h"
+#include "renderer/scene/sum_table_cache.h"
 
 struct SY_RenderContext;
 
@@ -18,6 +19,7 @@ struct SY_GeometryFlags {
     bool screenSizedTexture = false;  // ask the host for a texture sized to the screen footprint
     bool needsSurfacePoint = false;   // the shader lights points: fill the eye-ray mapping
     bool blurred = false;             // the shader samples a blurred texture
+    bool alphaOnly = false;           // it reads the blurred samples' alpha alone
     bool wholeLayer = false;          // fetch the whole layer at its own size
     SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
 };
@@ -43,9 +45,8 @@ public:
     int32_t renderIndex = 0;
     PF_World* texture = nullptr;
     // Sums over the texture for the box averages of a blurred shadow caster, kept by the
-    // render context; null otherwise.
-    const PF_SummedAreaTable* sumTable = nullptr;
-    bool opaqueTexture = false;  // every texel has full alpha; known with the sums only
+    // render context; all null otherwise.
+    SY_CasterSums casterSums;
     // Per subsample: U = m0·x + m3·y + m6, V = m1·x + m4·y + m7, W = m2·x + m5·y + m8 for the
     // screen point (x, y); the texture position is (U/W, V/W) under perspective and (U, V)
     // otherwise, and a larger W is nearer. All zero for a subsample that is not valid.
