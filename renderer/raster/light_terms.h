@@ -78,6 +78,22 @@ void SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiver
                            const typename L::Real p[3], typename L::Mask active,
                            typename L::Single t[3]) {
     float lanes[3][L::kCount];
+    // A planar map projects the whole pack at once.
+    if (const SY_PlanarShadowMap* planar = map.AsPlanar()) {
+        typename L::Real x, y, d;
+        const typename L::Mask inMap = planar->ProjectLanes<L>(p, &x, &y, &d);
+        for (int i = 0; i < L::kCount; ++i) {
+            float out[3] = {1.0f, 1.0f, 1.0f};
+            if (L::LaneOn(active, i) && L::LaneOn(inMap, i))
+                planar->TransmissionAt(L::Lane(x, i), L::Lane(y, i), L::Lane(d, i), receiverId,
+                                       soft, out);
+            for (int c = 0; c < 3; ++c)
+                lanes[c][i] = out[c];
+        }
+        for (int c = 0; c < 3; ++c)
+            t[c] = L::FromLanes(lanes[c]);
+        return;
+    }
     for (int i = 0; i < L::kCount; ++i) {
         float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
         if (L::LaneOn(active, i)) {

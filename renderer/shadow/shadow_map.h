@@ -12,6 +12,8 @@
 
 // Base of the planar and cubic maps; each light state owns at most one. Lookups run on many
 // render threads at once.
+class SY_PlanarShadowMap;
+
 class SY_ShadowMap : public U_MemTrackedObject {
 public:
     virtual ~SY_ShadowMap() = default;
@@ -24,6 +26,9 @@ public:
     // SoftLookup where soft, else HardLookup, without a virtual call for the planar and cubic
     // maps: the lighting looks up every pixel of a receiver.
     void Lookup(const double p[3], uint16_t receiverId, bool soft, float out[4]) const;
+
+    // This map as a planar one, or null.
+    const SY_PlanarShadowMap* AsPlanar() const;
 
 protected:
     enum class Kind : uint8_t { kOther, kPlanar, kCubic };
@@ -146,6 +151,30 @@ public:
         *x = Row(0, p);
         *y = Row(1, p);
         return true;
+    }
+    // Project for the L::kCount points of a lane pack at once, each lane through the same
+    // operations as Project; the returned mask has the lanes that lie in the map.
+    template <class L>
+    typename L::Mask ProjectLanes(const typename L::Real p[3], typename L::Real* x,
+                                  typename L::Real* y, typename L::Real* d) const {
+        using Real = typename L::Real;
+        auto row = [&](int column) {
+            return p[0] * L::Splat(matrix_.mat[0][column]) +
+                   p[1] * L::Splat(matrix_.mat[1][column]) +
+                   p[2] * L::Splat(matrix_.mat[2][column]) + L::Splat(matrix_.mat[3][column]);
+        };
+        constexpr double kNearestDepth = 0.001;
+        if (perspective_) {
+            const Real w = row(3);
+            *x = row(0) / w;
+            *y = row(1) / w;
+            *d = L::Splat(1.0) / w;
+            return L::AndNot(L::Less(w, L::Splat(kNearestDepth)), L::All());
+        }
+        *d = -row(2);
+        *x = row(0);
+        *y = row(1);
+        return L::AndNot(L::Less(L::Splat(-kNearestDepth), *d), L::All());
     }
     // Transmission at map position (x, y) and depth d, from one texel or filtered.
     void TransmissionAt(double x, double y, double d, uint16_t receiverId, bool soft,
@@ -294,6 +323,10 @@ private:
     std::unique_ptr<SY_PlanarShadowMap> faces_[kMaxFaces];
     int32_t count_ = 0;
 };
+
+inline const SY_PlanarShadowMap* SY_ShadowMap::AsPlanar() const {
+    return kind_ == Kind::kPlanar ? static_cast<const SY_PlanarShadowMap*>(this) : nullptr;
+}
 
 inline void SY_ShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
                                  float out[4]) const {
