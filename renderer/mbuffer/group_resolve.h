@@ -8,6 +8,7 @@
 // pixel) for runs of three or more records in list order.
 #pragma once
 
+#include <cmath>
 #include <cstdint>
 
 #include "m_matrix.h"
@@ -70,9 +71,7 @@ private:
         int32_t i = 0;
         while (n - i > 2) {
             const F& r = *members_[i];
-            int32_t end = i + 1;
-            while (end < n && !Geometry::Cross(r, *members_[end]))
-                ++end;
+            int32_t end = FirstCrossing(i, n);
             if (end == n) {
                 applier_.Apply(r, pixel);
                 ++i;
@@ -90,10 +89,29 @@ private:
         if (n - i == 1) applier_.Apply(*members_[i], pixel);
     }
 
+    // The depth beyond which a record lies wholly in front of r: Extent widened by far more than
+    // its float rounding, so that a record starting beyond it never crosses r by Cross's test.
+    static double Reach(const F& r) {
+        const double extent = r.Extent();
+        return extent + 1e-6 * (std::fabs(double(r.depth)) + std::fabs(extent));
+    }
+
+    // The first member after member i that crosses it, or n. Members ascend in depth, so once
+    // one starts beyond i's reach, so does every later one.
+    int32_t FirstCrossing(int32_t i, int32_t n) const {
+        const F& r = *members_[i];
+        const double reach = Reach(r);
+        for (int32_t k = i + 1; k < n && !(members_[k]->depth > reach); ++k) {
+            if (Geometry::Cross(r, *members_[k])) return k;
+        }
+        return n;
+    }
+
     // Whether member u crosses any member from first up to the one before it.
     bool CrossesRun(int32_t first, int32_t u) const {
+        const F& s = *members_[u];
         for (int32_t k = first; k < u; ++k) {
-            if (Geometry::Cross(*members_[k], *members_[u])) return true;
+            if (!(s.depth > Reach(*members_[k])) && Geometry::Cross(*members_[k], s)) return true;
         }
         return false;
     }
