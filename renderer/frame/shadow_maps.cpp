@@ -266,8 +266,10 @@ struct ReceiverReach {
 };
 
 // A receiver's lookups are of points of its quadrilateral, grown by this much (in its own
-// pixels) for the frame's pixels along its edges, whose points may lie a little beyond it.
-constexpr double kReceiverGrowth = 16;
+// pixels) for the frame's pixels along its edges, whose points lie up to half a pixel's diagonal
+// beyond it: enough where the layer shows up to ninety times smaller than its own pixels. The
+// growth costs nothing measurable, as texels near a receiver are mostly drawn anyway.
+constexpr double kReceiverGrowth = 64;
 // A soft lookup reads texels whose centres lie up to 2.5 texels from its point; a texel more
 // covers rounding.
 constexpr double kLookupReach = 4;
