@@ -192,6 +192,12 @@ template <Reach kReach, int32_t kTogether>
         AddEnds<kReach, 1>(iris, rows, columns, stride, x + p, y, width, height, sum + p);
 }
 
+// Whether the processor has the wide (AVX) registers; asked once.
+bool HasWideRegisters() {
+    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
+    return wide;
+}
+
 // AddKernelEnds through the wide registers, for processors that have them.
 template <Reach kReach>
 [[gnu::target("avx")]] void AddKernelEndsWide(const ShapeIris& iris, const double* rows,
@@ -206,9 +212,8 @@ template <Reach kReach>
 void AddKernelEndsOnAny(const ShapeIris& iris, const double* rows, const double* columns,
                         ptrdiff_t stride, int32_t x, int32_t y, int32_t count, int32_t width,
                         int32_t height, Sums4* sum) {
-    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
-    if (wide) {
+    if (HasWideRegisters()) {
         AddKernelEndsWide<kReach>(iris, rows, columns, stride, x, y, count, width, height, sum);
     } else {
         AddKernelEnds<kReach, 4>(iris, rows, columns, stride, x, y, count, width, height, sum);
@@ -287,9 +292,8 @@ template <Reach kReach>
 void AddKernelOnAny(const ShapeKernel& kernel, const double* rows, ptrdiff_t stride, int32_t x,
                     int32_t y, int32_t count, int32_t width, int32_t height, Sums4* sum,
                     double* weight) {
-    static const bool wide = (__builtin_cpu_init(), __builtin_cpu_supports("avx"));
     if (count <= 0) return;
-    if (wide) {
+    if (HasWideRegisters()) {
         AddKernelWide<kReach>(kernel, rows, stride, x, y, count, width, height, sum, weight);
     } else {
         AddKernel<kReach, 4>(kernel, rows, stride, x, y, count, width, height, sum, weight);

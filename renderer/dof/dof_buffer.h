@@ -27,8 +27,8 @@ class SY_DOFBuffer : public PF_PixelContainer<SY_DOFBufferX<PF_Pixel8>, SY_DOFBu
 public:
     // A cleared buffer over bounds (output pixels) of the depth bitDepth, for the camera's
     // depth of field. kernels: the frame's iris kernels (see UseKernels), null for the simple
-    // shapes. Reports
-    // and throws 3 for a depth other than 8, 16 or 32, and throws 4 without memory.
+    // shapes. Reports and throws 3 for a depth other than 8, 16 or 32, and throws 4 without
+    // memory.
     static std::unique_ptr<SY_DOFBuffer> New(const M_LRect& bounds, int16_t bitDepth,
                                              const SY_CameraDOFDesc& dof,
                                              std::shared_ptr<const ShapeKernelArray> kernels);
