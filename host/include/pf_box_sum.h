@@ -157,29 +157,40 @@ struct PF_BoxCellsUint64 {
 };
 
 // Weighted sum over the box of a table whose cell (x, y), stride cells per row, holds the sum
-// of the texels [0, x) × [0, y). Every difference is taken against the box's first row and
-// column, so it sums texels inside the box only: small, and exact for integer cells.
+// of the texels [0, x) × [0, y): edges ex and ey, corner weights cx and cy (those of the edges
+// x1, x2, x3 and y1, y2, y3). Every difference is taken against the box's first row and column,
+// so it sums texels inside the box only: small, and exact for integer cells.
 template <class Cells>
-inline PF_Float4 PF_BoxSum(const typename Cells::Stored* table, ptrdiff_t stride,
-                           const PF_BoxAxis& ax, const PF_BoxAxis& ay) {
+[[gnu::always_inline]] inline PF_Float4 PF_BoxSumAtCorners(const typename Cells::Stored* table,
+                                                           ptrdiff_t stride, const int32_t (&ex)[4],
+                                                           const int32_t (&ey)[4],
+                                                           const float (&cx)[3],
+                                                           const float (&cy)[3]) {
     using Cell = typename Cells::Cell;
     using Stored = typename Cells::Stored;
-    // Weights of the box's corners (x1, x2, x3 and y1, y2, y3) from those of its ranges.
-    const float cx[3] = {ax.weight[0] - ax.weight[1], ax.weight[1] - ax.weight[2], ax.weight[2]};
-    const float cy[3] = {ay.weight[0] - ay.weight[1], ay.weight[1] - ay.weight[2], ay.weight[2]};
-    const Stored* top = table + ay.edge[0] * stride;
-    const Cell t0 = Cells::Load(top + ax.edge[0]), t1 = Cells::Load(top + ax.edge[1]),
-               t2 = Cells::Load(top + ax.edge[2]), t3 = Cells::Load(top + ax.edge[3]);
+    const Stored* top = table + ey[0] * stride;
+    const Cell t0 = Cells::Load(top + ex[0]), t1 = Cells::Load(top + ex[1]),
+               t2 = Cells::Load(top + ex[2]), t3 = Cells::Load(top + ex[3]);
     typename Cells::Acc rows[3];
     for (int l = 1; l < 4; ++l) {
-        const Stored* row = table + ay.edge[l] * stride;
+        const Stored* row = table + ey[l] * stride;
         // Sums over [x0, xk) × [y0, yl).
-        Cell left = Cells::Sub(Cells::Load(row + ax.edge[0]), t0);
+        Cell left = Cells::Sub(Cells::Load(row + ex[0]), t0);
         auto box = [&](int32_t k, const Cell& t) {
-            return Cells::Widen(Cells::Sub(Cells::Sub(Cells::Load(row + ax.edge[k]), t), left));
+            return Cells::Widen(Cells::Sub(Cells::Sub(Cells::Load(row + ex[k]), t), left));
         };
         rows[l - 1] = (box(1, t1) * cx[0] + box(2, t2) * cx[1]) + box(3, t3) * cx[2];
     }
     typename Cells::Acc sum = (rows[0] * cy[0] + rows[1] * cy[1]) + rows[2] * cy[2];
     return Cells::ToFloat4(sum);
+}
+
+// The same over the box of two axes.
+template <class Cells>
+inline PF_Float4 PF_BoxSum(const typename Cells::Stored* table, ptrdiff_t stride,
+                           const PF_BoxAxis& ax, const PF_BoxAxis& ay) {
+    // Weights of the box's corners from those of its ranges.
+    const float cx[3] = {ax.weight[0] - ax.weight[1], ax.weight[1] - ax.weight[2], ax.weight[2]};
+    const float cy[3] = {ay.weight[0] - ay.weight[1], ay.weight[1] - ay.weight[2], ay.weight[2]};
+    return PF_BoxSumAtCorners<Cells>(table, stride, ax.edge, ay.edge, cx, cy);
 }

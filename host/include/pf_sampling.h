@@ -170,17 +170,14 @@ inline void PF_SubpixelBicubic(int32_t x, int32_t y, const PF_SampPB& pb, P* out
     PF_StorePremultiplied(PF_SumLanes(sums[0], sums[1], sums[2], sums[3]), out);
 }
 
-// Box average of the texels over [x − xRadius, x + xRadius] × [y − yRadius, y + yRadius], texel
-// squares weighted by the share the box covers. Radii are taken between half a texel (where the
-// box equals bilinear interpolation) and 100 texels. The texture's table is built on first use.
+namespace pf_sampling {
+
+// The box sum of an area sample over a box of any place and size: edges cut to the texture
+// where the box reaches beyond it, and 8-bit sums of up to 32 bits. rx and ry are clamped.
 template <class P>
-inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
-    using namespace pf_sampling;
+[[gnu::noinline]] PF_Float4 AreaSumAnyBox(const PF_World& w, const PF_AreaTable& table, int32_t x,
+                                          int32_t y, int64_t rx, int64_t ry) {
     using Traits = PF_PixelTraits<P>;
-    const PF_World& w = *pb.src;
-    const PF_AreaTable& table = PF_AreaTableOf<P>(w);
-    int64_t rx = std::clamp(pb.xRadius, 32768, kMaxAreaRadius);
-    int64_t ry = std::clamp(pb.yRadius, 32768, kMaxAreaRadius);
     // Texel centres at integers become edges at integers.
     int64_t cx = int64_t(x) + 32768, cy = int64_t(y) + 32768;
     PF_BoxAxis ax, ay;
@@ -193,24 +190,99 @@ inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
         ax = PF_MakeBoxAxisFixed(cx - rx, cx + rx, w.width);
         ay = PF_MakeBoxAxisFixed(cy - ry, cy + ry, w.height);
     }
-    PF_Float4 sum;
     if constexpr (Traits::kIsFloat) {
         using Cells = PF_BoxCellsPixel<PF_PixelDouble>;
-        sum = PF_BoxSum<Cells>(table.Cells<PF_PixelDouble>(), table.Stride(), ax, ay);
+        return PF_BoxSum<Cells>(table.Cells<PF_PixelDouble>(), table.Stride(), ax, ay);
     } else if constexpr (Traits::kBitDepth == 16) {
         using Cells = PF_BoxCellsUint64;
-        sum = PF_BoxSum<Cells>(table.Cells<PF_AreaSum64>(), table.Stride(), ax, ay);
+        return PF_BoxSum<Cells>(table.Cells<PF_AreaSum64>(), table.Stride(), ax, ay);
     } else {
         // Sums of alpha × colour (at most 65025 a texel) fit 31 bits in boxes of up to 33025
         // texels: radii below about 90.
         int32_t texels = (ax.edge[3] - ax.edge[0]) * (ay.edge[3] - ay.edge[0]);
         const PF_Uint4* cells = table.Cells<PF_Uint4>();
-        sum = texels <= 33025 ? PF_BoxSum<PF_BoxCellsUint<true>>(cells, table.Stride(), ax, ay)
-                              : PF_BoxSum<PF_BoxCellsUint<false>>(cells, table.Stride(), ax, ay);
+        return texels <= 33025 ? PF_BoxSum<PF_BoxCellsUint<true>>(cells, table.Stride(), ax, ay)
+                               : PF_BoxSum<PF_BoxCellsUint<false>>(cells, table.Stride(), ax, ay);
     }
-    float area =
-        4.0f * static_cast<float>(rx) * static_cast<float>(ry) * (kFixedToTexels * kFixedToTexels);
+}
+
+// 8-bit boxes with radii up to this (89.5 texels, 16.16) span at most 181 texels a side: their
+// sums stay below 2^31.
+inline constexpr int32_t kSmallBoxRadius = 179 << 15;
+
+// The box average of PF_AreaSample with the position and the radii as lanes (x, y) of 16.16
+// texels. Boxes inside the texture, the usual case, take both axes at once in the lanes; the
+// edges, weights and sums are those of the general case, term by term.
+template <class P>
+[[gnu::always_inline]] inline void AreaSampleLanes(__m128i xy, __m128i radii, const PF_SampPB& pb,
+                                                   P* out) {
+    using Traits = PF_PixelTraits<P>;
+    const PF_World& w = *pb.src;
+    const PF_AreaTable& table = PF_AreaTableOf<P>(w);
+    const __m128i r =
+        _mm_min_epi32(_mm_max_epi32(radii, _mm_set1_epi32(32768)), _mm_set1_epi32(kMaxAreaRadius));
+    // Edge coordinates in 32 bits. Where one wraps, the box's low end comes out above its high
+    // end, which sends it to the general case with the rest that reach beyond the texture;
+    // sizes from 32768 texels on cannot be exceeded in 32 bits.
+    const __m128i sizes = _mm_setr_epi32(w.width, w.height, 0, 0);
+    const __m128i limits = _mm_blendv_epi8(_mm_slli_epi32(sizes, 16), _mm_set1_epi32(INT32_MAX),
+                                           _mm_cmpgt_epi32(sizes, _mm_set1_epi32(32767)));
+    const __m128i c = _mm_add_epi32(xy, _mm_set1_epi32(32768));
+    const __m128i lo = _mm_sub_epi32(c, r), hi = _mm_add_epi32(c, r);
+    __m128i outside = _mm_or_si128(
+        _mm_or_si128(_mm_cmpgt_epi32(_mm_setzero_si128(), lo), _mm_cmpgt_epi32(hi, limits)),
+        _mm_cmpgt_epi32(lo, hi));
+    if constexpr (!Traits::kIsFloat && Traits::kBitDepth == 8)
+        outside = _mm_or_si128(outside, _mm_cmpgt_epi32(r, _mm_set1_epi32(kSmallBoxRadius)));
+    const PF_Float4 rf = _mm_cvtepi32_ps(r);
+    const float area = 4.0f * rf[0] * rf[1] * (kFixedToTexels * kFixedToTexels);
+    if (__builtin_expect((_mm_movemask_epi8(outside) & 0xFF) != 0, 0)) {
+        PF_StorePremultiplied(
+            AreaSumAnyBox<P>(w, table, _mm_cvtsi128_si32(xy), _mm_extract_epi32(xy, 1),
+                             _mm_cvtsi128_si32(r), _mm_extract_epi32(r, 1)),
+            out, area);
+        return;
+    }
+    // The first texels' covered shares 1 − frac(lo) and the last ones' frac(hi), lanes
+    // (x, y, x, y), in texels.
+    const __m128i fractions = _mm_and_si128(_mm_unpacklo_epi64(lo, hi), _mm_set1_epi32(0xFFFF));
+    const PF_Float4 shares = _mm_cvtepi32_ps(_mm_abs_epi32(
+                                 _mm_sub_epi32(fractions, _mm_setr_epi32(65536, 65536, 0, 0)))) *
+                             kFixedToTexels;
+    // Corner weights share − 1 of the first edges and 1 − share of the last ones.
+    const PF_Float4 one = {1.0f, 1.0f, 1.0f, 1.0f};
+    const PF_Float4 inner = _mm_blend_ps(shares, one, 0b1100) - _mm_blend_ps(shares, one, 0b0011);
+    const float cx[3] = {inner[0], inner[2], shares[2]}, cy[3] = {inner[1], inner[3], shares[3]};
+    const __m128i first = _mm_srai_epi32(lo, 16), last = _mm_srai_epi32(hi, 16);
+    const __m128i end = _mm_min_epi32(_mm_add_epi32(last, _mm_set1_epi32(1)), sizes);
+    const int32_t x0 = _mm_cvtsi128_si32(first), y0 = _mm_extract_epi32(first, 1);
+    const int32_t ex[4] = {x0, x0 + 1, _mm_cvtsi128_si32(last), _mm_cvtsi128_si32(end)};
+    const int32_t ey[4] = {y0, y0 + 1, _mm_extract_epi32(last, 1), _mm_extract_epi32(end, 1)};
+    PF_Float4 sum;
+    if constexpr (Traits::kIsFloat) {
+        using Cells = PF_BoxCellsPixel<PF_PixelDouble>;
+        sum = PF_BoxSumAtCorners<Cells>(table.Cells<PF_PixelDouble>(), table.Stride(), ex, ey, cx,
+                                        cy);
+    } else if constexpr (Traits::kBitDepth == 16) {
+        using Cells = PF_BoxCellsUint64;
+        sum =
+            PF_BoxSumAtCorners<Cells>(table.Cells<PF_AreaSum64>(), table.Stride(), ex, ey, cx, cy);
+    } else {
+        using Cells = PF_BoxCellsUint<true>;
+        sum = PF_BoxSumAtCorners<Cells>(table.Cells<PF_Uint4>(), table.Stride(), ex, ey, cx, cy);
+    }
     PF_StorePremultiplied(sum, out, area);
+}
+
+}  // namespace pf_sampling
+
+// Box average of the texels over [x − xRadius, x + xRadius] × [y − yRadius, y + yRadius], texel
+// squares weighted by the share the box covers. Radii are taken between half a texel (where the
+// box equals bilinear interpolation) and 100 texels. The texture's table is built on first use.
+template <class P>
+inline void PF_AreaSample(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
+    pf_sampling::AreaSampleLanes(_mm_setr_epi32(x, y, 0, 0),
+                                 _mm_setr_epi32(pb.xRadius, pb.yRadius, 0, 0), pb, out);
 }
 
 // The host's entry points, by the names the renderer calls. progress is not used (pass null).

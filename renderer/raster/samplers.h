@@ -89,12 +89,19 @@ inline bool Subpixel(__m128d radius) {
     return _mm_movemask_pd(_mm_cmplt_pd(radius, _mm_set1_pd(kSubpixelBelow))) == 3;
 }
 
+// Bicubic interpolation, kept out of line: its sixteen taps outweigh a call, and the bilinear
+// path beside it keeps to few registers.
+template <class P>
+[[gnu::noinline]] void InterpolateBicubic(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
+    PF_SubpixelBicubic(x, y, pb, out);
+}
+
 // The pixel library's interpolation (bilinear or bicubic) at the fixed-point position xy.
 template <class P>
 [[gnu::always_inline]] inline void Interpolate(SY_SpanTexture& texture, __m128i xy, P* out) {
     const int32_t x = _mm_cvtsi128_si32(xy), y = _mm_extract_epi32(xy, 1);
     if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
-        PF_SubpixelBicubic(x, y, texture.sampling, out);
+        InterpolateBicubic(x, y, texture.sampling, out);
     else
         PF_SubpixelBilinear(x, y, texture.sampling, out);
 }
@@ -105,15 +112,10 @@ template <class P>
 [[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, __m128d point, __m128d radius,
                                           P* out) {
     const __m128i xy = ToFixed(point);
-    if (Subpixel(radius)) {
+    if (Subpixel(radius))
         Interpolate(texture, xy, out);
-    } else {
-        PF_SampPB& pb = texture.sampling;
-        const __m128i r = RadiusToFixed(radius);
-        pb.xRadius = _mm_cvtsi128_si32(r);
-        pb.yRadius = _mm_extract_epi32(r, 1);
-        PF_AreaSample(_mm_cvtsi128_si32(xy), _mm_extract_epi32(xy, 1), pb, out);
-    }
+    else
+        pf_sampling::AreaSampleLanes(xy, RadiusToFixed(radius), texture.sampling, out);
 }
 template <class P>
 [[gnu::always_inline]] inline void Filter(SY_SpanTexture& texture, double u, double v, double ru,

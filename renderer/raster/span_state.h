@@ -60,7 +60,7 @@ struct SY_SpanMapping {
 struct SY_SpanTexture {
     const PF_World* world = nullptr;
     SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
-    PF_SampPB sampling;  // the pixel library's block; radii filled per call
+    PF_SampPB sampling;  // the pixel library's block: its texture; radii go with each sample
     bool perspective = true;
 };
 

@@ -133,7 +133,7 @@ TYPED_TEST(Samplers, AreaSampleIsTheBoxAverage) {
     const Case cases[] = {{7, 5, 0.5, 0.5},     {20, 14, 0.75, 0.75}, {20.3, 14.6, 3.2, 1.7},
                           {3.1, 2.9, 5.5, 5.5}, {0, 0, 10, 10},       {40.2, 28.7, 2.25, 6.0},
                           {-3, 10, 4, 4},       {20, 14, 100, 100},   {17.49, 9.51, 0.6, 12.3},
-                          {40, 28, 0.5, 0.5}};
+                          {40, 28, 0.5, 0.5},   {32767.4, 10, 3, 3},  {-32767.9, -32767.9, 2, 2}};
     double tolerance = PF_PixelTraits<P>::kIsFloat ? 1e-4 : 1.01 * Step<P>();
     for (const Case& c : cases) {
         int32_t x = Fixed(c.x), y = Fixed(c.y), rx = Fixed(c.rx), ry = Fixed(c.ry);
