@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <limits>
 
 #include "m_matrix.h"
 #include "pf_sampling.h"
@@ -47,8 +48,9 @@ struct SY_SpanMapping {
     }
 
     void Step(bool perspective) {
-        u += dudx;
-        v += dvdx;
+        // U and V step as one pair and are stored as one, the way the samplers load them.
+        _mm_storeu_pd(&u,
+                      _mm_add_pd(_mm_loadu_pd(&u), _mm_cvtps_pd(_mm_setr_ps(dudx, dvdx, 0, 0))));
         if (dwdx != 0.0f) {
             w += dwdx;
             if (perspective) invW = 1.0 / w;
@@ -62,6 +64,7 @@ struct SY_SpanTexture {
     SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
     PF_SampPB sampling;  // the pixel library's block: its texture; radii go with each sample
     bool perspective = true;
+    bool pairs = false;  // filtered 8-bit samples may be taken two pixels at once
 };
 
 // The single sample state, for a layer with one geometry sample. The nearest sampler keeps the
@@ -73,6 +76,10 @@ struct SY_SpanSampleState {
     int32_t lastColumn = -1;
     int32_t lastRow = -1;
     P lastTexel{};
+    // The filtered texel of the pixel after the last one sampled in pairs, and where that
+    // pixel stands: it serves while the mapping stands there.
+    P aheadTexel{};
+    double aheadU = std::numeric_limits<double>::quiet_NaN(), aheadV = 0, aheadW = 0;
 
     void Step() { mapping.Step(texture.perspective); }
 };

@@ -138,3 +138,41 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
 }
 
 }  // namespace
+
+// Taken two pixels at once, filtered 8-bit samples are the ones taken alone: along spans whose
+// footprints grow from interpolation to boxes of a few texels, reaching in and out of a texture
+// of varied alpha, with every seventh pixel hidden by a matte and so not sampled.
+TEST(SamplerPairs, GiveTheTexelsOfSingleSamples) {
+    if (!sy_sampling::PairsAvailable()) GTEST_SKIP();
+    auto texture = raster_test::WorldOf<PF_Pixel8>(64, 48, [](int32_t i, int32_t j) {
+        PF_Pixel8 p = PatternTexel<PF_Pixel8>(i, j);
+        p.alpha = static_cast<uint8_t>(i * j * 7 % 256);
+        return p;
+    });
+    M_Matrix3 m{};
+    m.mat[0][0] = 0.9, m.mat[1][0] = 0.2, m.mat[2][0] = -3;
+    m.mat[0][1] = -0.15, m.mat[1][1] = 1.1;
+    m.mat[0][2] = -0.006, m.mat[2][2] = 1;
+    int32_t paired = 0;
+    for (double y : {10.5, 30.5}) {
+        SY_SpanSampleState<PF_Pixel8> pairs, single;
+        for (auto* state : {&pairs, &single}) {
+            StartTexture(*texture, Filter::kBilinear, true, state);
+            state->mapping.Start(m, 0.5, y, true, 1.0f);
+        }
+        pairs.texture.pairs = true;
+        for (int32_t x = 0; x < 90; ++x, pairs.Step(), single.Step()) {
+            if (x % 7 == 3) continue;
+            PF_Pixel8 got, want, next;
+            SY_SampleFiltered(pairs, &got);
+            SY_SampleFiltered(single, &want);
+            EXPECT_TRUE(Equal(got, want)) << x << "," << y;
+            const SY_SpanMapping& a = single.mapping;
+            SY_SpanMapping b = a;
+            b.Step(true);
+            paired += sy_sampling::AreaPair(single.texture, a, a.u, a.v, a.w, a.invW, b.u, b.v, b.w,
+                                            b.invW, &want, &next);
+        }
+    }
+    EXPECT_GT(paired, 20);
+}
