@@ -88,7 +88,7 @@ inline PF_Float4 PF_SumLanes(PF_Float4 a, PF_Float4 r, PF_Float4 g, PF_Float4 b)
 // Writes channel values in channel units: integer channels clamped to their range and rounded,
 // float channels as they are.
 template <class P>
-inline void PF_StoreChannels(PF_Float4 c, P* out) {
+[[gnu::always_inline]] inline void PF_StoreChannels(PF_Float4 c, P* out) {
     using Traits = PF_PixelTraits<P>;
     if constexpr (Traits::kIsFloat) {
         _mm_storeu_ps(&out->alpha, c);
@@ -113,7 +113,8 @@ inline void PF_StoreChannels(PF_Float4 c, P* out) {
 // Integer channels are rounded and kept in range; float alpha is kept in 0..1 and float colour
 // keeps its extended range. A pixel without alpha is transparent black.
 template <class P>
-inline void PF_StorePremultiplied(PF_Float4 v, P* out, float alphaDivisor = 1.0f) {
+[[gnu::always_inline]] inline void PF_StorePremultiplied(PF_Float4 v, P* out,
+                                                         float alphaDivisor = 1.0f) {
     using Traits = PF_PixelTraits<P>;
     // Integer alpha that rounds to 0 is clear too.
     float minAlpha = Traits::kIsFloat ? 0.0f : 0.5f * alphaDivisor;

@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
-#include <type_traits>
 
 #include "pf_pixel.h"
 #include "pf_sampling.h"
@@ -199,7 +198,7 @@ inline bool PairsAvailable() {
     return available;
 }
 
-// The filtered 8-bit texels of two pixels of one span, both area samples of boxes inside the
+// The filtered texels of two pixels of one span, both area samples of boxes inside the
 // texture, in wide registers: the texels SY_SampleFiltered gives each alone. m gives the slopes,
 // (u, v, w, 1/W) each pixel's position; they come in registers, as the caller has just worked
 // them out. False, with nothing written, for any other pair. Only for processors where
@@ -207,6 +206,12 @@ inline bool PairsAvailable() {
 bool AreaPair(const SY_SpanTexture& texture, const SY_SpanMapping& m, double u0, double v0,
               double w0, double invW0, double u1, double v1, double w1, double invW1,
               PF_Pixel8* firstOut, PF_Pixel8* secondOut);
+bool AreaPair(const SY_SpanTexture& texture, const SY_SpanMapping& m, double u0, double v0,
+              double w0, double invW0, double u1, double v1, double w1, double invW1,
+              PF_Pixel16* firstOut, PF_Pixel16* secondOut);
+bool AreaPair(const SY_SpanTexture& texture, const SY_SpanMapping& m, double u0, double v0,
+              double w0, double invW0, double u1, double v1, double w1, double invW1,
+              PF_PixelFloat* firstOut, PF_PixelFloat* secondOut);
 
 // One filtered sample at the mapping m.
 template <class P>
@@ -241,30 +246,28 @@ inline void SY_SampleNearest(SY_SpanSampleState<P>& state, P* out) {
 }
 
 // Filtered texel, one sample, with the texture's filter (bilinear or bicubic). Where pairs
-// are available, 8-bit samples are taken for this pixel and the next at once, and the next
-// pixel's texel waits in the state for the step to it.
+// are available, samples are taken for this pixel and the next at once, and the next pixel's
+// texel waits in the state for the step to it.
 template <class P>
 inline void SY_SampleFiltered(SY_SpanSampleState<P>& state, P* out) {
     const SY_SpanMapping& m = state.mapping;
-    if constexpr (std::is_same_v<P, PF_Pixel8>) {
-        if (state.texture.pairs) {
-            // The sample is a function of the position alone: the slopes stay with the span.
-            if (m.u == state.aheadU && m.v == state.aheadV && m.w == state.aheadW) {
-                *out = state.aheadTexel;
-                return;
-            }
-            SY_SpanMapping next = m;
-            next.Step(state.texture.perspective);
-            if (!sy_sampling::AreaPair(state.texture, m, m.u, m.v, m.w, m.invW, next.u, next.v,
-                                       next.w, next.invW, out, &state.aheadTexel)) {
-                sy_sampling::FilterAt(state.texture, m, out);
-                sy_sampling::FilterAt(state.texture, next, &state.aheadTexel);
-            }
-            state.aheadU = next.u;
-            state.aheadV = next.v;
-            state.aheadW = next.w;
+    if (state.texture.pairs) {
+        // The sample is a function of the position alone: the slopes stay with the span.
+        if (m.u == state.aheadU && m.v == state.aheadV && m.w == state.aheadW) {
+            *out = state.aheadTexel;
             return;
         }
+        SY_SpanMapping next = m;
+        next.Step(state.texture.perspective);
+        if (!sy_sampling::AreaPair(state.texture, m, m.u, m.v, m.w, m.invW, next.u, next.v, next.w,
+                                   next.invW, out, &state.aheadTexel)) {
+            sy_sampling::FilterAt(state.texture, m, out);
+            sy_sampling::FilterAt(state.texture, next, &state.aheadTexel);
+        }
+        state.aheadU = next.u;
+        state.aheadV = next.v;
+        state.aheadW = next.w;
+        return;
     }
     sy_sampling::FilterAt(state.texture, m, out);
 }

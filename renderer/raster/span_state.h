@@ -64,7 +64,7 @@ struct SY_SpanTexture {
     SY_SamplingFilter samplingFilter = SY_SamplingFilter::kNearest;
     PF_SampPB sampling;  // the pixel library's block: its texture; radii go with each sample
     bool perspective = true;
-    bool pairs = false;  // filtered 8-bit samples may be taken two pixels at once
+    bool pairs = false;  // filtered samples may be taken two pixels at once
 };
 
 // The single sample state, for a layer with one geometry sample. The nearest sampler keeps the

@@ -139,14 +139,15 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
 
 }  // namespace
 
-// Taken two pixels at once, filtered 8-bit samples are the ones taken alone: along spans whose
+// Taken two pixels at once, filtered samples are the ones taken alone: along spans whose
 // footprints grow from interpolation to boxes of a few texels, reaching in and out of a texture
 // of varied alpha, with every seventh pixel hidden by a matte and so not sampled.
-TEST(SamplerPairs, GiveTheTexelsOfSingleSamples) {
+TYPED_TEST(Samplers, PairsGiveTheTexelsOfSingleSamples) {
+    using P = TypeParam;
     if (!sy_sampling::PairsAvailable()) GTEST_SKIP();
-    auto texture = raster_test::WorldOf<PF_Pixel8>(64, 48, [](int32_t i, int32_t j) {
-        PF_Pixel8 p = PatternTexel<PF_Pixel8>(i, j);
-        p.alpha = static_cast<uint8_t>(i * j * 7 % 256);
+    auto texture = raster_test::WorldOf<P>(64, 48, [](int32_t i, int32_t j) {
+        P p = PatternTexel<P>(i, j);
+        p.alpha = PatternTexel<P>(j, i).red;
         return p;
     });
     M_Matrix3 m{};
@@ -155,7 +156,7 @@ TEST(SamplerPairs, GiveTheTexelsOfSingleSamples) {
     m.mat[0][2] = -0.006, m.mat[2][2] = 1;
     int32_t paired = 0;
     for (double y : {10.5, 30.5}) {
-        SY_SpanSampleState<PF_Pixel8> pairs, single;
+        SY_SpanSampleState<P> pairs, single;
         for (auto* state : {&pairs, &single}) {
             StartTexture(*texture, Filter::kBilinear, true, state);
             state->mapping.Start(m, 0.5, y, true, 1.0f);
@@ -163,7 +164,7 @@ TEST(SamplerPairs, GiveTheTexelsOfSingleSamples) {
         pairs.texture.pairs = true;
         for (int32_t x = 0; x < 90; ++x, pairs.Step(), single.Step()) {
             if (x % 7 == 3) continue;
-            PF_Pixel8 got, want, next;
+            P got, want, next;
             SY_SampleFiltered(pairs, &got);
             SY_SampleFiltered(single, &want);
             EXPECT_TRUE(Equal(got, want)) << x << "," << y;
