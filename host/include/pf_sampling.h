@@ -84,13 +84,12 @@ inline void TexelBlock(const PF_World& w, int32_t x, int32_t y, P (&copy)[n * n]
     }
 }
 
-// The weights (1 − f, f) of the fractions of x and y, as (65536 − fx, fx, 65536 − fy, fy):
-// whole numbers, so that a texel centre gets the weight 65536 exactly. Worked out in integers,
-// which keeps the weights' latency below the texels'.
-inline PF_Float4 LinearWeights(int32_t x, int32_t y) {
-    __m128i xy = _mm_cvtsi64_si128(static_cast<int64_t>(static_cast<uint16_t>(x)) |
-                                   static_cast<int64_t>(static_cast<uint16_t>(y)) << 32);
-    __m128i fractions = _mm_shuffle_epi32(xy, _MM_SHUFFLE(1, 1, 0, 0));
+// The weights (1 − f, f) of the fractions of the position xy (lanes x, y), as (65536 − fx, fx,
+// 65536 − fy, fy): whole numbers, so that a texel centre gets the weight 65536 exactly. Worked
+// out in integers, which keeps the weights' latency below the texels'.
+inline PF_Float4 LinearWeights(__m128i xy) {
+    __m128i fractions =
+        _mm_and_si128(_mm_shuffle_epi32(xy, _MM_SHUFFLE(1, 1, 0, 0)), _mm_set1_epi32(0xFFFF));
     // |f − 65536| and |f − 0|
     return _mm_cvtepi32_ps(
         _mm_abs_epi32(_mm_sub_epi32(fractions, _mm_setr_epi32(65536, 0, 65536, 0))));
@@ -118,10 +117,12 @@ inline PF_Float4 Broadcast(PF_Float4 v) {
 // texel's alpha, the sample's alpha is Σ w·a and its colour Σ w·a·c / Σ w·a. So the texels'
 // alphas are folded into the weights first, and colour planes are multiplied only once.
 
-// Bilinear sample at (x, y).
+namespace pf_sampling {
+
+// The bilinear sample of PF_SubpixelBilinear with the position as lanes (x, y).
 template <class P>
-inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
-    using namespace pf_sampling;
+[[gnu::always_inline]] inline void BilinearLanes(__m128i xy, const PF_SampPB& pb, P* out) {
+    const int32_t x = _mm_cvtsi128_si32(xy), y = _mm_extract_epi32(xy, 1);
     P copy[4];
     const P* rows[2];
     TexelBlock<P, 2>(*pb.src, x >> 16, y >> 16, copy, rows);
@@ -136,7 +137,7 @@ inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* ou
         PF_Float4 bottom = t10 + (t11 - t10) * fx;
         PF_StorePremultiplied(top + (bottom - top) * fy, out);
     } else {
-        PF_Float4 f = LinearWeights(x, y);
+        PF_Float4 f = LinearWeights(xy);
         PF_Float4 weights =
             __builtin_shufflevector(f, f, 0, 1, 0, 1) * __builtin_shufflevector(f, f, 2, 2, 3, 3);
         PF_Planes t = PF_LoadPlanes(rows[0], rows[1]);
@@ -145,6 +146,14 @@ inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* ou
         PF_StorePremultiplied(PF_SumLanes(wa, wa * t.red, wa * t.green, wa * t.blue), out,
                               4294967296.0f);
     }
+}
+
+}  // namespace pf_sampling
+
+// Bilinear sample at (x, y).
+template <class P>
+inline void PF_SubpixelBilinear(int32_t x, int32_t y, const PF_SampPB& pb, P* out) {
+    pf_sampling::BilinearLanes(_mm_setr_epi32(x, y, 0, 0), pb, out);
 }
 
 // Bicubic (Catmull-Rom) sample at (x, y).

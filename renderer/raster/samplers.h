@@ -99,11 +99,10 @@ template <class P>
 // The pixel library's interpolation (bilinear or bicubic) at the fixed-point position xy.
 template <class P>
 [[gnu::always_inline]] inline void Interpolate(SY_SpanTexture& texture, __m128i xy, P* out) {
-    const int32_t x = _mm_cvtsi128_si32(xy), y = _mm_extract_epi32(xy, 1);
     if (texture.samplingFilter == SY_SamplingFilter::kBicubic)
-        InterpolateBicubic(x, y, texture.sampling, out);
+        InterpolateBicubic(_mm_cvtsi128_si32(xy), _mm_extract_epi32(xy, 1), texture.sampling, out);
     else
-        PF_SubpixelBilinear(x, y, texture.sampling, out);
+        pf_sampling::BilinearLanes(xy, texture.sampling, out);
 }
 
 // The pixel library's filter at the point with the half-sizes radius: interpolation while the
