@@ -17,9 +17,6 @@ struct SY_FourLanes {
 
     static Real Splat(double v) { return _mm256_set1_pd(v); }
     static Single SplatSingle(float v) { return _mm_set1_ps(v); }
-    static Real Load(const double* const lanes[kCount], int k) {
-        return _mm256_setr_pd(lanes[0][k], lanes[1][k], lanes[2][k], lanes[3][k]);
-    }
     static double Lane(Real v, int i) {
         double d[4];
         _mm256_storeu_pd(d, v);
@@ -80,9 +77,15 @@ private:
 
 }  // namespace
 
-void SY_LayerShader::LightFourPixels(const double* const p[4], const double n[3],
+void SY_LayerShader::LightFourPixels(const SY_FourPoints& p, const double n[3],
                                      SY_FourLightings* out, SY_LightSet reaching) const {
-    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, p, n, reaching);
+    // Widening a float is exact, so each lane's product is the one SY_FourPoints::Point makes.
+    auto load = [&p](__m256d points[3]) {
+        const __m256d invW = _mm256_load_pd(p.invW);
+        for (int k = 0; k < 3; ++k)
+            points[k] = _mm256_mul_pd(_mm256_cvtps_pd(_mm_load_ps(p.ray[k])), invW);
+    };
+    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, load, n, reaching);
     for (int c = 0; c < 3; ++c) {
         _mm_store_ps(out->diffuse[c], lighting.diffuse[c]);
         _mm_store_ps(out->specular[c], lighting.specular[c]);

@@ -123,7 +123,6 @@ struct Pixel {
     P texel;
     SY_Coverage<P> coverage;
     bool skipped;            // the matte hides it
-    double point[3];         // surface point, when lighting needs it
     SY_FragmentDepth depth;  // set only for deliveries that use it
 };
 
@@ -171,14 +170,15 @@ template <class P, class State>
 
 template <bool kDepth, class P, class State>
 [[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
-                                         const SY_SpanRayState& ray, const P* matte,
-                                         Pixel<P>* out) {
+                                         const SY_SpanRayState& ray, const P* matte, Pixel<P>* out,
+                                         SY_FourPoints& points, int lane) {
     using Traits = PF_PixelTraits<P>;
     using C = typename Traits::Channel;
     const SY_SpanMapping& first = FirstMapping(state);
     if (setup.shaded) {
         for (int k = 0; k < 3; ++k)
-            out->point[k] = ray.d[k] * first.invW;
+            points.ray[k][lane] = ray.d[k];
+        points.invW[lane] = first.invW;
     }
     out->skipped = matte && matte->alpha == 0;
     if (out->skipped) {
@@ -214,12 +214,11 @@ template <class State>
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
                                   SY_LightSet reaching, const double normal[3],
-                                  const bool (&taken)[kPairs], Pixel<P>* pixels) {
+                                  const bool (&taken)[kPairs], const SY_FourPoints& points,
+                                  Pixel<P>* pixels) {
     SY_Lighting light[2 * kPairs];
     if constexpr (kPairs == 2) {
         if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
-            const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
-                                             pixels[3].point};
             SY_FourLightings four;
             shader.LightFourPixels(points, normal, &four, reaching);
             ApplyLighting(four, pixels);
@@ -229,12 +228,14 @@ template <int kPairs, class P>
     for (int pair = 0; pair < kPairs; ++pair) {
         if (!taken[pair]) continue;
         Pixel<P>* two = pixels + 2 * pair;
+        double p[2][3];
+        points.Point(2 * pair, p[0]);
+        points.Point(2 * pair + 1, p[1]);
         if (lanes != SY_LightingLanes::kOne) {
-            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1],
-                                  reaching);
+            shader.LightTwoPixels(p[0], p[1], normal, &light[0], &light[1], reaching);
         } else {
-            shader.LightOnePixel(two[0].point, normal, &light[0], reaching);
-            shader.LightOnePixel(two[1].point, normal, &light[1], reaching);
+            shader.LightOnePixel(p[0], normal, &light[0], reaching);
+            shader.LightOnePixel(p[1], normal, &light[1], reaching);
         }
         ApplyLighting(light[0], &two[0].texel);
         ApplyLighting(light[1], &two[1].texel);
@@ -288,6 +289,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                                      : kSY_AllLights;
 
     Pixel<P> pixels[4];
+    SY_FourPoints points;
     int32_t i = 0;
     // Takes kPairs pairs at a time: two only where they are lit four at once, as the wider
     // step costs unlit spans time.
@@ -301,12 +303,13 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                     if (taken[pair]) {
                         Fetch<Delivery::kUsesDepth>(setup, state, ray,
                                                     matte ? matte + i + k : nullptr,
-                                                    &pixels[2 * pair + k]);
+                                                    &pixels[2 * pair + k], points, 2 * pair + k);
                     }
                     Advance(setup.needsPoint, state, ray);
                 }
             }
-            if (setup.shaded) LightPairs(shader, lanes, reaching, ray.normal, taken, pixels);
+            if (setup.shaded)
+                LightPairs(shader, lanes, reaching, ray.normal, taken, points, pixels);
             for (int k = 0; k < 2 * kPairs; ++k) {
                 if (taken[k / 2] && !pixels[k].skipped)
                     delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
@@ -319,11 +322,14 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
     else
         drawPairs.template operator()<1>();
     if (i < count) {
-        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
+        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0],
+                                    points, 0);
         if (pixels[0].skipped) return;
         if (setup.shaded) {
+            double p[3];
+            points.Point(0, p);
             SY_Lighting light;
-            shader.LightOnePixel(pixels[0].point, ray.normal, &light, reaching);
+            shader.LightOnePixel(p, ray.normal, &light, reaching);
             ApplyLighting(light, &pixels[0].texel);
         }
         delivery.Deliver(x + i, pixels[0].texel, pixels[0].coverage, pixels[0].depth, thread);
