@@ -208,26 +208,34 @@ template <class State>
     }
 }
 
-// Lights the pairs taken of kPairs pairs as widely as the processor allows: four pixels at
-// once where both of two pairs are taken. Kept out of line: the lighting outweighs a call, and
-// the span loop stays small.
+// kPairs pairs of pixels from their fetching to their delivery, with their lighting.
+template <int kPairs, class P>
+struct LitPairs {
+    Pixel<P> pixels[2 * kPairs];
+    bool taken[kPairs];  // a pair the matte hides wholly is not
+    bool four;           // lit four at once, into fours; else pixel by pixel, into light
+    SY_FourLightings fours;
+    SY_Lighting light[2 * kPairs];
+};
+
+// Lights the pairs taken as widely as the processor allows: four pixels at once where both of
+// two pairs are taken. Kept out of line: the lighting outweighs a call, and the span loop
+// stays small.
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
                                   SY_LightSet reaching, const double normal[3],
-                                  const bool (&taken)[kPairs], const SY_FourPoints& points,
-                                  Pixel<P>* pixels) {
-    SY_Lighting light[2 * kPairs];
+                                  const SY_FourPoints& points, LitPairs<kPairs, P>& group) {
+    group.four = false;
     if constexpr (kPairs == 2) {
-        if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
-            SY_FourLightings four;
-            shader.LightFourPixels(points, normal, &four, reaching);
-            ApplyLighting(four, pixels);
+        if (group.taken[0] && group.taken[1] && lanes == SY_LightingLanes::kFour) {
+            group.four = true;
+            shader.LightFourPixels(points, normal, &group.fours, reaching);
             return;
         }
     }
     for (int pair = 0; pair < kPairs; ++pair) {
-        if (!taken[pair]) continue;
-        Pixel<P>* two = pixels + 2 * pair;
+        if (!group.taken[pair]) continue;
+        SY_Lighting* light = group.light + 2 * pair;
         double p[2][3];
         points.Point(2 * pair, p[0]);
         points.Point(2 * pair + 1, p[1]);
@@ -237,8 +245,16 @@ template <int kPairs, class P>
             shader.LightOnePixel(p[0], normal, &light[0], reaching);
             shader.LightOnePixel(p[1], normal, &light[1], reaching);
         }
-        ApplyLighting(light[0], &two[0].texel);
-        ApplyLighting(light[1], &two[1].texel);
+    }
+}
+
+template <int kPairs, class P>
+void ApplyLighting(LitPairs<kPairs, P>& group) {
+    if constexpr (kPairs == 2) {
+        if (group.four) return ApplyLighting(group.fours, group.pixels);
+    }
+    for (int k = 0; k < 2 * kPairs; ++k) {
+        if (group.taken[k / 2]) ApplyLighting(group.light[k], &group.pixels[k].texel);
     }
 }
 
@@ -288,39 +304,70 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                                      ? LightsReachingSpan(shader, state, ray, count)
                                      : kSY_AllLights;
 
-    Pixel<P> pixels[4];
-    SY_FourPoints points;
     int32_t i = 0;
-    // Takes kPairs pairs at a time: two only where they are lit four at once, as the wider
-    // step costs unlit spans time.
-    auto drawPairs = [&]<int kPairs>() {
-        while (i + 1 < count) {
-            const int32_t from = i;
-            bool taken[kPairs] = {};
-            for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
-                taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
-                for (int k = 0; k < 2; ++k) {
-                    if (taken[pair]) {
-                        Fetch<Delivery::kUsesDepth>(setup, state, ray,
-                                                    matte ? matte + i + k : nullptr,
-                                                    &pixels[2 * pair + k], points, 2 * pair + k);
-                    }
-                    Advance(setup.needsPoint, state, ray);
+    SY_FourPoints points;
+    // Fetches kPairs pairs from pixel i on into pixels, stepping past them.
+    auto fetchPairs = [&]<int kPairs>(Pixel<P>* pixels, bool(&taken)[kPairs]) {
+        for (int pair = 0; pair < kPairs; ++pair)
+            taken[pair] = false;
+        for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
+            taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
+            for (int k = 0; k < 2; ++k) {
+                if (taken[pair]) {
+                    Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
+                                                &pixels[2 * pair + k], points, 2 * pair + k);
                 }
-            }
-            if (setup.shaded)
-                LightPairs(shader, lanes, reaching, ray.normal, taken, points, pixels);
-            for (int k = 0; k < 2 * kPairs; ++k) {
-                if (taken[k / 2] && !pixels[k].skipped)
-                    delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
-                                     pixels[k].depth, thread);
+                Advance(setup.needsPoint, state, ray);
             }
         }
     };
-    if (setup.shaded && lanes == SY_LightingLanes::kFour)
-        drawPairs.template operator()<2>();
-    else
-        drawPairs.template operator()<1>();
+    auto deliverPairs = [&]<int kPairs>(const Pixel<P>* pixels, const bool(&taken)[kPairs],
+                                        int32_t from) {
+        for (int k = 0; k < 2 * kPairs; ++k) {
+            if (taken[k / 2] && !pixels[k].skipped)
+                delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage, pixels[k].depth,
+                                 thread);
+        }
+    };
+    // Lit pixels go out one group late: the lighting of a group, a long chain of dependent
+    // steps, runs on while the next group is sampled.
+    auto drawLit = [&]<int kPairs>() {
+        LitPairs<kPairs, P> groups[2];
+        int32_t from[2] = {0, 0};
+        int current = 0;
+        bool pending = false;
+        while (i + 1 < count) {
+            LitPairs<kPairs, P>& group = groups[current];
+            from[current] = i;
+            fetchPairs.template operator()<kPairs>(group.pixels, group.taken);
+            LitPairs<kPairs, P>& last = groups[current ^ 1];
+            if (pending) {
+                ApplyLighting(last);
+                deliverPairs(last.pixels, last.taken, from[current ^ 1]);
+            }
+            LightPairs(shader, lanes, reaching, ray.normal, points, group);
+            pending = true;
+            current ^= 1;
+        }
+        if (pending) {
+            LitPairs<kPairs, P>& last = groups[current ^ 1];
+            ApplyLighting(last);
+            deliverPairs(last.pixels, last.taken, from[current ^ 1]);
+        }
+    };
+    Pixel<P> pixels[2];
+    if (!setup.shaded) {
+        while (i + 1 < count) {
+            const int32_t pairFrom = i;
+            bool taken[1];
+            fetchPairs.template operator()<1>(pixels, taken);
+            deliverPairs(pixels, taken, pairFrom);
+        }
+    } else if (lanes == SY_LightingLanes::kFour) {
+        drawLit.template operator()<2>();
+    } else {
+        drawLit.template operator()<1>();
+    }
     if (i < count) {
         Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0],
                                     points, 0);
