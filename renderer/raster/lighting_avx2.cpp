@@ -49,12 +49,10 @@ struct SY_FourLanes {
     static bool Any(Mask m) { return _mm256_movemask_pd(m) != 0; }
     static bool LaneOn(Mask m, int i) { return (_mm256_movemask_pd(m) >> i) & 1; }
 
-    static Real Select(Mask m, Real a, Real b) {
-        return _mm256_or_pd(_mm256_and_pd(m, a), _mm256_andnot_pd(m, b));
-    }
+    // A mask lane is all ones or all zeros, so a blend on its sign picks as and/or would.
+    static Real Select(Mask m, Real a, Real b) { return _mm256_blendv_pd(b, a, m); }
     static Single SelectSingle(Mask m, Single a, Single b) {
-        Single n = Narrow(m);
-        return _mm_or_ps(_mm_and_ps(n, a), _mm_andnot_ps(n, b));
+        return _mm_blendv_ps(b, a, Narrow(m));
     }
     static Single Keep(Mask m, Single a) { return _mm_and_ps(Narrow(m), a); }
 

@@ -208,37 +208,38 @@ template <class State>
     }
 }
 
-// kPairs pairs of pixels from their fetching to their delivery, with their lighting.
+// kPairs pairs of pixels from their fetching to their delivery, with their lighting. Each
+// quad (two pairs) is lit four at once where both its pairs are taken and the processor
+// allows, into fours; the other pairs pixel by pixel, into light.
 template <int kPairs, class P>
 struct LitPairs {
+    static constexpr int kQuads = (kPairs + 1) / 2;
     Pixel<P> pixels[2 * kPairs];
     bool taken[kPairs];  // a pair the matte hides wholly is not
-    bool four;           // lit four at once, into fours; else pixel by pixel, into light
-    SY_FourLightings fours;
+    bool four[kQuads];
+    SY_FourLightings fours[kQuads];
     SY_Lighting light[2 * kPairs];
 };
 
-// Lights the pairs taken as widely as the processor allows: four pixels at once where both of
-// two pairs are taken. Kept out of line: the lighting outweighs a call, and the span loop
-// stays small.
+// Lights the pairs taken as widely as the processor allows. Kept out of line: the lighting
+// outweighs a call, and the span loop stays small. The quads' lightings do not depend on each
+// other, so one runs on while the next starts.
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
                                   SY_LightSet reaching, const double normal[3],
-                                  const SY_FourPoints& points, LitPairs<kPairs, P>& group) {
-    group.four = false;
-    if constexpr (kPairs == 2) {
-        if (group.taken[0] && group.taken[1] && lanes == SY_LightingLanes::kFour) {
-            group.four = true;
-            shader.LightFourPixels(points, normal, &group.fours, reaching);
-            return;
-        }
+                                  const SY_FourPoints* points, LitPairs<kPairs, P>& group) {
+    for (int quad = 0; quad < group.kQuads; ++quad) {
+        group.four[quad] = kPairs > 1 && lanes == SY_LightingLanes::kFour &&
+                           group.taken[2 * quad] && group.taken[2 * quad + 1];
+        if (group.four[quad])
+            shader.LightFourPixels(points[quad], normal, &group.fours[quad], reaching);
     }
     for (int pair = 0; pair < kPairs; ++pair) {
-        if (!group.taken[pair]) continue;
+        if (!group.taken[pair] || group.four[pair / 2]) continue;
         SY_Lighting* light = group.light + 2 * pair;
         double p[2][3];
-        points.Point(2 * pair, p[0]);
-        points.Point(2 * pair + 1, p[1]);
+        for (int k = 0; k < 2; ++k)
+            points[pair / 2].Point(2 * (pair % 2) + k, p[k]);
         if (lanes != SY_LightingLanes::kOne) {
             shader.LightTwoPixels(p[0], p[1], normal, &light[0], &light[1], reaching);
         } else {
@@ -250,11 +251,13 @@ template <int kPairs, class P>
 
 template <int kPairs, class P>
 void ApplyLighting(LitPairs<kPairs, P>& group) {
-    if constexpr (kPairs == 2) {
-        if (group.four) return ApplyLighting(group.fours, group.pixels);
-    }
-    for (int k = 0; k < 2 * kPairs; ++k) {
-        if (group.taken[k / 2]) ApplyLighting(group.light[k], &group.pixels[k].texel);
+    for (int pair = 0; pair < kPairs; ++pair) {
+        if (group.four[pair / 2]) {
+            if (pair % 2 == 0) ApplyLighting(group.fours[pair / 2], group.pixels + 2 * pair);
+        } else if (group.taken[pair]) {
+            for (int k = 2 * pair; k < 2 * pair + 2; ++k)
+                ApplyLighting(group.light[k], &group.pixels[k].texel);
+        }
     }
 }
 
@@ -305,7 +308,7 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                                      : kSY_AllLights;
 
     int32_t i = 0;
-    SY_FourPoints points;
+    SY_FourPoints points[2];
     // Fetches kPairs pairs from pixel i on into pixels, stepping past them.
     auto fetchPairs = [&]<int kPairs>(Pixel<P>* pixels, bool(&taken)[kPairs]) {
         for (int pair = 0; pair < kPairs; ++pair)
@@ -315,7 +318,8 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
             for (int k = 0; k < 2; ++k) {
                 if (taken[pair]) {
                     Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
-                                                &pixels[2 * pair + k], points, 2 * pair + k);
+                                                &pixels[2 * pair + k], points[pair / 2],
+                                                2 * (pair % 2) + k);
                 }
                 Advance(setup.needsPoint, state, ray);
             }
@@ -364,17 +368,17 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
             deliverPairs(pixels, taken, pairFrom);
         }
     } else if (lanes == SY_LightingLanes::kFour) {
-        drawLit.template operator()<2>();
+        drawLit.template operator()<4>();
     } else {
         drawLit.template operator()<1>();
     }
     if (i < count) {
         Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0],
-                                    points, 0);
+                                    points[0], 0);
         if (pixels[0].skipped) return;
         if (setup.shaded) {
             double p[3];
-            points.Point(0, p);
+            points[0].Point(0, p);
             SY_Lighting light;
             shader.LightOnePixel(p, ray.normal, &light, reaching);
             ApplyLighting(light, &pixels[0].texel);
