@@ -286,8 +286,8 @@ SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
 
 // Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
 // matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs, and
-// two pairs at a time, so that lighting can work on several at once; a pair the matte hides
-// wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
+// lit ones in groups of pairs, so that lighting can work on several at once; a pair the matte
+// hides wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
 // every pixel the matte shows, in order; the depth is worked out only for deliveries whose
 // kUsesDepth is true.
 template <class P, class State, class Delivery>
