@@ -100,12 +100,16 @@ void BM_LightFourPixels(benchmark::State& state) {
         return;
     }
     LitLayer layer;
+    // The points as the span routines hand them over: a float ray over W, here W = 1.
+    std::vector<SY_FourPoints> fours(layer.points.size() / 4);
+    for (size_t i = 0; i < 4 * fours.size(); ++i) {
+        for (int k = 0; k < 3; ++k)
+            fours[i / 4].ray[k][i % 4] = static_cast<float>(layer.points[i][k]);
+        fours[i / 4].invW[i % 4] = 1;
+    }
     SY_FourLightings out;
     for (auto _ : state) {
-        for (size_t i = 0; i + 3 < layer.points.size(); i += 4) {
-            const double* const points[4] = {layer.points[i].data(), layer.points[i + 1].data(),
-                                             layer.points[i + 2].data(),
-                                             layer.points[i + 3].data()};
+        for (const SY_FourPoints& points : fours) {
             layer.shader.LightFourPixels(points, layer.normal, &out);
             benchmark::DoNotOptimize(out);
         }

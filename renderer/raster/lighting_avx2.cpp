@@ -17,9 +17,6 @@ struct SY_FourLanes {
 
     static Real Splat(double v) { return _mm256_set1_pd(v); }
     static Single SplatSingle(float v) { return _mm_set1_ps(v); }
-    static Real Load(const double* const lanes[kCount], int k) {
-        return _mm256_setr_pd(lanes[0][k], lanes[1][k], lanes[2][k], lanes[3][k]);
-    }
     static double Lane(Real v, int i) {
         double d[4];
         _mm256_storeu_pd(d, v);
@@ -52,12 +49,10 @@ struct SY_FourLanes {
     static bool Any(Mask m) { return _mm256_movemask_pd(m) != 0; }
     static bool LaneOn(Mask m, int i) { return (_mm256_movemask_pd(m) >> i) & 1; }
 
-    static Real Select(Mask m, Real a, Real b) {
-        return _mm256_or_pd(_mm256_and_pd(m, a), _mm256_andnot_pd(m, b));
-    }
+    // A mask lane is all ones or all zeros, so a blend on its sign picks as and/or would.
+    static Real Select(Mask m, Real a, Real b) { return _mm256_blendv_pd(b, a, m); }
     static Single SelectSingle(Mask m, Single a, Single b) {
-        Single n = Narrow(m);
-        return _mm_or_ps(_mm_and_ps(n, a), _mm_andnot_ps(n, b));
+        return _mm_blendv_ps(b, a, Narrow(m));
     }
     static Single Keep(Mask m, Single a) { return _mm_and_ps(Narrow(m), a); }
 
@@ -80,9 +75,15 @@ private:
 
 }  // namespace
 
-void SY_LayerShader::LightFourPixels(const double* const p[4], const double n[3],
+void SY_LayerShader::LightFourPixels(const SY_FourPoints& p, const double n[3],
                                      SY_FourLightings* out, SY_LightSet reaching) const {
-    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, p, n, reaching);
+    // Widening a float is exact, so each lane's product is the one SY_FourPoints::Point makes.
+    auto load = [&p](__m256d points[3]) {
+        const __m256d invW = _mm256_load_pd(p.invW);
+        for (int k = 0; k < 3; ++k)
+            points[k] = _mm256_mul_pd(_mm256_cvtps_pd(_mm_load_ps(p.ray[k])), invW);
+    };
+    const auto lighting = sy_lighting::Lit<SY_FourLanes>(*this, load, n, reaching);
     for (int c = 0; c < 3; ++c) {
         _mm_store_ps(out->diffuse[c], lighting.diffuse[c]);
         _mm_store_ps(out->specular[c], lighting.specular[c]);

@@ -233,17 +233,18 @@ struct PixelLighting {
 };
 
 // The lighting of L::kCount points of the layer, left in the lanes of the returned terms.
-template <class L>
-PixelLighting<L> Lit(const SY_LayerShader& shader, const double* const p[L::kCount],
-                     const double n[3], SY_LightSet reaching, bool shadowsOnly = false) {
+// loadPoints(p) sets p[k] to coordinate k of the points, one a lane; it writes the lighting's
+// own array, as a copy of it went through memory in halves that the next wide read waited on.
+template <class L, class LoadPoints>
+PixelLighting<L> Lit(const SY_LayerShader& shader, LoadPoints loadPoints, const double n[3],
+                     SY_LightSet reaching, bool shadowsOnly = false) {
     PixelLighting<L> lighting(shader, reaching);
     for (int k = 0; k < 3; ++k)
         lighting.n[k] = L::Splat(n[k]);
     // Without the need the span routine does not work out the points. Two loops, not a choice
     // per coordinate, which the compiler turned into clearing the points with a string store.
     if (shader.needsPoint) {
-        for (int k = 0; k < 3; ++k)
-            lighting.p[k] = L::Load(p, k);
+        loadPoints(lighting.p);
     } else {
         for (int k = 0; k < 3; ++k)
             lighting.p[k] = L::Splat(0.0);
@@ -255,7 +256,11 @@ PixelLighting<L> Lit(const SY_LayerShader& shader, const double* const p[L::kCou
 template <class L>
 void Light(const SY_LayerShader& shader, const double* const p[L::kCount], const double n[3],
            SY_Lighting* const out[L::kCount], SY_LightSet reaching, bool shadowsOnly = false) {
-    Lit<L>(shader, p, n, reaching, shadowsOnly).Store(out);
+    auto load = [p](typename L::Real points[3]) {
+        for (int k = 0; k < 3; ++k)
+            points[k] = L::Load(p, k);
+    };
+    Lit<L>(shader, load, n, reaching, shadowsOnly).Store(out);
 }
 
 }  // namespace sy_lighting

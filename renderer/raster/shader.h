@@ -82,6 +82,20 @@ struct SY_FourLightings {
     alignas(16) float specular[3][4];
 };
 
+// Four surface points as the span routines step to them: coordinate k of point i is
+// ray[k][i] × invW[i], the stepped ray over W. Kept in planes, so the lighting loads each
+// coordinate of all four at once and multiplies them out itself.
+struct SY_FourPoints {
+    alignas(16) float ray[3][4];
+    alignas(32) double invW[4];
+
+    // Point i, worked out as the four-pixel lighting works it out.
+    void Point(int i, double p[3]) const {
+        for (int k = 0; k < 3; ++k)
+            p[k] = static_cast<double>(ray[k][i]) * invW[i];
+    }
+};
+
 // A set of a layer's lights: bit i for light i. Lights from the 64th on are always in a set.
 using SY_LightSet = uint64_t;
 inline constexpr SY_LightSet kSY_AllLights = ~SY_LightSet{0};
@@ -102,9 +116,9 @@ public:
     void LightTwoPixels(const double p1[3], const double p2[3], const double n[3],
                         SY_Lighting* out1, SY_Lighting* out2,
                         SY_LightSet reaching = kSY_AllLights) const;
-    // Four points at once, bit for bit as four calls of LightOnePixel; only where
+    // Four points at once, bit for bit as LightOnePixel on each p.Point(i); only where
     // SY_WidestLightingLanes() gives kFour.
-    void LightFourPixels(const double* const p[4], const double n[3], SY_FourLightings* out,
+    void LightFourPixels(const SY_FourPoints& p, const double n[3], SY_FourLightings* out,
                          SY_LightSet reaching = kSY_AllLights) const;
     // Only the darkening by the shadows that fall on p, whether or not the layer takes light:
     // for layers drawn from an image, which are not lit.

@@ -123,7 +123,6 @@ struct Pixel {
     P texel;
     SY_Coverage<P> coverage;
     bool skipped;            // the matte hides it
-    double point[3];         // surface point, when lighting needs it
     SY_FragmentDepth depth;  // set only for deliveries that use it
 };
 
@@ -171,14 +170,15 @@ template <class P, class State>
 
 template <bool kDepth, class P, class State>
 [[gnu::always_inline]] inline void Fetch(const SpanSetup<P>& setup, State& state,
-                                         const SY_SpanRayState& ray, const P* matte,
-                                         Pixel<P>* out) {
+                                         const SY_SpanRayState& ray, const P* matte, Pixel<P>* out,
+                                         SY_FourPoints& points, int lane) {
     using Traits = PF_PixelTraits<P>;
     using C = typename Traits::Channel;
     const SY_SpanMapping& first = FirstMapping(state);
     if (setup.shaded) {
         for (int k = 0; k < 3; ++k)
-            out->point[k] = ray.d[k] * first.invW;
+            points.ray[k][lane] = ray.d[k];
+        points.invW[lane] = first.invW;
     }
     out->skipped = matte && matte->alpha == 0;
     if (out->skipped) {
@@ -208,36 +208,56 @@ template <class State>
     }
 }
 
-// Lights the pairs taken of kPairs pairs as widely as the processor allows: four pixels at
-// once where both of two pairs are taken. Kept out of line: the lighting outweighs a call, and
-// the span loop stays small.
+// kPairs pairs of pixels from their fetching to their delivery, with their lighting. Each
+// quad (two pairs) is lit four at once where both its pairs are taken and the processor
+// allows, into fours; the other pairs pixel by pixel, into light.
+template <int kPairs, class P>
+struct LitPairs {
+    static constexpr int kQuads = (kPairs + 1) / 2;
+    Pixel<P> pixels[2 * kPairs];
+    bool taken[kPairs];  // a pair the matte hides wholly is not
+    bool four[kQuads];
+    SY_FourLightings fours[kQuads];
+    SY_Lighting light[2 * kPairs];
+};
+
+// Lights the pairs taken as widely as the processor allows. Kept out of line: the lighting
+// outweighs a call, and the span loop stays small. The quads' lightings do not depend on each
+// other, so one runs on while the next starts.
 template <int kPairs, class P>
 [[gnu::noinline]] void LightPairs(const SY_LayerShader& shader, SY_LightingLanes lanes,
                                   SY_LightSet reaching, const double normal[3],
-                                  const bool (&taken)[kPairs], Pixel<P>* pixels) {
-    SY_Lighting light[2 * kPairs];
-    if constexpr (kPairs == 2) {
-        if (taken[0] && taken[1] && lanes == SY_LightingLanes::kFour) {
-            const double* const points[4] = {pixels[0].point, pixels[1].point, pixels[2].point,
-                                             pixels[3].point};
-            SY_FourLightings four;
-            shader.LightFourPixels(points, normal, &four, reaching);
-            ApplyLighting(four, pixels);
-            return;
-        }
+                                  const SY_FourPoints* points, LitPairs<kPairs, P>& group) {
+    for (int quad = 0; quad < group.kQuads; ++quad) {
+        group.four[quad] = kPairs > 1 && lanes == SY_LightingLanes::kFour &&
+                           group.taken[2 * quad] && group.taken[2 * quad + 1];
+        if (group.four[quad])
+            shader.LightFourPixels(points[quad], normal, &group.fours[quad], reaching);
     }
     for (int pair = 0; pair < kPairs; ++pair) {
-        if (!taken[pair]) continue;
-        Pixel<P>* two = pixels + 2 * pair;
+        if (!group.taken[pair] || group.four[pair / 2]) continue;
+        SY_Lighting* light = group.light + 2 * pair;
+        double p[2][3];
+        for (int k = 0; k < 2; ++k)
+            points[pair / 2].Point(2 * (pair % 2) + k, p[k]);
         if (lanes != SY_LightingLanes::kOne) {
-            shader.LightTwoPixels(two[0].point, two[1].point, normal, &light[0], &light[1],
-                                  reaching);
+            shader.LightTwoPixels(p[0], p[1], normal, &light[0], &light[1], reaching);
         } else {
-            shader.LightOnePixel(two[0].point, normal, &light[0], reaching);
-            shader.LightOnePixel(two[1].point, normal, &light[1], reaching);
+            shader.LightOnePixel(p[0], normal, &light[0], reaching);
+            shader.LightOnePixel(p[1], normal, &light[1], reaching);
         }
-        ApplyLighting(light[0], &two[0].texel);
-        ApplyLighting(light[1], &two[1].texel);
+    }
+}
+
+template <int kPairs, class P>
+void ApplyLighting(LitPairs<kPairs, P>& group) {
+    for (int pair = 0; pair < kPairs; ++pair) {
+        if (group.four[pair / 2]) {
+            if (pair % 2 == 0) ApplyLighting(group.fours[pair / 2], group.pixels + 2 * pair);
+        } else if (group.taken[pair]) {
+            for (int k = 2 * pair; k < 2 * pair + 2; ++k)
+                ApplyLighting(group.light[k], &group.pixels[k].texel);
+        }
     }
 }
 
@@ -266,8 +286,8 @@ SY_LightSet LightsReachingSpan(const SY_LayerShader& shader, const State& state,
 
 // Draws count pixels of row y from x on: the state and the ray stand at the centre of pixel x.
 // matte, when given, points at the matte pixel under pixel x. Pixels are taken in pairs, and
-// two pairs at a time, so that lighting can work on several at once; a pair the matte hides
-// wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
+// lit ones in groups of pairs, so that lighting can work on several at once; a pair the matte
+// hides wholly is only stepped over. The delivery receives (x, pixel, coverage, depth, thread) for
 // every pixel the matte shows, in order; the depth is worked out only for deliveries whose
 // kUsesDepth is true.
 template <class P, class State, class Delivery>
@@ -287,43 +307,80 @@ void SY_DrawSpan(const SY_LayerShader& shader, SY_LightingLanes lanes, State& st
                                      ? LightsReachingSpan(shader, state, ray, count)
                                      : kSY_AllLights;
 
-    Pixel<P> pixels[4];
     int32_t i = 0;
-    // Takes kPairs pairs at a time: two only where they are lit four at once, as the wider
-    // step costs unlit spans time.
-    auto drawPairs = [&]<int kPairs>() {
-        while (i + 1 < count) {
-            const int32_t from = i;
-            bool taken[kPairs] = {};
-            for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
-                taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
-                for (int k = 0; k < 2; ++k) {
-                    if (taken[pair]) {
-                        Fetch<Delivery::kUsesDepth>(setup, state, ray,
-                                                    matte ? matte + i + k : nullptr,
-                                                    &pixels[2 * pair + k]);
-                    }
-                    Advance(setup.needsPoint, state, ray);
+    SY_FourPoints points[2];
+    // Fetches kPairs pairs from pixel i on into pixels, stepping past them.
+    auto fetchPairs = [&]<int kPairs>(Pixel<P>* pixels, bool(&taken)[kPairs]) {
+        for (int pair = 0; pair < kPairs; ++pair)
+            taken[pair] = false;
+        for (int pair = 0; pair < kPairs && i + 1 < count; ++pair, i += 2) {
+            taken[pair] = !(matte && matte[i].alpha == 0 && matte[i + 1].alpha == 0);
+            for (int k = 0; k < 2; ++k) {
+                if (taken[pair]) {
+                    Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i + k : nullptr,
+                                                &pixels[2 * pair + k], points[pair / 2],
+                                                2 * (pair % 2) + k);
                 }
-            }
-            if (setup.shaded) LightPairs(shader, lanes, reaching, ray.normal, taken, pixels);
-            for (int k = 0; k < 2 * kPairs; ++k) {
-                if (taken[k / 2] && !pixels[k].skipped)
-                    delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage,
-                                     pixels[k].depth, thread);
+                Advance(setup.needsPoint, state, ray);
             }
         }
     };
-    if (setup.shaded && lanes == SY_LightingLanes::kFour)
-        drawPairs.template operator()<2>();
-    else
-        drawPairs.template operator()<1>();
+    auto deliverPairs = [&]<int kPairs>(const Pixel<P>* pixels, const bool(&taken)[kPairs],
+                                        int32_t from) {
+        for (int k = 0; k < 2 * kPairs; ++k) {
+            if (taken[k / 2] && !pixels[k].skipped)
+                delivery.Deliver(x + from + k, pixels[k].texel, pixels[k].coverage, pixels[k].depth,
+                                 thread);
+        }
+    };
+    // Lit pixels go out one group late: the lighting of a group, a long chain of dependent
+    // steps, runs on while the next group is sampled.
+    auto drawLit = [&]<int kPairs>() {
+        LitPairs<kPairs, P> groups[2];
+        int32_t from[2] = {0, 0};
+        int current = 0;
+        bool pending = false;
+        while (i + 1 < count) {
+            LitPairs<kPairs, P>& group = groups[current];
+            from[current] = i;
+            fetchPairs.template operator()<kPairs>(group.pixels, group.taken);
+            LitPairs<kPairs, P>& last = groups[current ^ 1];
+            if (pending) {
+                ApplyLighting(last);
+                deliverPairs(last.pixels, last.taken, from[current ^ 1]);
+            }
+            LightPairs(shader, lanes, reaching, ray.normal, points, group);
+            pending = true;
+            current ^= 1;
+        }
+        if (pending) {
+            LitPairs<kPairs, P>& last = groups[current ^ 1];
+            ApplyLighting(last);
+            deliverPairs(last.pixels, last.taken, from[current ^ 1]);
+        }
+    };
+    Pixel<P> pixels[2];
+    if (!setup.shaded) {
+        while (i + 1 < count) {
+            const int32_t pairFrom = i;
+            bool taken[1];
+            fetchPairs.template operator()<1>(pixels, taken);
+            deliverPairs(pixels, taken, pairFrom);
+        }
+    } else if (lanes == SY_LightingLanes::kFour) {
+        drawLit.template operator()<4>();
+    } else {
+        drawLit.template operator()<1>();
+    }
     if (i < count) {
-        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0]);
+        Fetch<Delivery::kUsesDepth>(setup, state, ray, matte ? matte + i : nullptr, &pixels[0],
+                                    points[0], 0);
         if (pixels[0].skipped) return;
         if (setup.shaded) {
+            double p[3];
+            points[0].Point(0, p);
             SY_Lighting light;
-            shader.LightOnePixel(pixels[0].point, ray.normal, &light, reaching);
+            shader.LightOnePixel(p, ray.normal, &light, reaching);
             ApplyLighting(light, &pixels[0].texel);
         }
         delivery.Deliver(x + i, pixels[0].texel, pixels[0].coverage, pixels[0].depth, thread);

@@ -93,15 +93,25 @@ SY_Lighting LightAt(const SY_LayerShader& shader, double x, double y, const doub
 }
 
 // Where the processor has four lanes: the point (x, 0, 0) and three others that light
-// differently, lit at once, light bit for bit as each alone.
+// differently, each a ray over its own W, lit at once, light bit for bit as each alone.
 void ExpectFourLikeOne(const SY_LayerShader& shader, double x) {
     if (SY_WidestLightingLanes() != SY_LightingLanes::kFour) return;
-    const double p[4][3] = {{x, 0, 0}, {x + 150, -40, 0}, {x - 70, 90, 0}, {x + 20, 300, 0}};
-    const double* const points[4] = {p[0], p[1], p[2], p[3]};
+    const float offsets[4][3] = {{0, 0, 0}, {150, -40, 0}, {-70, 90, 0}, {20, 300, 0}};
+    const double invW[4] = {1, 0.5, 2, 0.75};
+    SY_FourPoints points;
+    for (int i = 0; i < 4; ++i) {
+        points.ray[0][i] = static_cast<float>(x) + offsets[i][0];
+        points.ray[1][i] = offsets[i][1];
+        points.ray[2][i] = offsets[i][2];
+        points.invW[i] = invW[i];
+    }
     SY_Lighting alone[4], four[4];
     SY_FourLightings lanes;
-    for (int i = 0; i < 4; ++i)
-        shader.LightOnePixel(p[i], kFront, &alone[i]);
+    for (int i = 0; i < 4; ++i) {
+        double point[3];
+        points.Point(i, point);
+        shader.LightOnePixel(point, kFront, &alone[i]);
+    }
     shader.LightFourPixels(points, kFront, &lanes);
     for (int i = 0; i < 4; ++i) {
         four[i] = {{lanes.diffuse[0][i], lanes.diffuse[1][i], lanes.diffuse[2][i]},

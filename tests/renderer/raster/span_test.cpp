@@ -147,7 +147,9 @@ TYPED_TEST(Span, MatteAndOpacityScaleTheCoverage) {
 
 // Ambient light of half strength halves every colour channel: c·½ + ½, truncated for integer
 // channels; the shadows-only layer lights the channel maximum instead of the texel's colour and
-// multiplies what lies beneath, opaque white here.
+// multiplies what lies beneath, opaque white here. Lit pixels go out in groups of pairs, lit
+// four at once where a group's pairs all show: a matte hiding the pair 2–3 and pixel 9 of a
+// 15-pixel span leaves every other pixel lit as alone and those untouched.
 TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     using P = TypeParam;
     SY_LightState ambient;
@@ -161,17 +163,22 @@ TYPED_TEST(Span, ShadingScalesTexelsByTheLightingTerms) {
     auto half = [](double c) {
         return PF_PixelTraits<P>::kIsFloat ? c / 2 : std::floor(c / 2 + 0.5);
     };
+    const P white = Opaque<P>(255, 255, 255);
+    auto matte = raster_test::FilledWorld<P>(kWidth, kHeight, white);
+    for (int32_t x : {2, 3, 9})
+        matte->At(x, 4).alpha = 0;
     for (uint8_t acceptsShadows : {0, 2}) {
         shader.material.acceptsShadows = acceptsShadows;
-        auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, Opaque<P>(255, 255, 255));
-        this->Draw(false, SY_RenderTarget(*destination), 1, 3, 4);  // a pair and the tail
-        for (int32_t i = 1; i < 4; ++i) {
-            const P texel = acceptsShadows ? Opaque<P>(255, 255, 255) : PatternTexel<P>(i, 4);
+        auto destination = raster_test::FilledWorld<P>(kWidth, kHeight, white);
+        this->Draw(false, SY_RenderTarget(*destination), 0, 15, 4, matte.get());
+        for (int32_t i = 0; i < kWidth; ++i) {
+            const P texel = acceptsShadows ? white : PatternTexel<P>(i, 4);
+            const bool lit = i < 15 && matte->At(i, 4).alpha != 0;
             const P& got = destination->At(i, 4);
             EXPECT_EQ(got.alpha, texel.alpha);
-            EXPECT_FLOAT_EQ(got.red, half(texel.red)) << i;
-            EXPECT_FLOAT_EQ(got.green, half(texel.green)) << i;
-            EXPECT_FLOAT_EQ(got.blue, half(texel.blue)) << i;
+            EXPECT_FLOAT_EQ(got.red, lit ? half(texel.red) : white.red) << i;
+            EXPECT_FLOAT_EQ(got.green, lit ? half(texel.green) : white.green) << i;
+            EXPECT_FLOAT_EQ(got.blue, lit ? half(texel.blue) : white.blue) << i;
         }
     }
 }
