@@ -101,7 +101,7 @@ public:
             texels_.top = std::min(texels_.top, b.top);
             texels_.right = std::max(texels_.right, b.right);
             texels_.bottom = std::max(texels_.bottom, b.bottom);
-            total += arrays[k]->fragmentCount.load(std::memory_order_relaxed);
+            total += arrays[k]->FragmentCount();
         }
         size_t texelCount = size_t(texels_.right - texels_.left) * (texels_.bottom - texels_.top);
         starts_ = SY_ShadowBlock<uint32_t>("shadow map", texelCount + 1);
@@ -373,7 +373,7 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     // The arrays that received nothing go; so do their rectangles.
     size_t kept = 0;
     for (int32_t k = 0; k < arrays.Count(); ++k) {
-        if (arrays[k]->fragmentCount.load(std::memory_order_relaxed) != 0)
+        if (arrays[k]->FragmentCount() != 0)
             occupied[kept++] = occupied[size_t(k)];
     }
     occupied.resize(kept);
