@@ -133,11 +133,10 @@ public:
                     case 0:
                         break;
                     case 1:
-                        CopyList(*arrays_[rowFirst_[column]]->HeadAt(x, y));
+                        CopyList(rowFirst_[column]);
                         break;
                     case 2:
-                        MergeTwo(*arrays_[rowFirst_[column]]->HeadAt(x, y),
-                                 *arrays_[rowSecond_[column]]->HeadAt(x, y));
+                        MergeTwo(rowFirst_[column], rowSecond_[column]);
                         break;
                     default:
                         MergeTexel(x, y);
@@ -151,7 +150,7 @@ public:
     SY_ShadowBlock<SY_ShadowEntry> TakeEntries() { return std::move(entries_); }
 
 private:
-    // How many arrays have a list at each texel of row y (up to 3), and the first two of them
+    // How many arrays have a list at each texel of row y (up to 3), and the first two lists
     // in array order: most texels lie under one caster or none, and most of the rest under
     // two.
     void CountCovers(int32_t y) {
@@ -160,13 +159,14 @@ private:
             const M_LRect& b = occupied_[size_t(k)];
             SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
             for (int32_t x = b.left; x < b.right; ++x) {
-                if (!heads[x - b.left]) continue;
+                const SY_ShadowFragment* head = heads[x - b.left];
+                if (!head) continue;
                 const size_t column = size_t(x - texels_.left);
                 const uint8_t covers = rowCovers_[column];
                 if (covers == 0)
-                    rowFirst_[column] = k;
+                    rowFirst_[column] = head;
                 else if (covers == 1)
-                    rowSecond_[column] = k;
+                    rowSecond_[column] = head;
                 rowCovers_[column] = static_cast<uint8_t>(std::min(3, covers + 1));
             }
         }
@@ -186,7 +186,7 @@ private:
         }
     }
 
-    // MergeLists for the lists of two arrays, a of the earlier array, without the
+    // MergeLists for the lists of two arrays, a that of the earlier array, without the
     // bookkeeping for any number of them: the same order and the same products.
     void MergeTwo(const SY_ShadowFragment* a, const SY_ShadowFragment* b) {
         const uint32_t begin = written_;
@@ -290,8 +290,8 @@ private:
     SY_AccountedVector<int32_t> rowArrays_;
     SY_AccountedVector<int32_t> covering_;
     SY_AccountedVector<uint8_t> rowCovers_;
-    SY_AccountedVector<int32_t> rowFirst_;
-    SY_AccountedVector<int32_t> rowSecond_;
+    SY_AccountedVector<const SY_ShadowFragment*> rowFirst_;
+    SY_AccountedVector<const SY_ShadowFragment*> rowSecond_;
 };
 
 // What one face of a light needs to render its map.
