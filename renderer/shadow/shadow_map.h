@@ -13,6 +13,7 @@
 // Base of the planar and cubic maps; each light state owns at most one. Lookups run on many
 // render threads at once.
 class SY_PlanarShadowMap;
+class SY_CubicShadowMap;
 
 class SY_ShadowMap : public U_MemTrackedObject {
 public:
@@ -29,6 +30,8 @@ public:
 
     // This map as a planar one, or null.
     const SY_PlanarShadowMap* AsPlanar() const;
+    // This map as a cubic one, or null.
+    const SY_CubicShadowMap* AsCubic() const;
 
 protected:
     enum class Kind : uint8_t { kOther, kPlanar, kCubic };
@@ -319,6 +322,30 @@ public:
             out[1 + c] = sum[c] / weights;
     }
 
+    // Lookup of the L::kCount points p of a lane pack, lane i into t[0..2][i]; the lanes off
+    // in active let all light through. The first face projects the whole pack at once, and
+    // answers alone for the points near its centre, as most are.
+    template <class L>
+    void TransmissionLanes(const typename L::Real p[3], typename L::Mask active,
+                           uint16_t receiverId, bool soft, float t[3][L::kCount]) const {
+        typename L::Real x, y, d;
+        const typename L::Mask inFirst = faces_[0]->ProjectLanes<L>(p, &x, &y, &d);
+        for (int i = 0; i < L::kCount; ++i) {
+            float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
+            if (L::LaneOn(active, i)) {
+                const double xi = L::Lane(x, i), yi = L::Lane(y, i);
+                if (L::LaneOn(inFirst, i) && faces_[0]->SeenByNoOtherFace(xi, yi)) {
+                    faces_[0]->TransmissionAt(xi, yi, L::Lane(d, i), receiverId, soft, out + 1);
+                } else {
+                    const double point[3] = {L::Lane(p[0], i), L::Lane(p[1], i), L::Lane(p[2], i)};
+                    Lookup(point, receiverId, soft, out);
+                }
+            }
+            for (int c = 0; c < 3; ++c)
+                t[c][i] = out[1 + c];
+        }
+    }
+
 private:
     std::unique_ptr<SY_PlanarShadowMap> faces_[kMaxFaces];
     int32_t count_ = 0;
@@ -326,6 +353,10 @@ private:
 
 inline const SY_PlanarShadowMap* SY_ShadowMap::AsPlanar() const {
     return kind_ == Kind::kPlanar ? static_cast<const SY_PlanarShadowMap*>(this) : nullptr;
+}
+
+inline const SY_CubicShadowMap* SY_ShadowMap::AsCubic() const {
+    return kind_ == Kind::kCubic ? static_cast<const SY_CubicShadowMap*>(this) : nullptr;
 }
 
 inline void SY_ShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,
