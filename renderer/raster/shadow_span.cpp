@@ -165,28 +165,11 @@ private:
     const SY_FullAlphaSums<S>& sums_;
 };
 
-// SampleBox for a filtered mapping's box under two texels across along some axis, centred on
-// (u, v) with the half sizes ru, rv; kept out of line, as most boxes are wider.
-template <class P, class Sums>
-[[gnu::noinline]] void SampleNarrowBox(const Sums& sums, SY_SpanTexture& texture, double u,
-                                       double v, double ru, double rv, P* out) {
-    if (ru > 0.5 && rv > 0.5) {
-        // Texel centres on whole numbers; the table counts from corners.
-        const double cu = u + 0.5, cv = v + 0.5;
-        sums.Fractional(static_cast<float>(cu - ru), static_cast<float>(cv - rv),
-                        static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
-        return;
-    }
-    sy_sampling::Filter(texture, u, v, ru, rv, out);
-}
-
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
-// sums (TableSums or FullAlphaSums), or from opaque where there is one. Inline: every texel
-// drawn samples at least one box.
+// sums (TableSums or FullAlphaSums), or from opaque where there is one.
 template <class P, class Sums>
-[[gnu::always_inline]] inline void SampleBox(const Sums& sums, SY_SpanTexture& texture,
-                                             const SY_SpanMapping& m, float scale,
-                                             OpaqueBoxes<P>* opaque, P* out) {
+void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& m, float scale,
+               OpaqueBoxes<P>* opaque, P* out) {
     using sy_sampling::kFarTexels;
     if (opaque) opaque->SetLastDeep(false);
     if (!sy_sampling::InFront(m, texture.perspective)) {
@@ -219,7 +202,12 @@ template <class P, class Sums>
         sums.Whole(x0, y0, x1, y1, out);
         return;
     }
-    SampleNarrowBox(sums, texture, u, v, ru, rv, out);
+    if (ru > 0.5 && rv > 0.5) {
+        sums.Fractional(static_cast<float>(cu - ru), static_cast<float>(cv - rv),
+                        static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
+        return;
+    }
+    sy_sampling::Filter(texture, u, v, ru, rv, out);
 }
 
 template <class P>
