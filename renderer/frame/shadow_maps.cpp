@@ -101,7 +101,7 @@ public:
             texels_.top = std::min(texels_.top, b.top);
             texels_.right = std::max(texels_.right, b.right);
             texels_.bottom = std::max(texels_.bottom, b.bottom);
-            total += arrays[k]->fragmentCount.load(std::memory_order_relaxed);
+            total += arrays[k]->FragmentCount();
         }
         size_t texelCount = size_t(texels_.right - texels_.left) * (texels_.bottom - texels_.top);
         starts_ = SY_ShadowBlock<uint32_t>("shadow map", texelCount + 1);
@@ -111,7 +111,8 @@ public:
         rowArrays_.reserve(size_t(n));
         covering_.reserve(size_t(n));
         rowCovers_.resize(size_t(texels_.right - texels_.left));
-        rowOnly_.resize(size_t(texels_.right - texels_.left));
+        rowFirst_.resize(size_t(texels_.right - texels_.left));
+        rowSecond_.resize(size_t(texels_.right - texels_.left));
     }
 
     const M_LRect& Texels() const { return texels_; }
@@ -128,11 +129,18 @@ public:
             for (int32_t x = texels_.left; x < texels_.right; ++x) {
                 starts_[texel++] = written_;
                 const size_t column = size_t(x - texels_.left);
-                if (rowCovers_[column] == 0) continue;
-                if (rowCovers_[column] == 1)
-                    CopyList(*arrays_[rowOnly_[column]]->HeadAt(x, y));
-                else
-                    MergeTexel(x, y);
+                switch (rowCovers_[column]) {
+                    case 0:
+                        break;
+                    case 1:
+                        CopyList(rowFirst_[column]);
+                        break;
+                    case 2:
+                        MergeTwo(rowFirst_[column], rowSecond_[column]);
+                        break;
+                    default:
+                        MergeTexel(x, y);
+                }
             }
         }
         starts_[texel] = written_;
@@ -142,18 +150,24 @@ public:
     SY_ShadowBlock<SY_ShadowEntry> TakeEntries() { return std::move(entries_); }
 
 private:
-    // How many arrays have a list at each texel of row y (up to 2), and which one where only
-    // one has: most texels lie under one caster or none.
+    // How many arrays have a list at each texel of row y (up to 3), and the first two lists
+    // in array order: most texels lie under one caster or none, and most of the rest under
+    // two.
     void CountCovers(int32_t y) {
         std::fill(rowCovers_.begin(), rowCovers_.end(), uint8_t{0});
         for (int32_t k : rowArrays_) {
             const M_LRect& b = occupied_[size_t(k)];
             SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
             for (int32_t x = b.left; x < b.right; ++x) {
-                if (!heads[x - b.left]) continue;
+                const SY_ShadowFragment* head = heads[x - b.left];
+                if (!head) continue;
                 const size_t column = size_t(x - texels_.left);
-                rowCovers_[column] = static_cast<uint8_t>(std::min(2, rowCovers_[column] + 1));
-                rowOnly_[column] = k;
+                const uint8_t covers = rowCovers_[column];
+                if (covers == 0)
+                    rowFirst_[column] = head;
+                else if (covers == 1)
+                    rowSecond_[column] = head;
+                rowCovers_[column] = static_cast<uint8_t>(std::min(3, covers + 1));
             }
         }
     }
@@ -170,6 +184,37 @@ private:
             if (entries_[i].tag != (entries_[i + 1].tag & kSY_ShadowIdMask))
                 entries_[i].tag |= kSY_ShadowStep;
         }
+    }
+
+    // MergeLists for the lists of two arrays, a that of the earlier array, without the
+    // bookkeeping for any number of them: the same order and the same products.
+    void MergeTwo(const SY_ShadowFragment* a, const SY_ShadowFragment* b) {
+        const uint32_t begin = written_;
+        // Until the second layer is passed, the product is the occluder's own transmission.
+        bool firstB = false, alone = true;
+        float passedA[3] = {1, 1, 1}, passedB[3] = {1, 1, 1};
+        while (a || b) {
+            const bool takeB = b && (!a || b->depth > a->depth);
+            const SY_ShadowFragment& f = takeB ? *b : *a;
+            float* own = takeB ? passedB : passedA;
+            if (takeB)
+                b = b->next;
+            else
+                a = a->next;
+            own[0] = f.red * (1.0f / 32768);
+            own[1] = f.green * (1.0f / 32768);
+            own[2] = f.blue * (1.0f / 32768);
+            if (written_ == begin) firstB = takeB;
+            alone = alone && takeB == firstB;
+            if (alone) {
+                Write(f, f.red, f.green, f.blue);
+                continue;
+            }
+            Write(f, static_cast<uint16_t>(passedA[0] * passedB[0] * 32768 + 0.5f),
+                  static_cast<uint16_t>(passedA[1] * passedB[1] * 32768 + 0.5f),
+                  static_cast<uint16_t>(passedA[2] * passedB[2] * 32768 + 0.5f));
+        }
+        MarkSteps(begin);
     }
 
     void MergeTexel(int32_t x, int32_t y) {
@@ -245,7 +290,8 @@ private:
     SY_AccountedVector<int32_t> rowArrays_;
     SY_AccountedVector<int32_t> covering_;
     SY_AccountedVector<uint8_t> rowCovers_;
-    SY_AccountedVector<int32_t> rowOnly_;
+    SY_AccountedVector<const SY_ShadowFragment*> rowFirst_;
+    SY_AccountedVector<const SY_ShadowFragment*> rowSecond_;
 };
 
 // What one face of a light needs to render its map.
@@ -373,8 +419,7 @@ std::unique_ptr<SY_PlanarShadowMap> RenderFace(SY_RenderContext* context, const 
     // The arrays that received nothing go; so do their rectangles.
     size_t kept = 0;
     for (int32_t k = 0; k < arrays.Count(); ++k) {
-        if (arrays[k]->fragmentCount.load(std::memory_order_relaxed) != 0)
-            occupied[kept++] = occupied[size_t(k)];
+        if (arrays[k]->FragmentCount() != 0) occupied[kept++] = occupied[size_t(k)];
     }
     occupied.resize(kept);
     arrays.Compact();

@@ -16,6 +16,6 @@ SY_ShadowFragmentArray* SY_ShadowFragmentArrayList::Append(const M_LRect& rect) 
 
 void SY_ShadowFragmentArrayList::Compact() {
     std::erase_if(arrays_, [](const std::unique_ptr<SY_ShadowFragmentArray>& array) {
-        return array->fragmentCount.load(std::memory_order_relaxed) == 0;
+        return array->FragmentCount() == 0;
     });
 }

@@ -2,7 +2,6 @@
 // which arrays that received nothing are dropped.
 #pragma once
 
-#include <atomic>
 #include <cstdint>
 #include <memory>
 
@@ -15,7 +14,8 @@
 class SY_ShadowFragmentArray : public SY_FragmentLists<SY_ShadowFragment>,
                                public U_MemTrackedObject {
 public:
-    explicit SY_ShadowFragmentArray(const M_LRect& rect) : SY_FragmentLists(rect) {}
+    explicit SY_ShadowFragmentArray(const M_LRect& rect)
+        : SY_FragmentLists(rect), tallies_(static_cast<size_t>(PoolCount())) {}
 
     // Adds an occluder of transmission `color` (red, green, blue) to the texel list at `head`,
     // which is kept descending in depth; equal depths keep the order they came in. Every
@@ -29,15 +29,29 @@ public:
         record->blue = color->blue;
         record->value16 = value16;
         record->value32 = value32;
-        fragmentCount.fetch_add(1, std::memory_order_relaxed);
+        ++tallies_[static_cast<size_t>(poolIndex)].records;
         SY_InsertInOrder(head, record,
                          [](const SY_ShadowFragment& existing, const SY_ShadowFragment& added) {
                              return !(existing.depth < added.depth);
                          });
     }
 
-    // Every record added so far; threads count without ordering, read it after they finish.
-    std::atomic<uint32_t> fragmentCount{0};
+    // Every record added so far; read it after the drawing threads finish.
+    uint32_t FragmentCount() const {
+        uint32_t count = 0;
+        for (const Tally& t : tallies_)
+            count += t.records;
+        return count;
+    }
+
+private:
+    // The records each pool's thread added, a cache line apart: one count shared by the
+    // threads, bumped atomically, cost more than writing the record.
+    struct Tally {
+        uint32_t records = 0;
+        char apart[60];
+    };
+    SY_AccountedVector<Tally> tallies_;
 };
 
 // The shadow arrays of a frame, in the order they were made.

@@ -94,6 +94,12 @@ void SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiver
             t[c] = L::FromLanes(lanes[c]);
         return;
     }
+    if (const SY_CubicShadowMap* cube = map.AsCubic()) {
+        cube->TransmissionLanes<L>(p, active, receiverId, soft, lanes);
+        for (int c = 0; c < 3; ++c)
+            t[c] = L::FromLanes(lanes[c]);
+        return;
+    }
     for (int i = 0; i < L::kCount; ++i) {
         float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
         if (L::LaneOn(active, i)) {

@@ -60,11 +60,14 @@ bool Occluder(const P& sample, const SY_ShadowShader& shader, PF_Pixel16* out) {
 template <class P>
 class OpaqueBoxes {
 public:
-    // area: a whole number of texels, at least 1.
-    const P& Average(float area) {
-        // Boxes along a span take a few areas by turns, as their edges round one way or the
-        // other: one slot per area modulo the slot count.
-        Slot& slot = slots_[static_cast<uint32_t>(area) % kSlots];
+    // Of a box wide × high texels, both at least 1.
+    const P& Average(int32_t wide, int32_t high) {
+        // Boxes along a span take a few sizes by turns, as their edges round one way or the
+        // other: one slot per width and height modulo kSides, so that neighbouring sizes never
+        // share one, whereas their areas modulo the slot count may.
+        const float area = float(wide) * float(high);
+        Slot& slot = slots_[static_cast<uint32_t>(wide % kSides) * kSides +
+                            static_cast<uint32_t>(high % kSides)];
         if (slot.area != area) {
             slot.area = area;
             pf_tables::StoreAverage(PF_Float4{area, 0.0f, 0.0f, 0.0f}, area, &slot.average);
@@ -79,12 +82,12 @@ public:
     void SetLastDeep(bool deep) { lastDeep_ = deep; }
 
 private:
-    static constexpr uint32_t kSlots = 16;
+    static constexpr int32_t kSides = 4;
     struct Slot {
         float area = 0.0f;  // no box has it
         P average{};
     };
-    Slot slots_[kSlots];
+    Slot slots_[kSides * kSides];
     bool lastDeep_ = false;
 };
 
@@ -193,7 +196,7 @@ void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& 
             constexpr double kDeep = OpaqueBoxes<P>::kDeep;
             opaque->SetLastDeep(cu >= kDeep && cu <= sums.Width() - kDeep && cv >= kDeep &&
                                 cv <= sums.Height() - kDeep);
-            *out = opaque->Average(float(x1 - x0) * float(y1 - y0));
+            *out = opaque->Average(x1 - x0, y1 - y0);
             return;
         }
         sums.Whole(x0, y0, x1, y1, out);

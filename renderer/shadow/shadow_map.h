@@ -13,6 +13,7 @@
 // Base of the planar and cubic maps; each light state owns at most one. Lookups run on many
 // render threads at once.
 class SY_PlanarShadowMap;
+class SY_CubicShadowMap;
 
 class SY_ShadowMap : public U_MemTrackedObject {
 public:
@@ -29,6 +30,8 @@ public:
 
     // This map as a planar one, or null.
     const SY_PlanarShadowMap* AsPlanar() const;
+    // This map as a cubic one, or null.
+    const SY_CubicShadowMap* AsCubic() const;
 
 protected:
     enum class Kind : uint8_t { kOther, kPlanar, kCubic };
@@ -292,13 +295,52 @@ public:
     void HardLookup(const double p[3], uint16_t receiverId, float out[4]) const override;
     void SoftLookup(const double p[3], uint16_t receiverId, float out[4]) const override;
     void Lookup(const double p[3], uint16_t receiverId, bool soft, float out[4]) const {
+        LookupProjected([&](int32_t f, double* x, double* y,
+                            double* d) { return faces_[f]->Project(p, x, y, d); },
+                        receiverId, soft, out);
+    }
+    // Lookup of the L::kCount points p of a lane pack, lane i into t[0..2][i]; the lanes off
+    // in active let all light through. A face projects the whole pack at once, the first time
+    // a lane asks for it: most points are answered by the first face alone.
+    template <class L>
+    void TransmissionLanes(const typename L::Real p[3], typename L::Mask active,
+                           uint16_t receiverId, bool soft, float t[3][L::kCount]) const {
+        typename L::Real x[kMaxFaces], y[kMaxFaces], d[kMaxFaces];
+        typename L::Mask in[kMaxFaces];
+        bool projected[kMaxFaces] = {};
+        for (int i = 0; i < L::kCount; ++i) {
+            float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
+            if (L::LaneOn(active, i)) {
+                LookupProjected(
+                    [&](int32_t f, double* xi, double* yi, double* di) {
+                        if (!projected[f]) {
+                            in[f] = faces_[f]->ProjectLanes<L>(p, &x[f], &y[f], &d[f]);
+                            projected[f] = true;
+                        }
+                        *xi = L::Lane(x[f], i);
+                        *yi = L::Lane(y[f], i);
+                        *di = L::Lane(d[f], i);
+                        return L::LaneOn(in[f], i);
+                    },
+                    receiverId, soft, out);
+            }
+            for (int c = 0; c < 3; ++c)
+                t[c][i] = out[1 + c];
+        }
+    }
+
+private:
+    // Lookup of the point that project(f, &x, &y, &d) projects onto face f, false where the
+    // face does not see it.
+    template <class Project>
+    void LookupProjected(Project project, uint16_t receiverId, bool soft, float out[4]) const {
         // The soft filter reaches two texels beyond the point, so its faces end two texels
         // sooner.
         double inset = soft ? 2.0 : 0.0;
         float sum[3] = {0, 0, 0}, weights = 0;
         for (int32_t f = 0; f < count_; ++f) {
             double x, y, d;
-            if (!faces_[f]->Project(p, &x, &y, &d)) continue;
+            if (!project(f, &x, &y, &d)) continue;
             if (faces_[f]->SeenByNoOtherFace(x, y)) {
                 faces_[f]->TransmissionAt(x, y, d, receiverId, soft, out + 1);
                 return;
@@ -319,13 +361,16 @@ public:
             out[1 + c] = sum[c] / weights;
     }
 
-private:
     std::unique_ptr<SY_PlanarShadowMap> faces_[kMaxFaces];
     int32_t count_ = 0;
 };
 
 inline const SY_PlanarShadowMap* SY_ShadowMap::AsPlanar() const {
     return kind_ == Kind::kPlanar ? static_cast<const SY_PlanarShadowMap*>(this) : nullptr;
+}
+
+inline const SY_CubicShadowMap* SY_ShadowMap::AsCubic() const {
+    return kind_ == Kind::kCubic ? static_cast<const SY_CubicShadowMap*>(this) : nullptr;
 }
 
 inline void SY_ShadowMap::Lookup(const double p[3], uint16_t receiverId, bool soft,

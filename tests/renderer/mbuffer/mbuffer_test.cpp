@@ -95,7 +95,7 @@ TEST(FragmentArray, ListsKeepDepthOrderAndTiesInArrivalOrder) {
         occluderOrder.push_back(r->red);
     EXPECT_EQ(objectOrder, (std::vector<int32_t>{2, 0, 1, 4, 3}));
     EXPECT_EQ(occluderOrder, (std::vector<int32_t>{3, 0, 1, 4, 2}));
-    EXPECT_EQ(occluders.fragmentCount.load(), 5u);
+    EXPECT_EQ(occluders.FragmentCount(), 5u);
 }
 
 // Lists short enough to be sorted on the stack and lists longer than that come out alike:
@@ -283,8 +283,9 @@ TEST(MBuffer, OutOfMemoryAnywhereReleasesEverything) {
         // The same, and the list of instants the motion-blur resolve composites at.
         {"motion-blur buffer", &FillAndResolveSplitting<SY_MBufferMBX<PF_Pixel16>, 0.0f>,
          1 + 1 + 3 + 1 + 3 + 9},
-        // Per array: object, pool array, three pools, head table; the list grows to 1, 2, 4.
-        {"shadow arrays", &AppendShadowArrays, 3 * 6 + 3},
+        // Per array: object, pool array, three pools, head table, the pools' record counts;
+        // the list grows to 1, 2, 4.
+        {"shadow arrays", &AppendShadowArrays, 3 * 7 + 3},
     };
     for (const auto& c : cases) {
         int32_t failures = renderer_test::FailEachAllocationInTurn([&](auto fail) {

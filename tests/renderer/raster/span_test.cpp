@@ -96,7 +96,7 @@ TYPED_TEST(Span, SpansDrawExactlyTheirPixels) {
         for (const SY_RenderTarget& target : targets) {
             if (target.mode() == c.mode) this->Draw(c.image, target, c.x, c.count, c.y);
         }
-        EXPECT_EQ(occluders.fragmentCount.load(), 0u);
+        EXPECT_EQ(occluders.FragmentCount(), 0u);
         const bool stored = c.mode == kSY_TargetDepthOfField;
         for (int32_t j = 0; j < destination.height; ++j) {
             for (int32_t i = 0; i < destination.width; ++i) {
