@@ -74,12 +74,6 @@ public:
         }
         return slot.average;
     }
-    // Whether the last box sampled lay inside the texture with its centre at least kDeep
-    // texels from every edge, so that the filter of every level there, down to a bicubic one
-    // at the texel's own footprint, reads texels of full alpha only.
-    static constexpr double kDeep = 3.0;
-    bool LastDeep() const { return lastDeep_; }
-    void SetLastDeep(bool deep) { lastDeep_ = deep; }
 
 private:
     static constexpr int32_t kSides = 4;
@@ -88,7 +82,6 @@ private:
         P average{};
     };
     Slot slots_[kSides * kSides];
-    bool lastDeep_ = false;
 };
 
 // Box averages from the texture's summed-area table, of cells S.
@@ -165,49 +158,96 @@ private:
     const SY_FullAlphaSums<S>& sums_;
 };
 
+// Where the box `scale` times the footprint of the mapping's pixel lies in the texture, in
+// texels: its centre from the texels' corners, its half-sizes, and the footprint's own centre.
+struct BoxPlace {
+    double u, v;    // texel centres on whole numbers where filtered
+    double cu, cv;  // from the texels' corners
+    double ru, rv;
+    bool filtered;
+
+    // Whole-texel boxes for draft layers, and wherever the box is wide enough that its
+    // fractional edges (under a quarter of its width) do not show.
+    bool WholeTexels() const {
+        constexpr double kWholeTexelsFrom = 2.0;
+        return !filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom);
+    }
+    // The whole texels [x0, x1) × [y0, y1) the box covers.
+    void Whole(int32_t* x0, int32_t* y0, int32_t* x1, int32_t* y1) const {
+        *x0 = static_cast<int32_t>(std::floor(cu - ru));
+        *y0 = static_cast<int32_t>(std::floor(cv - rv));
+        *x1 = static_cast<int32_t>(std::ceil(cu + ru));
+        *y1 = static_cast<int32_t>(std::ceil(cv + rv));
+    }
+};
+
+// False for a pixel behind the eye, which samples nothing.
+[[gnu::always_inline]] inline bool PlaceBox(const SY_SpanTexture& texture, const SY_SpanMapping& m,
+                                            float scale, BoxPlace* b) {
+    using sy_sampling::kFarTexels;
+    if (!sy_sampling::InFront(m, texture.perspective)) return false;
+    sy_sampling::Footprint f = sy_sampling::FootprintOf(m, texture.perspective);
+    b->ru = std::min(scale * f.ru, kFarTexels);
+    b->rv = std::min(scale * f.rv, kFarTexels);
+    b->u = std::clamp(f.u, -kFarTexels, kFarTexels);
+    b->v = std::clamp(f.v, -kFarTexels, kFarTexels);
+    // Filtered mappings put texel centres on whole numbers; the table counts from corners.
+    b->filtered = texture.samplingFilter != SY_SamplingFilter::kNearest;
+    b->cu = b->filtered ? b->u + 0.5 : b->u;
+    b->cv = b->filtered ? b->v + 0.5 : b->v;
+    return true;
+}
+
+// Whether the whole texels [x0, x1) × [y0, y1) are some, all of them in a texture of
+// width × height.
+bool WithinTexture(int32_t x0, int32_t y0, int32_t x1, int32_t y1, int32_t width, int32_t height) {
+    return x0 >= 0 && y0 >= 0 && x1 <= width && y1 <= height && x1 > x0 && y1 > y0;
+}
+
+// Whether the box of a texture whose texels all have full alpha lies inside it with its centre
+// at least kDeep texels from every edge, so that the filter of every level there, down to a
+// bicubic one at the texel's own footprint, reads texels of full alpha only. The average over
+// it is not needed then: a layer that passes no colour lets the same grey through at every
+// level.
+template <class Sums>
+[[gnu::always_inline]] inline bool DeepInOpaque(const Sums& sums, const SY_SpanTexture& texture,
+                                                const SY_SpanMapping& m, float scale) {
+    constexpr double kDeep = 3.0;
+    BoxPlace b;
+    if (!PlaceBox(texture, m, scale, &b) || !b.WholeTexels()) return false;
+    int32_t x0, y0, x1, y1;
+    b.Whole(&x0, &y0, &x1, &y1);
+    const int32_t width = sums.Width(), height = sums.Height();
+    return WithinTexture(x0, y0, x1, y1, width, height) && b.cu >= kDeep && b.cu <= width - kDeep &&
+           b.cv >= kDeep && b.cv <= height - kDeep;
+}
+
 // Average of the texture over a box `scale` times the footprint of the mapping's pixel, from
 // sums (TableSums or FullAlphaSums), or from opaque where there is one.
 template <class P, class Sums>
 void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& m, float scale,
                OpaqueBoxes<P>* opaque, P* out) {
-    using sy_sampling::kFarTexels;
-    if (opaque) opaque->SetLastDeep(false);
-    if (!sy_sampling::InFront(m, texture.perspective)) {
+    BoxPlace b;
+    if (!PlaceBox(texture, m, scale, &b)) {
         *out = P{};
         return;
     }
-    sy_sampling::Footprint f = sy_sampling::FootprintOf(m, texture.perspective);
-    double ru = std::min(scale * f.ru, kFarTexels), rv = std::min(scale * f.rv, kFarTexels);
-    double u = std::clamp(f.u, -kFarTexels, kFarTexels),
-           v = std::clamp(f.v, -kFarTexels, kFarTexels);
-    // Filtered mappings put texel centres on whole numbers; the table counts from corners.
-    bool filtered = texture.samplingFilter != SY_SamplingFilter::kNearest;
-    double cu = filtered ? u + 0.5 : u, cv = filtered ? v + 0.5 : v;
-    // Whole-texel boxes for draft layers, and wherever the box is wide enough that its
-    // fractional edges (under a quarter of its width) do not show.
-    constexpr double kWholeTexelsFrom = 2.0;
-    if (!filtered || (ru >= kWholeTexelsFrom && rv >= kWholeTexelsFrom)) {
-        const auto x0 = static_cast<int32_t>(std::floor(cu - ru)),
-                   y0 = static_cast<int32_t>(std::floor(cv - rv)),
-                   x1 = static_cast<int32_t>(std::ceil(cu + ru)),
-                   y1 = static_cast<int32_t>(std::ceil(cv + rv));
-        if (opaque && x0 >= 0 && y0 >= 0 && x1 <= sums.Width() && y1 <= sums.Height() && x1 > x0 &&
-            y1 > y0) {
-            constexpr double kDeep = OpaqueBoxes<P>::kDeep;
-            opaque->SetLastDeep(cu >= kDeep && cu <= sums.Width() - kDeep && cv >= kDeep &&
-                                cv <= sums.Height() - kDeep);
+    if (b.WholeTexels()) {
+        int32_t x0, y0, x1, y1;
+        b.Whole(&x0, &y0, &x1, &y1);
+        if (opaque && WithinTexture(x0, y0, x1, y1, sums.Width(), sums.Height())) {
             *out = opaque->Average(x1 - x0, y1 - y0);
             return;
         }
         sums.Whole(x0, y0, x1, y1, out);
         return;
     }
-    if (ru > 0.5 && rv > 0.5) {
-        sums.Fractional(static_cast<float>(cu - ru), static_cast<float>(cv - rv),
-                        static_cast<float>(cu + ru), static_cast<float>(cv + rv), out);
+    if (b.ru > 0.5 && b.rv > 0.5) {
+        sums.Fractional(static_cast<float>(b.cu - b.ru), static_cast<float>(b.cv - b.rv),
+                        static_cast<float>(b.cu + b.ru), static_cast<float>(b.cv + b.rv), out);
         return;
     }
-    sy_sampling::Filter(texture, u, v, ru, rv, out);
+    sy_sampling::Filter(texture, b.u, b.v, b.ru, b.rv, out);
 }
 
 template <class P>
@@ -228,6 +268,18 @@ void SampleBlurred(const Sums& sums, SY_SpanSampleState<P>& state, float scale,
     SampleBox(sums, state.texture, state.mapping, scale, opaque, out);
 }
 
+template <class P, class Sums>
+[[gnu::always_inline]] inline bool DeepBlurred(const Sums& sums, const SY_SpanSampleState<P>& state,
+                                               float scale) {
+    return DeepInOpaque(sums, state.texture, state.mapping, scale);
+}
+
+// Not every subsample's box need lie deep inside.
+template <class P, class Sums>
+bool DeepBlurred(const Sums&, const SY_SpanSubsampleState<P>&, float) {
+    return false;
+}
+
 // The box average over the present subsamples, alpha falling with the absent ones.
 template <class P, class Sums>
 void SampleBlurred(const Sums& sums, SY_SpanSubsampleState<P>& state, float scale,
@@ -240,8 +292,6 @@ void SampleBlurred(const Sums& sums, SY_SpanSubsampleState<P>& state, float scal
         sum.Add(texel);
     }
     sum.Resolve(state.count, out);
-    // Not every subsample's box need lie deep inside.
-    if (opaque) opaque->SetLastDeep(false);
 }
 
 // The two occluders let the same light through.
@@ -250,11 +300,10 @@ bool SameLight(const PF_Pixel16& a, const PF_Pixel16& b) {
 }
 
 // Steps the state across the span; sample(level, out) gives the layer's colour at a level, and
-// deepOpaque() tells whether the last sample of the widest level lay deep inside an opaque
-// texture (see OpaqueBoxes). A
-// level that lets through what both its neighbours let through adds nothing that blending
-// between them would not give, so only the levels where the light changes are kept: inside
-// an opaque layer one occluder stands for all of them.
+// deepOpaque() tells whether the widest level's box at the state's position lies deep inside
+// an opaque texture (see DeepInOpaque). A level that lets through what both its neighbours let
+// through adds nothing that blending between them would not give, so only the levels where the
+// light changes are kept: inside an opaque layer one occluder stands for all of them.
 template <class P, class State, class Sample, class DeepOpaque>
 void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t count, int32_t y,
               SY_ShadowFragmentArray* array, int32_t thread, Sample sample, DeepOpaque deepOpaque) {
@@ -269,18 +318,26 @@ void DrawSpan(const SY_ShadowShader& shader, State& state, int32_t x, int32_t co
     P opaque{};
     opaque.alpha = kOpaque;
     Occluder(opaque, shader, &opaqueGrey);
+    // Where the widest box is wholly opaque, so is every box inside it, and a layer that
+    // passes no colour then lets the same grey through at every level. A float average of full
+    // alpha may round just below 1; deep inside an opaque texture every level's still rounds to
+    // the same 16-bit grey, so there the average is not taken at all.
+    const bool greyWhereOpaque = levels > 1 && shader.transmission == 0;
     auto drawTexel = [&](int32_t i) {
         const SY_SpanMapping* depth = FirstPresent(state);
         if (!depth) return;
-        // Where the widest box is wholly opaque, so is every box inside it, and a layer that
-        // passes no colour then lets the same grey through at every level. A float average of
-        // full alpha may round just below 1; deep inside an opaque texture every level's still
-        // rounds to the same 16-bit grey.
-        P widest;
-        sample(levels - 1, &widest);
-        if (levels > 1 && shader.transmission == 0 && (widest.alpha == kOpaque || deepOpaque())) {
+        auto addGrey = [&] {
             array->AddShadowFragment(&opaqueGrey, shader.DepthKey(depth->w, 0), 0.0f,
                                      shader.layerId, heads + i, thread);
+        };
+        if (greyWhereOpaque && deepOpaque()) {
+            addGrey();
+            return;
+        }
+        P widest;
+        sample(levels - 1, &widest);
+        if (greyWhereOpaque && widest.alpha == kOpaque) {
+            addGrey();
             return;
         }
         present[levels - 1] = Occluder(widest, shader, &occluders[levels - 1]);
@@ -338,15 +395,13 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
     // A layer that passes no colour shadows by its alpha alone.
     OpaqueBoxes<P> boxes;
     OpaqueBoxes<P>* opaque = shader.transmission == 0 && casterSums.opaque ? &boxes : nullptr;
+    // The box reaches the level's radius, and at least the texel's own footprint.
+    auto scale = [&](int32_t level) { return 2.0f * std::max(0.5f, shader.radius[level]); };
     auto draw = [&](const auto& sums) {
         DrawSpan<P>(
             shader, state, x, count, y, array, thread,
-            [&](int32_t level, P* out) {
-                // The box reaches the level's radius, and at least the texel's own footprint.
-                float scale = 2.0f * std::max(0.5f, shader.radius[level]);
-                SampleBlurred(sums, state, scale, opaque, out);
-            },
-            [&] { return opaque && opaque->LastDeep(); });
+            [&](int32_t level, P* out) { SampleBlurred(sums, state, scale(level), opaque, out); },
+            [&] { return opaque && DeepBlurred(sums, state, scale(shader.levelCount - 1)); });
     };
     if (const PF_SummedAreaTable* table = casterSums.table) {
         if (table->HasDoubleSums())
