@@ -179,6 +179,16 @@ struct BoxPlace {
         *x1 = static_cast<int32_t>(std::ceil(cu + ru));
         *y1 = static_cast<int32_t>(std::ceil(cv + rv));
     }
+    // Whether Whole()'s texels are some, all of them in a texture of width × height, without
+    // rounding the edges: floor(a) ≥ 0 just where a ≥ 0, ceil(b) ≤ width just where b ≤
+    // width, and ceil(b) > floor(a) where b > a, or where they are one number but not a whole
+    // one.
+    bool WholeWithin(int32_t width, int32_t height) const {
+        const double left = cu - ru, right = cu + ru, top = cv - rv, bottom = cv + rv;
+        return left >= 0 && top >= 0 && right <= width && bottom <= height &&
+               (right > left || left != std::floor(left)) &&
+               (bottom > top || top != std::floor(top));
+    }
 };
 
 // False for a pixel behind the eye, which samples nothing.
@@ -215,10 +225,8 @@ template <class Sums>
     constexpr double kDeep = 3.0;
     BoxPlace b;
     if (!PlaceBox(texture, m, scale, &b) || !b.WholeTexels()) return false;
-    int32_t x0, y0, x1, y1;
-    b.Whole(&x0, &y0, &x1, &y1);
     const int32_t width = sums.Width(), height = sums.Height();
-    return WithinTexture(x0, y0, x1, y1, width, height) && b.cu >= kDeep && b.cu <= width - kDeep &&
+    return b.WholeWithin(width, height) && b.cu >= kDeep && b.cu <= width - kDeep &&
            b.cv >= kDeep && b.cv <= height - kDeep;
 }
 
