@@ -219,13 +219,12 @@ bool WithinTexture(int32_t x0, int32_t y0, int32_t x1, int32_t y1, int32_t width
 // bicubic one at the texel's own footprint, reads texels of full alpha only. The average over
 // it is not needed then: a layer that passes no colour lets the same grey through at every
 // level.
-template <class Sums>
-[[gnu::always_inline]] inline bool DeepInOpaque(const Sums& sums, const SY_SpanTexture& texture,
+[[gnu::always_inline]] inline bool DeepInOpaque(int32_t width, int32_t height,
+                                                const SY_SpanTexture& texture,
                                                 const SY_SpanMapping& m, float scale) {
     constexpr double kDeep = 3.0;
     BoxPlace b;
     if (!PlaceBox(texture, m, scale, &b) || !b.WholeTexels()) return false;
-    const int32_t width = sums.Width(), height = sums.Height();
     return b.WholeWithin(width, height) && b.cu >= kDeep && b.cu <= width - kDeep &&
            b.cv >= kDeep && b.cv <= height - kDeep;
 }
@@ -276,15 +275,15 @@ void SampleBlurred(const Sums& sums, SY_SpanSampleState<P>& state, float scale,
     SampleBox(sums, state.texture, state.mapping, scale, opaque, out);
 }
 
-template <class P, class Sums>
-[[gnu::always_inline]] inline bool DeepBlurred(const Sums& sums, const SY_SpanSampleState<P>& state,
-                                               float scale) {
-    return DeepInOpaque(sums, state.texture, state.mapping, scale);
+template <class P>
+[[gnu::always_inline]] inline bool DeepBlurred(int32_t width, int32_t height,
+                                               const SY_SpanSampleState<P>& state, float scale) {
+    return DeepInOpaque(width, height, state.texture, state.mapping, scale);
 }
 
 // Not every subsample's box need lie deep inside.
-template <class P, class Sums>
-bool DeepBlurred(const Sums&, const SY_SpanSubsampleState<P>&, float) {
+template <class P>
+bool DeepBlurred(int32_t, int32_t, const SY_SpanSubsampleState<P>&, float) {
     return false;
 }
 
@@ -406,10 +405,15 @@ void DrawWithState(const SY_ScreenGeometry& geometry, const SY_ShadowShader& sha
     // The box reaches the level's radius, and at least the texel's own footprint.
     auto scale = [&](int32_t level) { return 2.0f * std::max(0.5f, shader.radius[level]); };
     auto draw = [&](const auto& sums) {
+        // Copies, as the records written between the tests might alias them.
+        const float widest = scale(shader.levelCount - 1);
+        const int32_t width = sums.Width(), height = sums.Height();
         DrawSpan<P>(
             shader, state, x, count, y, array, thread,
             [&](int32_t level, P* out) { SampleBlurred(sums, state, scale(level), opaque, out); },
-            [&] { return opaque && DeepBlurred(sums, state, scale(shader.levelCount - 1)); });
+            [&state, opaque, widest, width, height] {
+                return opaque && DeepBlurred(width, height, state, widest);
+            });
     };
     if (const PF_SummedAreaTable* table = casterSums.table) {
         if (table->HasDoubleSums())
