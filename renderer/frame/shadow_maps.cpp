@@ -154,20 +154,26 @@ private:
     // in array order: most texels lie under one caster or none, and most of the rest under
     // two.
     void CountCovers(int32_t y) {
-        std::fill(rowCovers_.begin(), rowCovers_.end(), uint8_t{0});
+        // Locals, as the counts are bytes, whose stores the compiler takes to alias every
+        // member.
+        uint8_t* const covers = rowCovers_.data();
+        const SY_ShadowFragment** const first = rowFirst_.data();
+        const SY_ShadowFragment** const second = rowSecond_.data();
+        std::fill_n(covers, rowCovers_.size(), uint8_t{0});
         for (int32_t k : rowArrays_) {
             const M_LRect& b = occupied_[size_t(k)];
-            SY_ShadowFragment* const* heads = arrays_[k]->HeadAt(b.left, y);
-            for (int32_t x = b.left; x < b.right; ++x) {
-                const SY_ShadowFragment* head = heads[x - b.left];
+            SY_ShadowFragment* const* const heads = arrays_[k]->HeadAt(b.left, y);
+            const size_t offset = size_t(b.left - texels_.left), count = size_t(b.right - b.left);
+            for (size_t i = 0; i < count; ++i) {
+                const SY_ShadowFragment* head = heads[i];
                 if (!head) continue;
-                const size_t column = size_t(x - texels_.left);
-                const uint8_t covers = rowCovers_[column];
-                if (covers == 0)
-                    rowFirst_[column] = head;
-                else if (covers == 1)
-                    rowSecond_[column] = head;
-                rowCovers_[column] = static_cast<uint8_t>(std::min(3, covers + 1));
+                const size_t column = offset + i;
+                const uint8_t c = covers[column];
+                if (c == 0)
+                    first[column] = head;
+                else if (c == 1)
+                    second[column] = head;
+                covers[column] = static_cast<uint8_t>(std::min(3, c + 1));
             }
         }
     }
