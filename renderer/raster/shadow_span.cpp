@@ -250,8 +250,15 @@ void SampleBox(const Sums& sums, SY_SpanTexture& texture, const SY_SpanMapping& 
         return;
     }
     if (b.ru > 0.5 && b.rv > 0.5) {
-        sums.Fractional(static_cast<float>(b.cu - b.ru), static_cast<float>(b.cv - b.rv),
-                        static_cast<float>(b.cu + b.ru), static_cast<float>(b.cv + b.rv), out);
+        const auto x0 = static_cast<float>(b.cu - b.ru), y0 = static_cast<float>(b.cv - b.rv),
+                   x1 = static_cast<float>(b.cu + b.ru), y1 = static_cast<float>(b.cv + b.rv);
+        // A box wholly outside the texture sums to nothing, clear, as the sums would give it:
+        // blurred casters draw a margin around them where the narrow levels fall outside.
+        if (x1 <= 0 || y1 <= 0 || x0 >= sums.Width() || y0 >= sums.Height()) {
+            *out = P{};
+            return;
+        }
+        sums.Fractional(x0, y0, x1, y1, out);
         return;
     }
     sy_sampling::Filter(texture, b.u, b.v, b.ru, b.rv, out);
