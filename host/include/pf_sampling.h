@@ -219,6 +219,36 @@ template <class P>
 // sums stay below 2^31.
 inline constexpr int32_t kSmallBoxRadius = 179 << 15;
 
+// Boxes about the lanes' positions with the lanes' radii (16.16 texels), over textures of the
+// lanes' sizes: the radii as clamped, the low and high edges, and the lanes that the general case
+// must take: boxes reaching beyond the texture, and, where kSmallOnly, boxes too wide for 8-bit
+// sums in 31 bits.
+struct BoxLanes {
+    __m128i radii, lo, hi, outside;
+};
+
+template <bool kSmallOnly>
+[[gnu::always_inline]] inline BoxLanes MakeBoxLanes(__m128i xy, __m128i radii, __m128i sizes) {
+    BoxLanes b;
+    b.radii =
+        _mm_min_epi32(_mm_max_epi32(radii, _mm_set1_epi32(32768)), _mm_set1_epi32(kMaxAreaRadius));
+    // Edge coordinates in 32 bits. Where one wraps, the box's low end comes out above its high
+    // end, which sends it to the general case with the rest that reach beyond the texture;
+    // sizes from 32768 texels on cannot be exceeded in 32 bits.
+    const __m128i limits = _mm_blendv_epi8(_mm_slli_epi32(sizes, 16), _mm_set1_epi32(INT32_MAX),
+                                           _mm_cmpgt_epi32(sizes, _mm_set1_epi32(32767)));
+    const __m128i c = _mm_add_epi32(xy, _mm_set1_epi32(32768));
+    b.lo = _mm_sub_epi32(c, b.radii);
+    b.hi = _mm_add_epi32(c, b.radii);
+    b.outside = _mm_or_si128(
+        _mm_or_si128(_mm_cmpgt_epi32(_mm_setzero_si128(), b.lo), _mm_cmpgt_epi32(b.hi, limits)),
+        _mm_cmpgt_epi32(b.lo, b.hi));
+    if constexpr (kSmallOnly)
+        b.outside =
+            _mm_or_si128(b.outside, _mm_cmpgt_epi32(b.radii, _mm_set1_epi32(kSmallBoxRadius)));
+    return b;
+}
+
 // The box average of PF_AreaSample with the position and the radii as lanes (x, y) of 16.16
 // texels. Boxes inside the texture, the usual case, take both axes at once in the lanes; the
 // edges, weights and sums are those of the general case, term by term.
@@ -228,21 +258,9 @@ template <class P>
     using Traits = PF_PixelTraits<P>;
     const PF_World& w = *pb.src;
     const PF_AreaTable& table = PF_AreaTableOf<P>(w);
-    const __m128i r =
-        _mm_min_epi32(_mm_max_epi32(radii, _mm_set1_epi32(32768)), _mm_set1_epi32(kMaxAreaRadius));
-    // Edge coordinates in 32 bits. Where one wraps, the box's low end comes out above its high
-    // end, which sends it to the general case with the rest that reach beyond the texture;
-    // sizes from 32768 texels on cannot be exceeded in 32 bits.
     const __m128i sizes = _mm_setr_epi32(w.width, w.height, 0, 0);
-    const __m128i limits = _mm_blendv_epi8(_mm_slli_epi32(sizes, 16), _mm_set1_epi32(INT32_MAX),
-                                           _mm_cmpgt_epi32(sizes, _mm_set1_epi32(32767)));
-    const __m128i c = _mm_add_epi32(xy, _mm_set1_epi32(32768));
-    const __m128i lo = _mm_sub_epi32(c, r), hi = _mm_add_epi32(c, r);
-    __m128i outside = _mm_or_si128(
-        _mm_or_si128(_mm_cmpgt_epi32(_mm_setzero_si128(), lo), _mm_cmpgt_epi32(hi, limits)),
-        _mm_cmpgt_epi32(lo, hi));
-    if constexpr (!Traits::kIsFloat && Traits::kBitDepth == 8)
-        outside = _mm_or_si128(outside, _mm_cmpgt_epi32(r, _mm_set1_epi32(kSmallBoxRadius)));
+    const auto [r, lo, hi, outside] =
+        MakeBoxLanes < !Traits::kIsFloat && Traits::kBitDepth == 8 > (xy, radii, sizes);
     const PF_Float4 rf = _mm_cvtepi32_ps(r);
     const float area = 4.0f * rf[0] * rf[1] * (kFixedToTexels * kFixedToTexels);
     if (__builtin_expect((_mm_movemask_epi8(outside) & 0xFF) != 0, 0)) {

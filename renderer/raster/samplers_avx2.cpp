@@ -166,19 +166,8 @@ bool AreaPairOf(const SY_SpanTexture& texture, const SY_SpanMapping& m, double u
         _mm256_mul_pd(_mm256_min_pd(_mm256_set1_pd(kMaxRadius), radius), _mm256_set1_pd(65536.0)));
 
     // The boxes, as pf_sampling::AreaSampleLanes works them out, for both pixels.
-    const __m128i r = _mm_min_epi32(_mm_max_epi32(radii, _mm_set1_epi32(32768)),
-                                    _mm_set1_epi32(pf_sampling::kMaxAreaRadius));
     const __m128i sizes = _mm_setr_epi32(world.width, world.height, world.width, world.height);
-    const __m128i limits = _mm_blendv_epi8(_mm_slli_epi32(sizes, 16), _mm_set1_epi32(INT32_MAX),
-                                           _mm_cmpgt_epi32(sizes, _mm_set1_epi32(32767)));
-    const __m128i c = _mm_add_epi32(xy, _mm_set1_epi32(32768));
-    const __m128i lo = _mm_sub_epi32(c, r), hi = _mm_add_epi32(c, r);
-    __m128i outside = _mm_or_si128(
-        _mm_or_si128(_mm_cmpgt_epi32(_mm_setzero_si128(), lo), _mm_cmpgt_epi32(hi, limits)),
-        _mm_cmpgt_epi32(lo, hi));
-    if constexpr (kEightBit)
-        outside =
-            _mm_or_si128(outside, _mm_cmpgt_epi32(r, _mm_set1_epi32(pf_sampling::kSmallBoxRadius)));
+    const auto [r, lo, hi, outside] = pf_sampling::MakeBoxLanes<kEightBit>(xy, radii, sizes);
     if (!_mm_testz_si128(outside, outside)) return false;
 
     // Shares, lanes (x, y, x, y) of each pixel: 1 − frac(lo), then frac(hi).
