@@ -179,9 +179,9 @@ struct BoxPlace {
         *x1 = static_cast<int32_t>(std::ceil(cu + ru));
         *y1 = static_cast<int32_t>(std::ceil(cv + rv));
     }
-    // Whether Whole()'s texels are some, all of them in a texture of width × height, without
-    // rounding the edges: floor(a) ≥ 0 just where a ≥ 0, ceil(b) ≤ width just where b ≤
-    // width, and ceil(b) > floor(a) where b > a, or where they are one number but not a whole
+    // Whether Whole()'s texels are at least one and all lie in a texture of width × height,
+    // found without rounding the edges: floor(a) ≥ 0 just where a ≥ 0, ceil(b) ≤ width just where b
+    // ≤ width, and ceil(b) > floor(a) where b > a, or where they are one number but not a whole
     // one.
     bool WholeWithin(int32_t width, int32_t height) const {
         const double left = cu - ru, right = cu + ru, top = cv - rv, bottom = cv + rv;
@@ -208,7 +208,7 @@ struct BoxPlace {
     return true;
 }
 
-// Whether the whole texels [x0, x1) × [y0, y1) are some, all of them in a texture of
+// Whether the whole texels [x0, x1) × [y0, y1) are at least one and all lie in a texture of
 // width × height.
 bool WithinTexture(int32_t x0, int32_t y0, int32_t x1, int32_t y1, int32_t width, int32_t height) {
     return x0 >= 0 && y0 >= 0 && x1 <= width && y1 <= height && x1 > x0 && y1 > y0;
