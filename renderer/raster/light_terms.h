@@ -70,35 +70,67 @@ typename L::Single SY_Falloff(const SY_LightState& light, typename L::Real dista
         L::SelectSingle(L::Less(L::Splat(light.outerSquared), d2), zero, SY_Smoothstep<L>(u)));
 }
 
+// The pack t of the transmissions lanes[c][i]; true where every lane gets all of the light.
+// Such a pack is made whole rather than read back from lanes just written one by one.
+template <class L>
+bool SY_ShadowLanesToPack(const float lanes[3][L::kCount], typename L::Single t[3]) {
+    bool allLit = true;
+    for (int c = 0; c < 3; ++c) {
+        for (int i = 0; i < L::kCount; ++i)
+            allLit &= lanes[c][i] == 1.0f;
+    }
+    for (int c = 0; c < 3; ++c)
+        t[c] = allLit ? L::SplatSingle(1.0f) : L::FromLanes(lanes[c]);
+    return allLit;
+}
+
 // The shadow step. The red, green and blue transmission t of the light's shadow map at the
 // surface points of the active lanes (full transmission on the others). A light without a map
-// is never looked up: all of its light passes.
+// is never looked up: all of its light passes. True where every lane gets all of the light, so
+// the caller may leave the light as it is.
 template <class L>
-void SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiverId,
+bool SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiverId,
                            const typename L::Real p[3], typename L::Mask active,
                            typename L::Single t[3]) {
     float lanes[3][L::kCount];
-    // A planar map projects the whole pack at once.
+    // A planar map projects the whole pack at once, and its tiles settle most packs whole.
     if (const SY_PlanarShadowMap* planar = map.AsPlanar()) {
+        using Settled = SY_PlanarShadowMap::Settled;
         typename L::Real x, y, d;
         const typename L::Mask inMap = planar->ProjectLanes<L>(p, &x, &y, &d);
+        Settled settled[L::kCount];
+        bool allLit = true, allDark = true;
+        for (int i = 0; i < L::kCount; ++i) {
+            settled[i] = Settled::kLit;
+            if (L::LaneOn(active, i) && L::LaneOn(inMap, i)) {
+                const SY_PlanarShadowMap::Tile* tile =
+                    planar->TileAt(L::Lane(x, i), L::Lane(y, i), soft);
+                settled[i] = tile ? SY_PlanarShadowMap::SettledBy(*tile, L::Lane(d, i), receiverId)
+                                  : Settled::kNo;
+            }
+            allLit &= settled[i] == Settled::kLit;
+            allDark &= settled[i] == Settled::kDark;
+        }
+        if (allLit || allDark) {
+            for (int c = 0; c < 3; ++c)
+                t[c] = L::SplatSingle(allLit ? 1.0f : 0.0f);
+            return allLit;
+        }
         for (int i = 0; i < L::kCount; ++i) {
             float out[3] = {1.0f, 1.0f, 1.0f};
-            if (L::LaneOn(active, i) && L::LaneOn(inMap, i))
-                planar->TransmissionAt(L::Lane(x, i), L::Lane(y, i), L::Lane(d, i), receiverId,
-                                       soft, out);
+            if (settled[i] == Settled::kDark)
+                out[0] = out[1] = out[2] = 0.0f;
+            else if (settled[i] == Settled::kNo)
+                planar->WalkTexels(L::Lane(x, i), L::Lane(y, i), L::Lane(d, i), receiverId, soft,
+                                   out);
             for (int c = 0; c < 3; ++c)
                 lanes[c][i] = out[c];
         }
-        for (int c = 0; c < 3; ++c)
-            t[c] = L::FromLanes(lanes[c]);
-        return;
+        return SY_ShadowLanesToPack<L>(lanes, t);
     }
     if (const SY_CubicShadowMap* cube = map.AsCubic()) {
         cube->TransmissionLanes<L>(p, active, receiverId, soft, lanes);
-        for (int c = 0; c < 3; ++c)
-            t[c] = L::FromLanes(lanes[c]);
-        return;
+        return SY_ShadowLanesToPack<L>(lanes, t);
     }
     for (int i = 0; i < L::kCount; ++i) {
         float out[4] = {1.0f, 1.0f, 1.0f, 1.0f};
@@ -109,8 +141,7 @@ void SY_ShadowTransmission(const SY_ShadowMap& map, bool soft, uint16_t receiver
         for (int c = 0; c < 3; ++c)
             lanes[c][i] = out[1 + c];
     }
-    for (int c = 0; c < 3; ++c)
-        t[c] = L::FromLanes(lanes[c]);
+    return SY_ShadowLanesToPack<L>(lanes, t);
 }
 
 // The share of a light that a shadow lets through at darkness w: the transmission itself where

@@ -123,15 +123,17 @@ struct PixelLighting {
             e[c] = L::SplatSingle(static_cast<float>(light.color[1 + c]));
         if (shader.material.acceptsShadows != 0 && light.shadowMap) {
             Single t[3], a[3];
-            SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId,
-                                     p, active, t);
-            SY_ShadowAttenuation<L>(t, L::SplatSingle(static_cast<float>(light.shadowDarkness)),
-                                    L::Uniform(light.shadowDarkness == 1.0), a);
-            Single most = L::Max(L::Max(a[0], a[1]), a[2]);
-            active = L::AndNot(L::LessEqualSingle(most, L::SplatSingle(0.0f)), active);
-            if (L::None(active)) return;
-            for (int c = 0; c < 3; ++c)
-                e[c] = e[c] * a[c];
+            // Where all of the light passes, the attenuation is 1 and changes nothing.
+            if (!SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0,
+                                          shader.layerId, p, active, t)) {
+                SY_ShadowAttenuation<L>(t, L::SplatSingle(static_cast<float>(light.shadowDarkness)),
+                                        L::Uniform(light.shadowDarkness == 1.0), a);
+                Single most = L::Max(L::Max(a[0], a[1]), a[2]);
+                active = L::AndNot(L::LessEqualSingle(most, L::SplatSingle(0.0f)), active);
+                if (L::None(active)) return;
+                for (int c = 0; c < 3; ++c)
+                    e[c] = e[c] * a[c];
+            }
         }
 
         if (shader.material.diffuse != 0.0) {
@@ -216,8 +218,10 @@ struct PixelLighting {
         active = L::AndNot(L::LessEqualSingle(w, L::SplatSingle(0.0f)), active);
         if (L::None(active)) return;
         Single t[3], a[3];
-        SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId, p,
-                                 active, t);
+        // Where all of the light passes, nothing darkens.
+        if (SY_ShadowTransmission<L>(*light.shadowMap, shader.softShadowLookup != 0, shader.layerId,
+                                     p, active, t))
+            return;
         SY_ShadowAttenuation<L>(t, w, L::EqualSingle(w, L::SplatSingle(1.0f)), a);
         for (int c = 0; c < 3; ++c)
             diffuse[c] = L::SelectSingle(active, diffuse[c] * a[c], diffuse[c]);

@@ -179,19 +179,24 @@ public:
         *y = row(1);
         return L::AndNot(L::Less(L::Splat(-kNearestDepth), *d), L::All());
     }
+    // What every texel a lookup in a tile reads, two texels around the tile included, gives
+    // a receiver: all of the light or none of it, found with one read instead of a walk over
+    // up to sixteen texel lists. Neither answer holds where shadow edges run.
+    struct Tile {
+        float litDepth;       // a point at least this near the light is lit in every texel
+        float frontLitDepth;  // so is a point of layer frontId at least this near
+        float umbraDepth;     // a point farther than this gets no light in any texel,
+        uint16_t umbraIds;    // unless it is of a layer whose bit (id mod 16) is set
+        uint16_t frontId;     // a layer that sees past its own occluders; 0xFFFF for none
+    };
+    static_assert(sizeof(Tile) == 16, "four tiles to a cache line");
+    enum class Settled : uint8_t { kNo, kLit, kDark };
+
     // Transmission at map position (x, y) and depth d, from one texel or filtered.
     void TransmissionAt(double x, double y, double d, uint16_t receiverId, bool soft,
                         float t[3]) const {
-        // A soft lookup weighs the texels from one before to two after the one at (x − ½,
-        // y − ½); where they all lie in the texels, their tile may settle them.
-        const double shift = soft ? 0.5 : 0.0, before = soft ? 1.0 : 0.0, after = soft ? 2.0 : 0.0;
-        const double fi = std::floor(x - shift), fj = std::floor(y - shift);
-        if (fi - before >= texels_.left && fi + after < texels_.right &&
-            fj - before >= texels_.top && fj + after < texels_.bottom) {
-            const auto i = static_cast<int32_t>(fi), j = static_cast<int32_t>(fj);
-            // The texels read lie within two of (i + before, j + before), in its tile's reach.
-            switch (SettledAt(i + static_cast<int32_t>(before), j + static_cast<int32_t>(before), d,
-                              receiverId)) {
+        if (const Tile* tile = TileAt(x, y, soft)) {
+            switch (SettledBy(*tile, d, receiverId)) {
                 case Settled::kLit:
                     t[0] = t[1] = t[2] = 1.0f;
                     return;
@@ -205,6 +210,30 @@ public:
         }
         WalkTexels(x, y, d, receiverId, soft, t);
     }
+    // The tile whose reach holds every texel a lookup at (x, y) reads, or null where they do
+    // not all lie in the texels.
+    const Tile* TileAt(double x, double y, bool soft) const {
+        // A soft lookup weighs the texels from one before to two after the one at (x − ½,
+        // y − ½); they lie within two of the one after it, in its tile's reach.
+        const double shift = soft ? 0.5 : 0.0, before = soft ? 1.0 : 0.0, after = soft ? 2.0 : 0.0;
+        const double fi = std::floor(x - shift), fj = std::floor(y - shift);
+        if (!(fi - before >= texels_.left && fi + after < texels_.right &&
+              fj - before >= texels_.top && fj + after < texels_.bottom))
+            return nullptr;
+        const auto i = static_cast<int32_t>(fi + before), j = static_cast<int32_t>(fj + before);
+        return &tiles_[static_cast<size_t>((j - texels_.top) >> kTileShift) * tileStride_ +
+                       ((i - texels_.left) >> kTileShift)];
+    }
+    // Whether tile t lets the light through to depth d of the receiver in every texel it
+    // reaches, or keeps it all back.
+    static Settled SettledBy(const Tile& t, double d, uint16_t receiverId) {
+        if (d >= t.litDepth || (t.frontId == receiverId && d >= t.frontLitDepth))
+            return Settled::kLit;
+        if (d < t.umbraDepth && !((t.umbraIds >> (receiverId & 15)) & 1)) return Settled::kDark;
+        return Settled::kNo;
+    }
+    // TransmissionAt from the texel lists, where no tile settles it.
+    void WalkTexels(double x, double y, double d, uint16_t receiverId, bool soft, float t[3]) const;
     // The tent weight of (x, y) over the face, 1 at its centre, 0 at and beyond its border;
     // inset shrinks the face (texels) for the filter's reach.
     float FaceWeight(double x, double y, double inset) const {
@@ -223,37 +252,12 @@ public:
     }
 
 private:
-    // What every texel a lookup in a tile reads, two texels around the tile included, gives
-    // a receiver: all of the light or none of it, found with one read instead of a walk over
-    // up to sixteen texel lists. Neither answer holds where shadow edges run.
-    struct Tile {
-        float litDepth;       // a point at least this near the light is lit in every texel
-        float frontLitDepth;  // so is a point of layer frontId at least this near
-        float umbraDepth;     // a point farther than this gets no light in any texel,
-        uint16_t umbraIds;    // unless it is of a layer whose bit (id mod 16) is set
-        uint16_t frontId;     // a layer that sees past its own occluders; 0xFFFF for none
-    };
-    static_assert(sizeof(Tile) == 16, "four tiles to a cache line");
-    enum class Settled { kNo, kLit, kDark };
-
     double Row(int column, const double p[3]) const {
         return p[0] * matrix_.mat[0][column] + p[1] * matrix_.mat[1][column] +
                p[2] * matrix_.mat[2][column] + matrix_.mat[3][column];
     }
-    // TransmissionAt from the texel lists.
-    void WalkTexels(double x, double y, double d, uint16_t receiverId, bool soft, float t[3]) const;
     void TexelTransmission(int32_t i, int32_t j, double d, uint16_t receiverId, float t[3]) const;
     void BuildTiles();
-    // Whether the texels read around texel (i, j), which lies in the texels, all let the light
-    // through to depth d of the receiver, or all keep it back.
-    Settled SettledAt(int32_t i, int32_t j, double d, uint16_t receiverId) const {
-        const Tile& t = tiles_[static_cast<size_t>((j - texels_.top) >> kTileShift) * tileStride_ +
-                               ((i - texels_.left) >> kTileShift)];
-        if (d >= t.litDepth || (t.frontId == receiverId && d >= t.frontLitDepth))
-            return Settled::kLit;
-        if (d < t.umbraDepth && !((t.umbraIds >> (receiverId & 15)) & 1)) return Settled::kDark;
-        return Settled::kNo;
-    }
 
     // Tiles of 4 × 4 texels.
     static constexpr int32_t kTileShift = 2;
