@@ -3,6 +3,7 @@
 #include <cmath>
 
 #include "renderer/raster/pixel_lighting.h"
+#include "renderer/raster/processor.h"
 #include "u_cpu.h"
 
 using sy_lighting::Light;
@@ -109,5 +110,5 @@ SY_LightSet SY_LayerShader::LightsReaching(const double first[3], const double l
 
 SY_LightingLanes SY_WidestLightingLanes() {
     if (U_G_CPU_DataP()->hasVectorUnits == 0) return SY_LightingLanes::kOne;
-    return __builtin_cpu_supports("avx2") ? SY_LightingLanes::kFour : SY_LightingLanes::kTwo;
+    return SY_ProcessorHasAvx2() ? SY_LightingLanes::kFour : SY_LightingLanes::kTwo;
 }

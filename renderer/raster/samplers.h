@@ -191,17 +191,11 @@ struct Accumulator {
     }
 };
 
-// Whether the processor takes filtered samples two pixels at once (AVX2).
-inline bool PairsAvailable() {
-    static const bool available = __builtin_cpu_supports("avx2");
-    return available;
-}
-
 // The filtered texels of two pixels of one span, both area samples of boxes inside the
 // texture, in wide registers: the texels SY_SampleFiltered gives each alone. m gives the slopes,
 // (u, v, w, 1/W) each pixel's position; they come in registers, as the caller has just worked
 // them out. False, with nothing written, for any other pair. Only for processors where
-// PairsAvailable() holds.
+// SY_ProcessorHasAvx2() holds.
 bool AreaPair(const SY_SpanTexture& texture, const SY_SpanMapping& m, double u0, double v0,
               double w0, double invW0, double u1, double v1, double w1, double invW1,
               PF_Pixel8* firstOut, PF_Pixel8* secondOut);

@@ -1,6 +1,6 @@
 // Area samples of two neighbouring pixels at once in AVX registers. This file alone is compiled
 // for AVX2 (without fused multiply-add, which would round differently), and it is called only
-// where sy_sampling::PairsAvailable() holds. Every lane takes the operation the one-pixel path
+// where SY_ProcessorHasAvx2() holds. Every lane takes the operation the one-pixel path
 // (samplers.h, pf_sampling.h) takes for its value, so each pixel agrees bit for bit with its
 // sample alone. Of the shared inline functions it calls only those that are always inlined, so
 // that none is compiled here for AVX2 and then taken by other files.

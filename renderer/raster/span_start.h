@@ -4,7 +4,7 @@
 
 #include <cstdint>
 
-#include "renderer/raster/samplers.h"
+#include "renderer/raster/processor.h"
 #include "renderer/raster/span_state.h"
 #include "renderer/scene/screen_geometry.h"
 
@@ -17,7 +17,7 @@ void SY_WithSpanState(const SY_ScreenGeometry& geometry, int32_t x, int32_t y, B
         texture->samplingFilter = geometry.samplingFilter;
         texture->sampling.src = geometry.texture;
         texture->perspective = geometry.perspective;
-        texture->pairs = sy_sampling::PairsAvailable();
+        texture->pairs = SY_ProcessorHasAvx2();
     };
     double cx = x + 0.5, cy = y + 0.5;
     int32_t matrices = geometry.screenToTexture.Count();

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "raster_test_support.h"
+#include "renderer/raster/processor.h"
 #include "renderer/raster/samplers.h"
 #include "renderer/scene/scene_print.h"
 
@@ -144,7 +145,7 @@ TYPED_TEST(Samplers, AbsentSubsamplesHalveAlphaAndKeepColor) {
 // of varied alpha, with every seventh pixel hidden by a matte and so not sampled.
 TYPED_TEST(Samplers, PairsGiveTheTexelsOfSingleSamples) {
     using P = TypeParam;
-    if (!sy_sampling::PairsAvailable()) GTEST_SKIP();
+    if (!SY_ProcessorHasAvx2()) GTEST_SKIP();
     auto texture = raster_test::WorldOf<P>(64, 48, [](int32_t i, int32_t j) {
         P p = PatternTexel<P>(i, j);
         p.alpha = PatternTexel<P>(j, i).red;
