@@ -88,7 +88,8 @@ std::unique_ptr<OIIO::ImageInput> Open(const std::filesystem::path& file) {
         std::string reason = OneLine(OIIO::geterror());
         Fail(file, reason.empty() ? "not an image OpenImageIO can read" : reason);
     }
-    CheckDecodedSize(file, input->spec());
+    const OIIO::ImageSpec& layout = input->spec();
+    CheckDecodedSize(file, layout);
     return input;
 }
 
